@@ -1,0 +1,66 @@
+#pragma once
+// What a response handler receives, and the value types that travel with a request.
+
+#include <cstdint>
+#include <utility>
+
+#include <boost/function.hpp>
+#include <boost/shared_ptr.hpp>
+
+#include "foundation/core/Guid.h"
+#include "foundation/core/ImmutableString.h"
+#include "foundation/core/SmallBlockAllocator.h"
+#include "foundation/net/RecycledMemory.h"
+
+namespace tolmonet {
+
+using StatusCode = std::int32_t;
+
+// Status of a response that no server sent: no connection, a time-out,
+// a cancelled request, or a failure the library made itself.
+constexpr StatusCode kStatusNoResponse = -100;
+
+// Header name to value. Names compare by content; where a name occurs more
+// than once, the entry that sorts last among them is the one used.
+using HeaderList = SmallBlockAllocator::multimap<ImmutableString, ImmutableString, std::less<ImmutableString> >;
+
+// Names and values of a form or a query, in order.
+using FormList = SmallBlockAllocator::vector<std::pair<ImmutableString, UTF8String> >;
+
+// The value of `name` (the last entry of that name), or null when absent.
+const ImmutableString* FindHeader(const HeaderList& headers, const ImmutableString& name);
+
+struct Response {
+    Response() : status(0), reserved(0) {}
+    Response(StatusCode status_, HeaderList headers_, boost::shared_ptr<RecycledMemory const> body_)
+        : status(status_), headers(std::move(headers_)), body(std::move(body_)), reserved(0)
+    {
+    }
+
+    StatusCode status;
+    HeaderList headers;
+    boost::shared_ptr<RecycledMemory const> body;  // null when there is none
+    std::int32_t reserved;                         // zero; nothing reads it
+
+    // The body's bytes as text; empty without a body.
+    UTF8String BodyText() const;
+};
+
+// Per-request options. Callers start from the default; the authorising layer
+// sets mAuthorized. The other fields are carried and not interpreted.
+struct Configuration {
+    boost::shared_ptr<void> mExtension;
+    bool mAuthorized = false;
+    bool mFollowRedirects = true;
+    bool mUseCookies = true;
+    UTF8String mProxy;
+    UTF8String mUserAgent;
+    UTF8String mCAFile;
+};
+
+namespace http {
+
+using ResponseHandler = boost::function<void(const Guid&, const boost::shared_ptr<Response>&)>;
+
+}  // namespace http
+}  // namespace tolmonet

@@ -1,0 +1,11 @@
+#pragma once
+// Everything a host uses, in one include.
+
+#include "foundation/core/Guid.h"
+#include "foundation/core/ImmutableString.h"
+#include "foundation/core/Strings.h"
+#include "foundation/core/Trace.h"
+#include "foundation/net/ForwardingProcessor.h"
+#include "foundation/net/HeaderConstants.h"
+#include "foundation/net/RequestProcessor.h"
+#include "foundation/net/Response.h"
