@@ -1,7 +1,9 @@
 #pragma once
 // Everything a host uses, in one include.
 
+#include "assets/RestException.h"
 #include "foundation/core/Guid.h"
+#include "foundation/core/HostConfig.h"
 #include "foundation/core/ImmutableString.h"
 #include "foundation/core/Strings.h"
 #include "foundation/core/Trace.h"
