@@ -1,0 +1,128 @@
+// "tolmonetsynccache.json": the last synchronised state of every record.
+
+#include "sync/CacheFile.h"
+
+#include <map>
+#include <tuple>
+
+#include "foundation/core/ByteStreams.h"
+#include "foundation/core/Trace.h"
+#include "foundation/json/JSON.h"
+#include "sync/SyncCache.h"
+
+namespace tolmocore {
+namespace serialization {
+
+using tolmonetsync::CachedSyncFile;
+
+boost::any JSONConvert<CachedSyncFile>::ToJSON(const CachedSyncFile& record)
+{
+    boost::any object = JSONObject();
+    AddToObjectGeneric(object, "mName", record.mName);
+    AddToObjectGeneric(object, "mMimeType", record.mMimeType);
+    AddToObjectGeneric(object, "mCollectionName", record.mCollectionName);
+    AddToObjectGeneric(object, "mCachedServerEtag", record.mCachedServerEtag);
+    AddToObjectGeneric(object, "mCachedServerModDate", record.mCachedServerModDate);
+    AddToObjectGeneric(object, "mCachedLocalModDate", record.mCachedLocalModDate);
+    AddToObjectGeneric(object, "mCachedLocalChecksum", record.mCachedLocalChecksum);
+    return object;
+}
+
+CachedSyncFile JSONConvert<CachedSyncFile>::FromJSON(const boost::any& value)
+{
+    const JSONObject& object = boost::any_cast<const JSONObject&>(value);
+    CachedSyncFile record;
+    ExtractOptionalPropertyFromObjectGeneric(object, "mName", record.mName);
+    ExtractOptionalPropertyFromObjectGeneric(object, "mMimeType", record.mMimeType);
+    ExtractOptionalPropertyFromObjectGeneric(object, "mCollectionName", record.mCollectionName);
+    ExtractOptionalPropertyFromObjectGeneric(object, "mCachedServerEtag", record.mCachedServerEtag);
+    ExtractOptionalPropertyFromObjectGeneric(object, "mCachedServerModDate", record.mCachedServerModDate);
+    ExtractOptionalPropertyFromObjectGeneric(object, "mCachedLocalModDate", record.mCachedLocalModDate);
+    ExtractOptionalPropertyFromObjectGeneric(object, "mCachedLocalChecksum", record.mCachedLocalChecksum);
+    return record;
+}
+
+}  // namespace serialization
+}  // namespace tolmocore
+
+namespace tolmonetsync {
+
+using tolmocore::filesupport::IPlatformByteStream;
+using tolmocore::filesupport::OPlatformByteStream;
+namespace json = tolmocore::serialization;
+
+namespace {
+
+// A cache file this large is no file of ours; reading it whole could exhaust memory.
+constexpr std::uint64_t kMaxCacheFileSize = 64ull * 1024 * 1024;
+
+// Records are the same file when name, group and media type agree.
+using RecordKey = std::tuple<UTF16String, UTF16String, std::string>;
+RecordKey KeyOf(const CachedSyncFile& record)
+{
+    return RecordKey(record.mName, record.mCollectionName, record.mMimeType.ToStdString());
+}
+
+std::vector<CachedSyncFile> ReadCacheFile(const File& cacheFile)
+{
+    std::vector<CachedSyncFile> parsed;
+    if (!cacheFile.Exists()) return parsed;
+    IPlatformByteStream in(cacheFile, 1);
+    const std::uint64_t length = in.Length();
+    if (length == 0) return parsed;
+    if (length > kMaxCacheFileSize) throw std::runtime_error("the cache file is too large to be ours");
+    // One more byte, zero, so that the text ends in a NUL.
+    UTF8String text(static_cast<std::size_t>(length) + 1, 0);
+    in.ReadBlock(&text[0], static_cast<unsigned int>(length));
+    json::JSONConvertStdVector<CachedSyncFile>::FromJSON(json::JSONParse(text), parsed);
+    return parsed;
+}
+
+}  // namespace
+
+File SyncCache::GetCache() { return File(Dir::PrefDir(), u"tolmonetsynccache.json"); }
+
+void SyncCache::LoadCache()
+{
+    try {
+        for (CachedSyncFile& record : mFiles) {
+            record.FreshenModDate();
+            if (const boost::shared_ptr<Item> item = GetItem(record)) record.mServerModDate = item->mModified;
+        }
+
+        const std::vector<CachedSyncFile> parsed = ReadCacheFile(GetCache());
+        std::map<RecordKey, const CachedSyncFile*> firstOfKey;
+        for (const CachedSyncFile& entry : parsed) firstOfKey.emplace(KeyOf(entry), &entry);
+
+        for (CachedSyncFile& record : mFiles) {
+            auto found = firstOfKey.find(KeyOf(record));
+            // A record whose file is gone stays blank: its download is unconditional.
+            if (found == firstOfKey.end() || !record.mFile.Exists()) continue;
+            const CachedSyncFile& kept = *found->second;
+            record.mCachedServerEtag = kept.mCachedServerEtag;
+            record.mCachedServerModDate = kept.mCachedServerModDate;
+            record.mCachedLocalModDate = kept.mCachedLocalModDate;
+            record.mCachedLocalChecksum = kept.mCachedLocalChecksum;
+        }
+    } catch (const std::exception& e) {
+        TOLMO_TRACE("tolmonetsync", 1, "LoadCache error: " << e.what());
+    }
+}
+
+void SyncCache::SaveCache()
+{
+    for (CachedSyncFile& record : mFiles) {
+        record.mCachedLocalModDate = record.mLocalModDate;
+        record.mCachedLocalChecksum = record.mLocalChecksum;
+    }
+    File cacheFile = GetCache();
+    cacheFile.Create(false);
+    // The stream replaces the file whole when it closes: a crash leaves the
+    // old file or the new one, never a torn one.
+    OPlatformByteStream out(cacheFile, 1);
+    const UTF8String text = json::GetJSONUTF8String(json::JSONConvertStdContainer<CachedSyncFile>::ToJSON(mFiles), false);
+    out.WriteBlock(text.data(), static_cast<unsigned int>(text.size()));
+    out.Close();
+}
+
+}  // namespace tolmonetsync

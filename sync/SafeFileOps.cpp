@@ -1,0 +1,145 @@
+// What protects the user's files: nothing local is replaced or removed
+// without a copy in this run's backup directory, and downloads land beside
+// their target first.
+
+#include <algorithm>
+#include <sstream>
+#include <vector>
+
+#include <boost/date_time/posix_time/posix_time.hpp>
+
+#include "foundation/core/ByteStreams.h"
+#include "foundation/core/Hash.h"
+#include "foundation/core/Trace.h"
+#include "sync/SyncCache.h"
+#include "sync/SyncRecords.h"
+
+namespace tolmonetsync {
+
+using tolmocore::filesupport::IPlatformByteStream;
+using tolmocore::filesupport::OPlatformByteStream;
+
+namespace {
+
+constexpr unsigned int kBlockSize = 10240;
+
+// Copies `source` into `backupDir` under its own name. Backups are flat:
+// within one run a later file of the same name replaces an earlier copy.
+void CopyIntoBackup(const File& source, const Dir& backupDir)
+{
+    File copy(backupDir, source.GetName());
+    copy.Create(false);
+    IPlatformByteStream in(source, 1);
+    OPlatformByteStream out(copy, 1);
+    std::vector<unsigned char> block(kBlockSize);
+    for (std::uint64_t remaining = in.Length(); remaining > 0;) {
+        const unsigned int size = static_cast<unsigned int>(std::min<std::uint64_t>(kBlockSize, remaining));
+        in.ReadBlock(block.data(), size);
+        out.WriteBlock(block.data(), size);
+        remaining -= size;
+    }
+    out.Close();
+}
+
+std::string BackupDirName(const boost::posix_time::ptime& now)
+{
+    std::ostringstream name;
+    name.imbue(std::locale(name.getloc(), new boost::posix_time::time_facet("%Y%m%d-%H%M%S_%f")));
+    name << "Backup_" << now;
+    return name.str();
+}
+
+}  // namespace
+
+File CachedSyncFile::GetSafeRenameFile() const
+{
+    return File(mFile.Parent(), mFile.GetName() + UTF16String(u".temp"));
+}
+
+void CachedSyncFile::SafeRenameSwap(const Dir& backupDir)
+{
+    // The copy goes aside first; then the rename replaces the target in one
+    // step, so there is never a moment without a file under the target name.
+    if (mFile.Exists()) CopyIntoBackup(mFile, backupDir);
+    File downloaded = GetSafeRenameFile();
+    downloaded.Rename(mFile.GetName());
+}
+
+Guid CachedSyncFile::ComputeChecksum() const
+{
+    try {
+        if (!mFile.Exists()) return Guid();
+        IPlatformByteStream in(mFile, 1);
+        HashValue value;
+        value.mWords[3] = 8;
+        MixHash::MixInData(value, reinterpret_cast<const unsigned char*>("SyncFile"), 8);
+        std::vector<unsigned char> block(kBlockSize);
+        for (std::uint64_t remaining = in.Length(); remaining > 0;) {
+            const unsigned int size = static_cast<unsigned int>(std::min<std::uint64_t>(kBlockSize, remaining));
+            in.ReadBlock(block.data(), size);
+            value.mWords[3] += size;  // the running count of bytes mixed, the marker's 8 included
+            MixHash::MixInData(value, block.data(), size);
+            remaining -= size;
+        }
+        const std::uint32_t* w = value.mWords;
+        return Guid(w[0], static_cast<unsigned short>(w[1] >> 16), static_cast<unsigned short>(w[1]),
+                    static_cast<unsigned char>(w[2] >> 24), static_cast<unsigned char>(w[2] >> 16),
+                    static_cast<unsigned char>(w[2] >> 8), static_cast<unsigned char>(w[2]),
+                    static_cast<unsigned char>(w[3] >> 24), static_cast<unsigned char>(w[3] >> 16),
+                    static_cast<unsigned char>(w[3] >> 8), static_cast<unsigned char>(w[3]));
+    } catch (const std::exception& e) {
+        TOLMO_TRACE("tolmonetsync", 1, "ComputeChecksum error: " << e.what());
+        return Guid();
+    }
+}
+
+void CachedSyncFile::FreshenModDate()
+{
+    if (UsesChecksum())
+        mLocalChecksum = ComputeChecksum();
+    else
+        mLocalModDate = mFile.Exists() ? mFile.Modified() : boost::posix_time::ptime();
+}
+
+Dir SyncCache::NewBackupDir()
+{
+    Dir backupRoot(Dir::PrefDir(), u"SyncBackup");
+    if (!backupRoot.Exists()) backupRoot.Create();
+
+    Dir backup(backupRoot, tolmocore::utility::ToUTF16(BackupDirName(BackupClock()())));
+    if (!backup.Exists()) backup.Create();
+
+    // Oldest first; equal dates keep the walk's (name) order.
+    std::vector<std::pair<boost::posix_time::ptime, Dir> > existing;
+    for (auto it = backupRoot.BeginSubdirs(false, nullptr); it != backupRoot.EndSubdirs(); ++it)
+        existing.emplace_back((*it).Modified(), *it);
+    std::stable_sort(existing.begin(), existing.end(),
+                     [](const auto& a, const auto& b) { return a.first < b.first; });
+
+    // Ten, not the number above a limit: at eleven only the newest survives,
+    // and the count climbs again from one.
+    if (existing.size() >= 11) {
+        for (std::size_t i = 0; i < 10; ++i) {
+            try {
+                existing[i].second.Delete();
+            } catch (const std::exception&) {
+                // Left for the next cache to count again.
+            }
+        }
+    }
+    return backup;
+}
+
+void SyncCache::SafeDelete(File& file)
+{
+    try {
+        if (!file.Exists()) return;
+        CopyIntoBackup(file, mBackupDir);
+        file.Delete();
+    } catch (const std::exception& e) {
+        TOLMO_TRACE("tolmonetsync", 1,
+                    "Warning: Error while deleting: " << file.FullPath() << ", error: " << e.what());
+    }
+}
+
+}  // namespace tolmonetsync
