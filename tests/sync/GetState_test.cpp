@@ -3,6 +3,8 @@
 
 #include <gtest/gtest.h>
 
+#include <boost/date_time/posix_time/posix_time.hpp>
+
 #include "support/TempDir.h"
 #include "sync/SyncRecords.h"
 
