@@ -1,0 +1,115 @@
+// Every row of the pass's decision tables, in all three modes.
+
+#include <gtest/gtest.h>
+
+#include <boost/date_time/posix_time/posix_time.hpp>
+
+#include "SyncTestSupport.h"
+#include "sync/SyncDecision.h"
+
+using namespace synctest;
+using testsupport::WriteFileBytes;
+
+namespace {
+
+enum Local { Missing, Unchanged, Changed };
+enum Remote { NoItem, ItemSameDate, ItemNewerDate };
+
+struct Row {
+    SyncMode mMode;
+    Local mLocal;
+    Remote mRemote;
+    bool mHistory;
+    SyncAction mAction;
+    bool mDropsTag;
+};
+
+std::ostream& operator<<(std::ostream& out, const Row& row)
+{
+    return out << "mode " << row.mMode << ", local " << row.mLocal << ", remote " << row.mRemote << ", history "
+               << row.mHistory;
+}
+
+class DecisionTable : public ::testing::TestWithParam<Row> {
+protected:
+    const boost::posix_time::ptime kServerDate = boost::posix_time::time_from_string("2024-02-03 04:05:06");
+    const boost::posix_time::ptime kLocalDate = boost::posix_time::time_from_string("2024-02-01 00:00:00");
+    PrefDirScope mPrefs;
+    testsupport::TempDir mWork;
+};
+
+}  // namespace
+
+TEST_P(DecisionTable, ActionFollowsTheTable)
+{
+    const Row row = GetParam();
+    OfflineCache cache({}, {});
+    boost::shared_ptr<Collection> group(new Collection);
+    group->mName = u"G";
+    cache.mCollections.push_back(group);
+
+    CachedSyncFile record(SyncFile(FileAt(mWork / "f.xmp"), u"f.xmp", u"G", ImmutableString::CreateStatic("t/x"),
+                                   SyncMetadata_ModDate, 1000));
+    if (row.mLocal != Missing) WriteFileBytes(mWork / "f.xmp", "bytes");
+    if (row.mRemote != NoItem) {
+        boost::shared_ptr<Item> item(new Item);
+        item->mName = u"f.xmp";
+        item->mModified = row.mRemote == ItemSameDate ? kServerDate : kServerDate + boost::posix_time::hours(1);
+        group->mChildren.push_back(item);
+        record.mServerModDate = item->mModified;
+    }
+    if (row.mHistory) {
+        record.mCachedServerModDate = kServerDate;
+        record.mCachedServerEtag = "\"kept\"";
+        record.mCachedLocalModDate = kLocalDate;
+    }
+    if (row.mLocal != Missing)
+        record.mLocalModDate = row.mLocal == Changed ? kLocalDate + boost::posix_time::seconds(1) : kLocalDate;
+
+    const SyncDecision decision = DecideRecord(cache, record, row.mMode);
+    EXPECT_EQ(decision.mAction, row.mAction) << row << " (" << decision.ActionName() << ")";
+    EXPECT_EQ(decision.mDropCachedEtag, row.mDropsTag) << row;
+    EXPECT_NE(std::string(decision.Reason()), "");
+}
+
+// History means a kept server date and an item now; a missing local file
+// never has history at plan time.
+INSTANTIATE_TEST_SUITE_P(
+    TwoWay, DecisionTable,
+    ::testing::Values(Row{SyncMode_TwoWay, Changed, ItemNewerDate, true, SyncAction_Upload, false},
+                      Row{SyncMode_TwoWay, Unchanged, ItemSameDate, true, SyncAction_Download, false},
+                      Row{SyncMode_TwoWay, Unchanged, ItemNewerDate, false, SyncAction_Upload, false},
+                      Row{SyncMode_TwoWay, Unchanged, NoItem, true, SyncAction_Upload, false},
+                      Row{SyncMode_TwoWay, Missing, ItemSameDate, false, SyncAction_Download, false},
+                      Row{SyncMode_TwoWay, Missing, NoItem, false, SyncAction_SkipMissingRemote, false}));
+
+INSTANTIATE_TEST_SUITE_P(
+    ServerWins, DecisionTable,
+    ::testing::Values(Row{SyncMode_ServerWins, Unchanged, NoItem, true, SyncAction_SkipMissingRemote, true},
+                      Row{SyncMode_ServerWins, Changed, ItemSameDate, true, SyncAction_Download, true},
+                      Row{SyncMode_ServerWins, Unchanged, ItemSameDate, false, SyncAction_Download, true},
+                      Row{SyncMode_ServerWins, Unchanged, ItemNewerDate, true, SyncAction_Download, false},
+                      Row{SyncMode_ServerWins, Missing, ItemSameDate, false, SyncAction_Download, false},
+                      Row{SyncMode_ServerWins, Missing, NoItem, false, SyncAction_SkipMissingRemote, false}));
+
+INSTANTIATE_TEST_SUITE_P(
+    LocalWins, DecisionTable,
+    ::testing::Values(Row{SyncMode_LocalWins, Unchanged, ItemSameDate, true, SyncAction_Nothing, false},
+                      Row{SyncMode_LocalWins, Changed, ItemSameDate, true, SyncAction_Upload, false},
+                      Row{SyncMode_LocalWins, Unchanged, ItemNewerDate, true, SyncAction_Upload, false},
+                      Row{SyncMode_LocalWins, Unchanged, NoItem, false, SyncAction_Upload, false},
+                      Row{SyncMode_LocalWins, Missing, ItemSameDate, false, SyncAction_DeleteRemote, false},
+                      Row{SyncMode_LocalWins, Missing, NoItem, false, SyncAction_SkipMissingLocal, false}));
+
+TEST(DecisionLimits, UploadAtTheSizeLimitIsSkippedOneByteLessGoes)
+{
+    PrefDirScope prefs;
+    testsupport::TempDir work;
+    OfflineCache cache({}, {});
+    CachedSyncFile record(SyncFile(FileAt(work / "big.bin"), u"big.bin", u"G", ImmutableString::CreateStatic("t/x"),
+                                   SyncMetadata_ModDate, 10));
+    WriteFileBytes(work / "big.bin", std::string(10, 'x'));
+    EXPECT_EQ(DecideRecord(cache, record, SyncMode_LocalWins).mAction, SyncAction_SkipTooBig);
+    WriteFileBytes(work / "big.bin", std::string(9, 'x'));
+    EXPECT_EQ(DecideRecord(cache, record, SyncMode_LocalWins).mAction, SyncAction_Upload);
+}
