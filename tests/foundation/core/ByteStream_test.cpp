@@ -1,0 +1,177 @@
+// Output streams replace a file whole or not at all; input streams read
+// exactly what is asked or throw.
+
+#include <gtest/gtest.h>
+
+#include <sys/stat.h>
+
+#include <atomic>
+#include <thread>
+
+#include "foundation/core/ByteStreams.h"
+#include "support/TempDir.h"
+
+using namespace tolmocore::filesupport;
+using testsupport::ReadFileBytes;
+using testsupport::WriteFileBytes;
+using tolmocore::utility::ToUTF16;
+
+namespace {
+
+void Write(OPlatformByteStream& stream, const std::string& bytes)
+{
+    stream.WriteBlock(reinterpret_cast<const unsigned char*>(bytes.data()), static_cast<unsigned int>(bytes.size()));
+}
+
+std::vector<std::string> Entries(const std::filesystem::path& directory)
+{
+    std::vector<std::string> names;
+    for (const auto& entry : std::filesystem::directory_iterator(directory)) names.push_back(entry.path().filename());
+    std::sort(names.begin(), names.end());
+    return names;
+}
+
+// The stream's temporary beside `name`, or "" if there is none.
+std::string TemporaryOf(const std::filesystem::path& directory, const std::string& name)
+{
+    for (const std::string& entry : Entries(directory))
+        if (entry.rfind("." + name + ".tmsw-", 0) == 0) return entry;
+    return std::string();
+}
+
+unsigned Permissions(const std::filesystem::path& path)
+{
+    struct stat info;
+    return ::stat(path.c_str(), &info) == 0 ? info.st_mode & 07777 : ~0u;
+}
+
+}  // namespace
+
+class ByteStreamTest : public ::testing::Test {
+protected:
+    File InTemp(const std::string& name) const { return File(mDir, ToUTF16(name)); }
+
+    testsupport::TempDir mTemp;
+    Dir mDir{ToUTF16(mTemp.Path().string())};
+};
+
+TEST_F(ByteStreamTest, ReaderNeverSeesATornOrEmptyFileDuringRewrites)
+{
+    const std::string first(50000, 'a'), second(70001, 'b');
+    WriteFileBytes(mTemp / "cache.json", first);
+    std::atomic<bool> done{false};
+    std::atomic<int> bad{0}, reads{0};
+    std::thread reader([&] {
+        do {
+            const std::string seen = ReadFileBytes(mTemp / "cache.json");
+            if (seen != first && seen != second) ++bad;
+            ++reads;
+        } while (!done);
+    });
+    for (int i = 0; i < 300; ++i) {
+        OPlatformByteStream out(InTemp("cache.json"), 1);
+        const std::string& bytes = i % 2 ? first : second;
+        Write(out, bytes.substr(0, 1000));  // several blocks, so a torn write would show
+        Write(out, bytes.substr(1000));
+        out.Close();
+    }
+    done = true;
+    reader.join();
+    EXPECT_EQ(bad, 0) << "of " << reads << " reads";
+    EXPECT_EQ(ReadFileBytes(mTemp / "cache.json"), first);
+    EXPECT_EQ(Entries(mTemp.Path()), std::vector<std::string>{"cache.json"});
+}
+
+TEST_F(ByteStreamTest, StreamDroppedWithoutCloseLeavesOldBytesAndNoTemporary)
+{
+    WriteFileBytes(mTemp / "settings.xmp", "old bytes");
+    {
+        OPlatformByteStream out(InTemp("settings.xmp"), 1);
+        Write(out, std::string(100000, 'n'));
+        const std::string temporary = TemporaryOf(mTemp.Path(), "settings.xmp");
+        ASSERT_FALSE(temporary.empty());
+        EXPECT_EQ(Entries(mTemp.Path()).size(), 2u);
+        EXPECT_EQ(temporary.find(".temp"), std::string::npos);
+        EXPECT_NE(File(ToUTF16(temporary)).GetExtension(true), UTF16String(u".xmp"));
+        EXPECT_EQ(ReadFileBytes(mTemp / "settings.xmp"), "old bytes");
+    }
+    EXPECT_EQ(ReadFileBytes(mTemp / "settings.xmp"), "old bytes");
+    EXPECT_EQ(Entries(mTemp.Path()), std::vector<std::string>{"settings.xmp"});
+
+    InTemp("new.xmp").Create(false);
+    {
+        OPlatformByteStream out(InTemp("new.xmp"), 1);
+    }
+    EXPECT_EQ(Entries(mTemp.Path()), std::vector<std::string>{"settings.xmp"});
+}
+
+TEST_F(ByteStreamTest, CloseFailuresThrowAndLeaveNothing)
+{
+    std::filesystem::create_directory(mTemp / "vanishing");
+    OPlatformByteStream out(File(Dir(mDir, u"vanishing"), u"f"), 1);
+    Write(out, "bytes");
+    std::filesystem::remove_all(mTemp / "vanishing");
+    EXPECT_THROW(out.Close(), FileSystemError);
+    EXPECT_FALSE(std::filesystem::exists(mTemp / "vanishing"));
+    EXPECT_THROW(Write(out, "more"), FileSystemError);
+    EXPECT_THROW(out.Close(), FileSystemError);
+
+    EXPECT_THROW(OPlatformByteStream(File(Dir(mDir, u"missing"), u"f"), 1), FileSystemError);
+    std::filesystem::create_directory(mTemp / "dir");
+    EXPECT_THROW(OPlatformByteStream(InTemp("dir"), 1), FileSystemError);
+    EXPECT_EQ(Entries(mTemp.Path()), std::vector<std::string>{"dir"});
+}
+
+TEST_F(ByteStreamTest, ReplacementKeepsPermissionsAndLinks)
+{
+    WriteFileBytes(mTemp / "shared", "x");
+    std::filesystem::permissions(mTemp / "shared", static_cast<std::filesystem::perms>(0640));
+    OPlatformByteStream out(InTemp("shared"), 1);
+    Write(out, "y");
+    out.Close();
+    EXPECT_EQ(Permissions(mTemp / "shared"), 0640u);
+
+    const mode_t oldMask = ::umask(027);
+    OPlatformByteStream fresh(InTemp("fresh"), 1);
+    fresh.Close();
+    EXPECT_EQ(Permissions(mTemp / "fresh"), 0640u);
+    ::umask(0);
+    OPlatformByteStream secret(InTemp("secret"), 1, 0600);
+    const std::string temporary = TemporaryOf(mTemp.Path(), "secret");
+    const unsigned before = temporary.empty() ? ~0u : Permissions(mTemp / temporary);
+    secret.Close();
+    ::umask(oldMask);
+    EXPECT_EQ(before, 0600u);  // private before the first byte
+    EXPECT_EQ(Permissions(mTemp / "secret"), 0600u);
+
+    std::filesystem::create_symlink("shared", mTemp / "link");
+    OPlatformByteStream throughLink(InTemp("link"), 1);
+    Write(throughLink, "via link");
+    throughLink.Close();
+    EXPECT_TRUE(std::filesystem::is_symlink(mTemp / "link"));
+    EXPECT_EQ(ReadFileBytes(mTemp / "shared"), "via link");
+}
+
+TEST_F(ByteStreamTest, ReadsGiveExactlyWhatWasWritten)
+{
+    std::string bytes;
+    for (int i = 0; i < 150000; ++i) bytes.push_back(static_cast<char>(i * 13));
+    OPlatformByteStream out(InTemp("data"), 1);
+    Write(out, bytes.substr(0, 10));
+    Write(out, bytes.substr(10, 100000));
+    Write(out, bytes.substr(100010));
+    out.Close();
+
+    IPlatformByteStream in(InTemp("data"), 1);
+    ASSERT_EQ(in.Length(), bytes.size());
+    std::string read(bytes.size(), '\0');
+    in.ReadBlock(reinterpret_cast<unsigned char*>(&read[0]), 10240);
+    in.ReadBlock(reinterpret_cast<unsigned char*>(&read[10240]), static_cast<unsigned int>(bytes.size() - 10240));
+    EXPECT_EQ(read, bytes);
+    unsigned char extra;
+    EXPECT_THROW(in.ReadBlock(&extra, 1), FileSystemError);
+
+    EXPECT_THROW(IPlatformByteStream(InTemp("missing"), 1), FileSystemError);
+    std::filesystem::create_directory(mTemp / "dir");
+    EXPECT_THROW(IPlatformByteStream(InTemp("dir"), 1), FileSystemError);
+}
