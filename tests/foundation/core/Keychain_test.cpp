@@ -1,0 +1,107 @@
+// The keychain store: private, atomic, and forgiving of damage.
+
+#include <gtest/gtest.h>
+
+#include <sys/stat.h>
+
+#include <thread>
+#include <vector>
+
+#include "foundation/core/Dir.h"
+#include "foundation/core/Keychain.h"
+#include "support/TempDir.h"
+
+using testsupport::ReadFileBytes;
+using testsupport::WriteFileBytes;
+using tolmocore::Keychain;
+using tolmocore::filesupport::Dir;
+using tolmocore::utility::ToUTF16;
+
+class KeychainTest : public ::testing::Test {
+protected:
+    void SetUp() override { Dir::SetPrefDir(Dir(ToUTF16(mPrefDir.string()))); }
+    void TearDown() override { Dir::SetPrefDir(Dir()); }
+
+    testsupport::TempDir mTemp;
+    std::filesystem::path mPrefDir = mTemp / "prefs" / "host";  // made by the first write
+    std::filesystem::path mStore = mPrefDir / "keychain.store";
+};
+
+TEST_F(KeychainTest, PasswordsRoundTripWhateverTheirText)
+{
+    const UTF16String domain(u"Tarnvault\tÉdition 9.0"), account(u"jöhn\\doe\n");
+    const UTF16String password(u"p\u00e4ss\r\n\t\\t wörd \U0001F511");
+    EXPECT_EQ(Keychain::GetPassword(domain, account), UTF16String());
+    EXPECT_TRUE(Keychain::SetPassword(domain, account, password));
+    EXPECT_TRUE(Keychain::SetPassword(domain, u"other", u"second"));
+    EXPECT_EQ(Keychain::GetPassword(domain, account), password);
+    EXPECT_EQ(Keychain::GetPassword(domain, u"other"), UTF16String(u"second"));
+    EXPECT_EQ(Keychain::GetPassword(u"Tarnvault", account), UTF16String());
+
+    EXPECT_TRUE(Keychain::SetPassword(domain, account, u"replaced"));
+    EXPECT_EQ(Keychain::GetPassword(domain, account), UTF16String(u"replaced"));
+    EXPECT_TRUE(Keychain::RemovePassword(domain, account));
+    EXPECT_EQ(Keychain::GetPassword(domain, account), UTF16String());
+    EXPECT_TRUE(Keychain::RemovePassword(domain, account));
+    EXPECT_EQ(Keychain::GetPassword(domain, u"other"), UTF16String(u"second"));
+}
+
+TEST_F(KeychainTest, StoreIsReadableByTheUserAloneWhateverTheUmask)
+{
+    const mode_t oldMask = ::umask(0);
+    EXPECT_TRUE(Keychain::SetPassword(u"d", u"a", u"secret"));
+    std::filesystem::permissions(mStore, static_cast<std::filesystem::perms>(0644));
+    EXPECT_TRUE(Keychain::SetPassword(u"d", u"b", u"secret"));
+    ::umask(oldMask);
+    struct stat info;
+    ASSERT_EQ(::stat(mStore.c_str(), &info), 0);
+    EXPECT_EQ(info.st_mode & 07777, 0600u);
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(mPrefDir), {}), 1);
+}
+
+TEST_F(KeychainTest, DamagedStoreKeepsWhatCanStillBeRead)
+{
+    std::filesystem::create_directories(mPrefDir);
+    WriteFileBytes(mStore, std::string("tolmonetsync keychain store 1\n"
+                                       "d\ta\tgood\n"
+                                       "garbage without tabs\n"
+                                       "d\tbad\tunknown \\q escape\n"
+                                       "d\tbad2\t\xff\xfe not utf-8\n"
+                                       "d\tb\tgood too\n"
+                                       "d\tcut\tpartial pass"));
+    EXPECT_EQ(Keychain::GetPassword(u"d", u"a"), UTF16String(u"good"));
+    EXPECT_EQ(Keychain::GetPassword(u"d", u"b"), UTF16String(u"good too"));
+    EXPECT_EQ(Keychain::GetPassword(u"d", u"bad"), UTF16String());
+    EXPECT_EQ(Keychain::GetPassword(u"d", u"cut"), UTF16String());
+
+    EXPECT_TRUE(Keychain::SetPassword(u"d", u"c", u"new"));
+    EXPECT_EQ(Keychain::GetPassword(u"d", u"a"), UTF16String(u"good"));
+    EXPECT_EQ(Keychain::GetPassword(u"d", u"b"), UTF16String(u"good too"));
+    EXPECT_EQ(Keychain::GetPassword(u"d", u"c"), UTF16String(u"new"));
+}
+
+TEST_F(KeychainTest, UnreadableStoreIsNeverOverwritten)
+{
+    // A directory in the store's place cannot be read, even by root.
+    std::filesystem::create_directories(mStore);
+    WriteFileBytes(mStore / "inside", "x");
+    EXPECT_EQ(Keychain::GetPassword(u"d", u"a"), UTF16String());
+    EXPECT_FALSE(Keychain::SetPassword(u"d", u"a", u"p"));
+    EXPECT_FALSE(Keychain::RemovePassword(u"d", u"a"));
+    EXPECT_EQ(ReadFileBytes(mStore / "inside"), "x");
+}
+
+TEST_F(KeychainTest, ConcurrentWritersLoseNoEntry)
+{
+    std::vector<std::thread> writers;
+    for (int t = 0; t < 4; ++t)
+        writers.emplace_back([t] {
+            for (int i = 0; i < 10; ++i)
+                Keychain::SetPassword(u"d", ToUTF16(std::to_string(t * 100 + i)), ToUTF16("p" + std::to_string(i)));
+        });
+    for (std::thread& writer : writers) writer.join();
+    for (int t = 0; t < 4; ++t)
+        for (int i = 0; i < 10; ++i)
+            EXPECT_EQ(Keychain::GetPassword(u"d", ToUTF16(std::to_string(t * 100 + i))),
+                      ToUTF16("p" + std::to_string(i)));
+}
