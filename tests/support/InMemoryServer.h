@@ -32,7 +32,7 @@
 //    without one, through the callback on the completion thread. Proving
 //    tokens and refreshing them is the real client's business.
 //
-// For tests: Tree() stages and inspects the service's side; Faults() fails or
+// For tests: Tree() stages and reads the service's side; Faults() fails or
 // refuses chosen requests, counts requests and tells whether a fault fired.
 // Both may be used from any thread at any time.
 //

@@ -33,7 +33,7 @@ boost::shared_ptr<tolmonet::Response> ResponseOf(const InMemoryAnswer& answer)
 // spelled out by hand so that no locale changes it.
 UTF16String HttpDate(const boost::posix_time::ptime& time)
 {
-    if (time.is_special()) return UTF16String();
+    if (time.is_not_a_date_time() || time.is_infinity()) return UTF16String();
     static const char* const kDays[] = {"Sun", "Mon", "Tue", "Wed", "Thu", "Fri", "Sat"};
     static const char* const kMonths[] = {"Jan", "Feb", "Mar", "Apr", "May", "Jun",
                                           "Jul", "Aug", "Sep", "Oct", "Nov", "Dec"};

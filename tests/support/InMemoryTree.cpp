@@ -1,4 +1,4 @@
-// The in-memory service's tree answering requests. Staging, inspection and
+// The in-memory service's tree answering requests. Staging, reading and
 // the clock are in InMemoryTreeStaging.cpp.
 
 #include "support/InMemoryTree.h"

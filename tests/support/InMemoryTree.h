@@ -1,7 +1,7 @@
 #pragma once
 // The service side of the in-memory server: one user's tree of collections
 // and items, answering the requests a real service answers, and letting a
-// test stage and inspect it directly.
+// test stage it and read it directly.
 //
 // What it keeps, per asset: an opaque id, a name (any text, hostile ones
 // included), created and modified dates (UTC, to the microsecond), a trashed
@@ -120,7 +120,7 @@ public:
     // std::runtime_error where the request would fail.
     void Remove(const UTF8String& id);
 
-    // --- Inspection ---
+    // --- Reading ---
 
     bool Exists(const UTF8String& id) const;
     std::size_t AssetCount() const;  // the roots included

@@ -1,4 +1,4 @@
-// How a test stages and inspects the in-memory service's tree, and its clock.
+// How a test stages and reads the in-memory service's tree, and its clock.
 
 #include <algorithm>
 #include <stdexcept>
@@ -113,7 +113,7 @@ void InMemoryTree::Remove(const UTF8String& id)
     if (answer.mStatus != 200) throw std::runtime_error(answer.mError);
 }
 
-// --- Inspection ---
+// --- Reading ---
 
 bool InMemoryTree::Exists(const UTF8String& id) const
 {
