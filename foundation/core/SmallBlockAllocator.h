@@ -19,7 +19,8 @@ public:
     static void* Allocate(std::size_t size) { return ::operator new(size); }
     static void Dispose(void* pointer, std::size_t size) noexcept
     {
-        ::operator delete(pointer, size);
+        (void)size;
+        ::operator delete(pointer);
     }
 
     template <class T>

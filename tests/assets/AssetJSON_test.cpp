@@ -4,6 +4,8 @@
 
 #include <sstream>
 
+#include <boost/date_time/posix_time/posix_time.hpp>
+
 #include "assets/AssetJSON.h"
 #include "foundation/json/JSON.h"
 
