@@ -193,6 +193,21 @@ TEST_F(InMemoryRoots, AnItemWhereThePreferencesRootShouldBeIsAnError)
     EXPECT_EQ(outcome->ErrorBody(), "Too many PreferencesRoot, or bad type, try resetting!");
 }
 
+TEST_F(InMemoryRoots, OnACachedRootTheFirstStepRunsInsideTheCallAndSoDoesItsRefusal)
+{
+    mServer->mClientID = "desk-1";
+    auto root = ServerOutcome::Make();
+    mServer->GetRootAsync(root->OnCollection(), root->OnError(), Guid::CreateUnique());
+    ASSERT_TRUE(root->Wait());
+    mServer->RefuseRequest(InMemoryRequest_Search, 1);
+    auto outcome = ServerOutcome::Make();
+    const Guid id = mServer->GetPreferencesRootAsync(outcome->OnCollection(), outcome->OnError(), Guid());
+    EXPECT_FALSE(id.IsNil());
+    EXPECT_EQ(outcome->Errors(), 1) << "reported before the call returned";
+    EXPECT_EQ(outcome->ErrorBody(), "SearchAsync failed");
+    EXPECT_EQ(outcome->Guids(), std::vector<Guid>(1, id));
+}
+
 // --- Collections and membership ---
 
 class InMemoryCollections : public InMemoryServerTest {};
@@ -256,6 +271,25 @@ TEST_F(InMemoryCollections, AddAppendsTheCallersObjectAndAnAssetMayBeInSeveralCo
     EXPECT_EQ(ChildrenOf(b).front(), item);
     EXPECT_EQ(Tree().ChildIds(a->mId), std::vector<UTF8String>(1, item->mId));
     EXPECT_EQ(Tree().ChildIds(b->mId), std::vector<UTF8String>(1, item->mId));
+}
+
+TEST_F(InMemoryCollections, AddingIntoItselfOrAnAssetTheServerNoLongerHasFailsAndAppendsNothing)
+{
+    boost::shared_ptr<Collection> outer = Group(u"outer");
+    boost::shared_ptr<Collection> inner = Tree().CollectionCopy(Tree().MakeCollection(outer->mId, u"inner"));
+    auto cycle = ServerOutcome::Make();
+    mServer->AddAsync(cycle->OnSuccess(), cycle->OnError(), inner, outer, Guid::CreateUnique());
+    ASSERT_TRUE(cycle->Wait());
+    EXPECT_EQ(cycle->ErrorStatus(), 409);
+
+    boost::shared_ptr<Item> gone = Tree().ItemCopy(Tree().PutItem(UTF8String(), u"gone", ""));
+    Tree().Remove(gone->mId);
+    auto missing = ServerOutcome::Make();
+    mServer->AddAsync(missing->OnSuccess(), missing->OnError(), outer, gone, Guid::CreateUnique());
+    ASSERT_TRUE(missing->Wait());
+    EXPECT_EQ(missing->ErrorStatus(), 404);
+    EXPECT_TRUE(ChildrenOf(inner).empty());
+    EXPECT_TRUE(ChildrenOf(outer).empty());
 }
 
 TEST_F(InMemoryCollections, FetchChildrenEmptiesAtTheCallThenFillsWithFreshCopiesInMemberOrder)
