@@ -1,0 +1,134 @@
+#include "foundation/json/JSONConvert.h"
+
+#include <boost/date_time/posix_time/posix_time.hpp>
+
+namespace tolmocore {
+namespace serialization {
+
+using boost::posix_time::ptime;
+
+template <>
+boost::any JSONConvert<UTF8String>::ToJSON(const UTF8String& value)
+{
+    return boost::any(value);
+}
+
+template <>
+UTF8String JSONConvert<UTF8String>::FromJSON(const boost::any& value)
+{
+    return boost::any_cast<const UTF8String&>(value);
+}
+
+template <>
+boost::any JSONConvert<UTF16String>::ToJSON(const UTF16String& value)
+{
+    return boost::any(utility::UTF16to8(value));
+}
+
+template <>
+UTF16String JSONConvert<UTF16String>::FromJSON(const boost::any& value)
+{
+    return utility::UTF8to16(boost::any_cast<const UTF8String&>(value));
+}
+
+template <>
+boost::any JSONConvert<ImmutableString>::ToJSON(const ImmutableString& value)
+{
+    return boost::any(value.ToUTF8String());
+}
+
+template <>
+ImmutableString JSONConvert<ImmutableString>::FromJSON(const boost::any& value)
+{
+    return ImmutableString::CreateDynamic(boost::any_cast<const UTF8String&>(value));
+}
+
+template <>
+boost::any JSONConvert<std::string>::ToJSON(const std::string& value)
+{
+    return boost::any(UTF8String(value));
+}
+
+template <>
+std::string JSONConvert<std::string>::FromJSON(const boost::any& value)
+{
+    return boost::any_cast<const UTF8String&>(value).ToStdString();
+}
+
+template <>
+boost::any JSONConvert<bool>::ToJSON(const bool& value)
+{
+    return boost::any(value);
+}
+
+template <>
+bool JSONConvert<bool>::FromJSON(const boost::any& value)
+{
+    return boost::any_cast<bool>(value);
+}
+
+template <>
+boost::any JSONConvert<long long>::ToJSON(const long long& value)
+{
+    return boost::any(value);
+}
+
+template <>
+long long JSONConvert<long long>::FromJSON(const boost::any& value)
+{
+    if (const unsigned long long* large = boost::any_cast<unsigned long long>(&value)) {
+        return static_cast<long long>(*large);
+    }
+    return boost::any_cast<long long>(value);
+}
+
+template <>
+boost::any JSONConvert<double>::ToJSON(const double& value)
+{
+    return boost::any(value);
+}
+
+template <>
+double JSONConvert<double>::FromJSON(const boost::any& value)
+{
+    if (const long long* integer = boost::any_cast<long long>(&value)) {
+        return static_cast<double>(*integer);
+    }
+    if (const unsigned long long* large = boost::any_cast<unsigned long long>(&value)) {
+        return static_cast<double>(*large);
+    }
+    return boost::any_cast<double>(value);
+}
+
+template <>
+boost::any JSONConvert<Guid>::ToJSON(const Guid& value)
+{
+    return boost::any(value.AsUTF8String());
+}
+
+template <>
+Guid JSONConvert<Guid>::FromJSON(const boost::any& value)
+{
+    // The text's own length, not 36: a short string must be refused, not overrun.
+    const UTF8String& text = boost::any_cast<const UTF8String&>(value);
+    return StringToGUID(text.data(), text.size());
+}
+
+template <>
+boost::any JSONConvert<ptime>::ToJSON(const ptime& value)
+{
+    return boost::any(value.is_not_a_date_time()
+                          ? UTF8String()
+                          : UTF8String(boost::posix_time::to_simple_string(value)));
+}
+
+template <>
+ptime JSONConvert<ptime>::FromJSON(const boost::any& value)
+{
+    const UTF8String& text = boost::any_cast<const UTF8String&>(value);
+    if (text.empty()) return ptime(boost::posix_time::not_a_date_time);
+    return boost::date_time::parse_delimited_time<ptime>(text.ToStdString(), ' ');
+}
+
+}  // namespace serialization
+}  // namespace tolmocore
