@@ -1,0 +1,95 @@
+#pragma once
+// One HTTP exchange on a libcurl easy handle: what to send, and what came back.
+//
+// Made on the thread that calls a verb; from then on touched only by the
+// network thread, apart from mCancelled.
+
+#include <memory>
+#include <string>
+#include <vector>
+
+#include <curl/curl.h>
+
+#include "foundation/net/RequestProcessor.h"
+
+namespace tolmonet {
+namespace http {
+
+enum HttpMethod {
+    HttpMethod_GET,
+    HttpMethod_HEAD,
+    HttpMethod_PUT,
+    HttpMethod_POST,
+    HttpMethod_PATCH,
+    HttpMethod_DELETE,
+};
+
+const char* MethodName(HttpMethod method);
+
+// What every transfer of one processor shares; outlives its transfers.
+struct CurlTransferEnvironment {
+    std::string mCAFile;   // empty: the system's store
+    std::string mNoProxy;  // hosts that never go through a proxy
+};
+
+// Time-outs fixed when the request is taken.
+struct CurlTransferTimeouts {
+    long mConnectMilliseconds;
+    long mStallSeconds;
+};
+
+class CurlTransfer {
+public:
+    // `contentType` is sent when the headers name none; null sends no
+    // Content-Type at all rather than libcurl's form default.
+    CurlTransfer(const Guid& requestUID, const ResponseHandler& handler, HttpMethod method,
+                 const ImmutableString& url, const RequestProcessor::Body& body, const HeaderList& headers,
+                 const char* contentType, const CurlTransferTimeouts& timeouts);
+    ~CurlTransfer();
+    CurlTransfer(const CurlTransfer&) = delete;
+    CurlTransfer& operator=(const CurlTransfer&) = delete;
+
+    const Guid& RequestUID() const { return mRequestUID; }
+    HttpMethod Method() const { return mMethod; }
+    // The URL without its query, which may carry secrets; for trace lines.
+    std::string UrlForTrace() const;
+
+    // Gives `easy` (fresh or reset) every option of this request.
+    void Attach(CURL* easy, const CurlTransferEnvironment& environment);
+    CURL* Handle() const { return mEasy; }
+    // Hands the easy handle back; the transfer no longer uses it.
+    CURL* Detach();
+
+    // What the handler gets once libcurl reports the end of the transfer.
+    boost::shared_ptr<Response> MakeResponse(CURLcode result);
+    static boost::shared_ptr<Response> MakeCancelledResponse();
+    static boost::shared_ptr<Response> MakeFailureResponse(const UTF8String& text);
+
+    ResponseHandler& Handler() { return mHandler; }
+
+    // Set when TryToCancelRequest reached the request while it was live.
+    // Guarded by the network loop's mutex.
+    bool mCancelled = false;
+
+private:
+    static size_t OnHeader(char* data, size_t size, size_t count, void* self);
+    static size_t OnBody(char* data, size_t size, size_t count, void* self);
+    void AddHeaderLine(const char* data, size_t length);
+
+    const Guid mRequestUID;
+    ResponseHandler mHandler;
+    const HttpMethod mMethod;
+    const std::string mUrl;
+    const RequestProcessor::Body mBody;
+    curl_slist* mRequestHeaders = nullptr;
+    const CurlTransferTimeouts mTimeouts;
+
+    CURL* mEasy = nullptr;
+    char mErrorText[CURL_ERROR_SIZE];
+    HeaderList mResponseHeaders;
+    boost::shared_ptr<std::vector<unsigned char> > mResponseBody;
+    bool mOutOfMemory = false;
+};
+
+}  // namespace http
+}  // namespace tolmonet

@@ -1,0 +1,214 @@
+// Request identifiers, cancellation and the completion thread, over loopback.
+
+#include <atomic>
+#include <map>
+#include <thread>
+
+#include <gtest/gtest.h>
+
+#include "foundation/net/CurlRequestProcessor.h"
+#include "support/LoopbackHttpServer.h"
+#include "support/ResponseRecorder.h"
+
+using namespace tolmonet;
+using namespace tolmonet::http;
+using testsupport::HttpAnswer;
+using testsupport::HttpRequest;
+
+namespace {
+
+// "/hang" never gets an answer; anything else gets its body back.
+HttpAnswer EchoOrHang(const HttpRequest& request)
+{
+    HttpAnswer answer;
+    if (request.mTarget == "/hang") answer.mFault = HttpAnswer::Fault_NeverAnswer;
+    answer.mBody = request.mBody;
+    return answer;
+}
+
+class CurlIdentifiersTest : public ::testing::Test {
+protected:
+    explicit CurlIdentifiersTest(const CurlProcessorSettings& settings = CurlProcessorSettings())
+        : mServer(&EchoOrHang), mProcessor(new CurlRequestProcessor(settings)), mRecorder(*mProcessor)
+    {
+    }
+
+    bool Get(const Guid& requestUID, const std::string& target, const ResponseHandler& handler)
+    {
+        return mProcessor->GET(requestUID, handler, ImmutableString::CreateDynamic(mServer.Url(target)), HeaderList(),
+                               Configuration());
+    }
+
+    static void ExpectCancelled(const testsupport::RecordedResponse& recorded)
+    {
+        ASSERT_TRUE(recorded.mResponse);
+        EXPECT_EQ(recorded.mResponse->status, kStatusNoResponse);
+        EXPECT_EQ(recorded.mResponse->BodyText().ToStdString(), "Request cancelled");
+    }
+
+    testsupport::LoopbackHttpServer mServer;
+    boost::shared_ptr<CurlRequestProcessor> mProcessor;
+    testsupport::ResponseRecorder mRecorder;
+};
+
+TEST_F(CurlIdentifiersTest, ManyRequestsFromSeveralThreadsEachGetOneHandlerCallInTurn)
+{
+    constexpr int kThreads = 4;
+    constexpr int kPerThread = 50;
+    std::vector<std::thread> threads;
+    std::atomic<int> refused{0};
+    for (int t = 0; t < kThreads; ++t) {
+        threads.emplace_back([&, t] {
+            for (int i = 0; i < kPerThread; ++i) {
+                const std::string text = std::to_string(t * kPerThread + i);
+                // Every fifth request shares the nil identifier with others.
+                const Guid requestUID = i % 5 == 0 ? Guid() : Guid::CreateUnique();
+                if (!mProcessor->POST(requestUID, mRecorder.Handler(), ImmutableString::CreateDynamic(mServer.Url("/")),
+                                      RecycledMemory::CopyOf(text.data(), text.size()), HeaderList(), Configuration()))
+                    ++refused;
+            }
+        });
+    }
+    for (std::thread& thread : threads) thread.join();
+    ASSERT_EQ(refused, 0);
+    ASSERT_TRUE(mRecorder.WaitFor(kThreads * kPerThread));
+
+    std::map<std::string, int> calls;
+    for (const auto& recorded : mRecorder.Responses()) {
+        EXPECT_TRUE(recorded.mOnCompletionThread);
+        ASSERT_TRUE(recorded.mResponse);
+        EXPECT_EQ(recorded.mResponse->status, 200);
+        ++calls[recorded.mResponse->BodyText().ToStdString()];
+    }
+    EXPECT_EQ(calls.size(), static_cast<size_t>(kThreads * kPerThread));
+    for (const auto& call : calls) EXPECT_EQ(call.second, 1) << "body " << call.first;
+    EXPECT_EQ(mRecorder.Overlaps(), 0u);
+}
+
+TEST_F(CurlIdentifiersTest, HandlerStartsTheNextStepUnderItsOwnIdentifier)
+{
+    const Guid chain = Guid::CreateUnique();
+    std::atomic<bool> nextTaken{false};
+    ASSERT_TRUE(Get(chain, "/step1", mRecorder.Handler([&](const Guid& requestUID, const boost::shared_ptr<Response>&) {
+        nextTaken = Get(requestUID, "/step2", mRecorder.Handler());
+    })));
+    ASSERT_TRUE(mRecorder.WaitFor(2));
+    EXPECT_TRUE(nextTaken);
+    for (const auto& recorded : mRecorder.Responses()) {
+        EXPECT_EQ(recorded.mRequestUID, chain);
+        EXPECT_EQ(recorded.mResponse->status, 200);
+    }
+    EXPECT_EQ(mServer.RequestsReceived(), 2u);
+}
+
+TEST_F(CurlIdentifiersTest, LiveIdentifierIsRefusedAndFreeAgainOnceCancelled)
+{
+    const Guid requestUID = Guid::CreateUnique();
+    ASSERT_TRUE(Get(requestUID, "/hang", mRecorder.Handler()));
+    EXPECT_FALSE(Get(requestUID, "/other", mRecorder.Handler())) << "a second request under a live identifier";
+    EXPECT_FALSE(Get(Guid::CreateUnique(), "/other", ResponseHandler())) << "an empty handler";
+    ASSERT_TRUE(mServer.WaitForRequests(1, std::chrono::seconds(30)));
+
+    mProcessor->TryToCancelRequest(requestUID);
+    ASSERT_TRUE(Get(requestUID, "/after", mRecorder.Handler())) << "cancelling retires the identifier";
+    ASSERT_TRUE(mRecorder.WaitFor(2));
+    const auto responses = mRecorder.Responses();
+    ASSERT_EQ(responses.size(), 2u) << "the refused requests never call back";
+    ExpectCancelled(responses[0]);
+    EXPECT_EQ(responses[1].mResponse->status, 200);
+    EXPECT_EQ(mServer.RequestsReceived(), 2u);
+}
+
+TEST_F(CurlIdentifiersTest, CancelRightAfterStartReportsCancelled)
+{
+    constexpr size_t kRequests = 40;
+    for (size_t i = 0; i < kRequests; ++i) {
+        const Guid requestUID = Guid::CreateUnique();
+        ASSERT_TRUE(Get(requestUID, "/hang", mRecorder.Handler()));
+        mProcessor->TryToCancelRequest(requestUID);
+    }
+    ASSERT_TRUE(mRecorder.WaitFor(kRequests));
+    for (const auto& recorded : mRecorder.Responses()) ExpectCancelled(recorded);
+}
+
+TEST_F(CurlIdentifiersTest, UnknownAndNilIdentifiersCancelNothing)
+{
+    ASSERT_TRUE(Get(Guid(), "/a", mRecorder.Handler()));
+    ASSERT_TRUE(Get(Guid(), "/b", mRecorder.Handler())) << "nil may be used by several requests at once";
+    mProcessor->TryToCancelRequest(Guid());
+    mProcessor->TryToCancelRequest(Guid::CreateUnique());
+    ASSERT_TRUE(mRecorder.WaitFor(2));
+    for (const auto& recorded : mRecorder.Responses()) EXPECT_EQ(recorded.mResponse->status, 200);
+}
+
+TEST_F(CurlIdentifiersTest, CallAsynchronouslyRunsOnTheCompletionThreadAfterItsDelay)
+{
+    std::vector<std::string> order;  // touched on the completion thread only
+    std::atomic<bool> onCompletionThread{true};
+    const auto started = std::chrono::steady_clock::now();
+    std::chrono::steady_clock::duration delayed{};
+    mProcessor->CallAsynchronously([&] {
+        delayed = std::chrono::steady_clock::now() - started;
+        order.push_back("delayed");
+        Get(Guid(), "/last", mRecorder.Handler());
+    }, 100);
+    mProcessor->CallAsynchronously([&] {
+        onCompletionThread = onCompletionThread && mProcessor->CurrentThreadIsCompletionThread();
+        order.push_back("at once");
+    }, 0);
+    EXPECT_FALSE(mProcessor->CurrentThreadIsCompletionThread());
+    ASSERT_TRUE(mRecorder.WaitFor(1));
+    EXPECT_TRUE(onCompletionThread);
+    EXPECT_EQ(order, (std::vector<std::string>{"at once", "delayed"}));
+    EXPECT_GE(delayed, std::chrono::milliseconds(100));
+}
+
+// One connection to the server: the second request waits inside libcurl.
+class CurlIdentifiersOneConnectionTest : public CurlIdentifiersTest {
+protected:
+    static CurlProcessorSettings OneConnection()
+    {
+        CurlProcessorSettings settings;
+        settings.mMaxConnectionsPerHost = 1;
+        return settings;
+    }
+    CurlIdentifiersOneConnectionTest() : CurlIdentifiersTest(OneConnection()) {}
+};
+
+TEST_F(CurlIdentifiersOneConnectionTest, CancelEndsRunningAndWaitingRequests)
+{
+    const Guid running = Guid::CreateUnique();
+    const Guid waiting = Guid::CreateUnique();
+    ASSERT_TRUE(Get(running, "/hang", mRecorder.Handler()));
+    ASSERT_TRUE(mServer.WaitForRequests(1, std::chrono::seconds(30)));
+    ASSERT_TRUE(Get(waiting, "/hang", mRecorder.Handler()));
+
+    mProcessor->TryToCancelRequest(waiting);
+    ASSERT_TRUE(mRecorder.WaitFor(1));
+    EXPECT_EQ(mRecorder.Responses().at(0).mRequestUID, waiting);
+    mProcessor->TryToCancelRequest(running);
+    ASSERT_TRUE(mRecorder.WaitFor(2));
+    EXPECT_EQ(mRecorder.Responses().at(1).mRequestUID, running);
+    for (const auto& recorded : mRecorder.Responses()) ExpectCancelled(recorded);
+    EXPECT_EQ(mServer.RequestsReceived(), 1u) << "the waiting request never left";
+}
+
+TEST(CurlWaitingForAConnection, WaitIsNotCountedAgainstTheConnectTimeout)
+{
+    testsupport::LoopbackHttpServer slowServer([](const HttpRequest&) {
+        std::this_thread::sleep_for(std::chrono::milliseconds(600));
+        return HttpAnswer();
+    });
+    CurlProcessorSettings settings;
+    settings.mConnectTimeout = std::chrono::milliseconds(200);
+    settings.mMaxConnectionsPerHost = 1;
+    CurlRequestProcessor processor(settings);
+    testsupport::ResponseRecorder recorder(processor);
+    for (int i = 0; i < 3; ++i)
+        ASSERT_TRUE(processor.GET(Guid::CreateUnique(), recorder.Handler(),
+                                  ImmutableString::CreateDynamic(slowServer.Url("/")), HeaderList(), Configuration()));
+    ASSERT_TRUE(recorder.WaitFor(3));
+    for (const auto& recorded : recorder.Responses()) EXPECT_EQ(recorded.mResponse->status, 200);
+}
+
+}  // namespace

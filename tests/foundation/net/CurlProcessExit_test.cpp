@@ -1,0 +1,166 @@
+// At process exit the process-wide processor stops: the handler running at
+// that moment finishes, no other handler runs and none is destroyed, and the
+// process exits with its own status. Each case runs in a child process made
+// from this test binary.
+
+#include <spawn.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <atomic>
+#include <cstdlib>
+#include <thread>
+
+#include <boost/make_shared.hpp>
+#include <gtest/gtest.h>
+
+#include "foundation/net/RequestProcessor.h"
+#include "support/LoopbackHttpServer.h"
+#include "support/TempDir.h"
+
+extern char** environ;
+
+using namespace tolmonet;
+using namespace tolmonet::http;
+using testsupport::HttpAnswer;
+
+namespace {
+
+constexpr const char* kDirVariable = "TOLMONETSYNC_EXIT_TEST_DIR";
+constexpr const char* kModeVariable = "TOLMONETSYNC_EXIT_TEST_MODE";
+
+void Touch(const std::string& directory, const char* name)
+{
+    testsupport::WriteFileBytes(std::filesystem::path(directory) / name, name);
+}
+
+// Leaves a file behind when the last handler holding it is destroyed.
+struct DestructionMarker {
+    DestructionMarker(const std::string& directory, const char* name) : mDirectory(directory), mName(name) {}
+    ~DestructionMarker() { Touch(mDirectory, mName); }
+    const std::string mDirectory;
+    const char* const mName;
+};
+
+// Plain atomics: they outlive every hook of exit.
+std::atomic<bool> sExitBegan{false};
+std::atomic<bool> sSlowStarted{false};
+
+template <class Condition>
+bool WaitUntil(Condition condition)
+{
+    for (int i = 0; i < 2000 && !condition(); ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    return condition();
+}
+
+// In the child: requests in flight to a server that never answers (made here,
+// and never destroyed, so that they stay in flight), then exit one way or
+// another. A handler that runs writes "handler-ran".
+TEST(ProcessExitChild, DISABLED_ExitsWithWorkPending)
+{
+    const char* directoryVariable = std::getenv(kDirVariable);
+    const char* modeVariable = std::getenv(kModeVariable);
+    if (!directoryVariable || !modeVariable) GTEST_SKIP() << "run by ProcessExitTest only";
+    const std::string directory = directoryVariable;
+    const std::string mode = modeVariable;
+
+    static auto* sSilentServer = new testsupport::LoopbackHttpServer([](const testsupport::HttpRequest&) {
+        HttpAnswer answer;
+        answer.mFault = HttpAnswer::Fault_NeverAnswer;
+        return answer;
+    });
+    const boost::shared_ptr<RequestProcessor> processor = GetGlobalRequestProcessor();
+    auto marker = boost::make_shared<DestructionMarker>(directory, "request-handler-destroyed");
+    for (int i = 0; i < 3; ++i)
+        ASSERT_TRUE(processor->GET(Guid::CreateUnique(),
+                                   [directory, marker](const Guid&, const boost::shared_ptr<Response>&) {
+                                       Touch(directory, "handler-ran");
+                                   },
+                                   ImmutableString::CreateDynamic(sSilentServer->Url("/")), HeaderList(),
+                                   Configuration()));
+    ASSERT_TRUE(sSilentServer->WaitForRequests(3, std::chrono::seconds(20)));
+
+    if (mode == "exit-in-handler") {
+        processor->CallAsynchronously([] { std::exit(0); }, 0);
+    } else {
+        std::atexit([] { sExitBegan = true; });  // runs before the processor's own hook
+        processor->CallAsynchronously([directory] {
+            sSlowStarted = true;
+            WaitUntil([] { return sExitBegan.load(); });
+            // Long enough that an exit that did not wait would end the process first.
+            std::this_thread::sleep_for(std::chrono::milliseconds(300));
+            Touch(directory, "slow-finished");
+        }, 0);
+    }
+    marker.reset();
+    auto queuedMarker = boost::make_shared<DestructionMarker>(directory, "queued-handler-destroyed");
+    processor->CallAsynchronously([directory, queuedMarker] { Touch(directory, "handler-ran"); }, 0);
+    queuedMarker.reset();
+    ASSERT_TRUE(mode == "exit-in-handler" || WaitUntil([] { return sSlowStarted.load(); }));
+    if (mode == "exit-in-handler") {
+        for (;;) pause();  // the completion thread ends the process
+    }
+}
+
+class ProcessExitTest : public ::testing::Test {
+protected:
+    // Runs the child case in `mode`; its exit status, or -1 if it did not exit normally.
+    int RunChild(const std::string& mode)
+    {
+        // Set by CTest; a run by hand falls back to this very binary.
+        const char* fromEnvironment = std::getenv("TOLMONETSYNC_TEST_BINARY");
+        const std::string binaryPath =
+            fromEnvironment ? fromEnvironment : std::filesystem::read_symlink("/proc/self/exe").string();
+        const char* binary = binaryPath.c_str();
+        std::vector<std::string> variables;
+        for (char** variable = environ; *variable; ++variable) variables.emplace_back(*variable);
+        variables.push_back(std::string(kDirVariable) + "=" + mDirectory.Path().string());
+        variables.push_back(std::string(kModeVariable) + "=" + mode);
+        std::vector<std::string> arguments = {binary, "--gtest_also_run_disabled_tests",
+                                              "--gtest_filter=ProcessExitChild.DISABLED_ExitsWithWorkPending"};
+        std::vector<char*> argv, envp;
+        for (std::string& argument : arguments) argv.push_back(argument.data());
+        for (std::string& variable : variables) envp.push_back(variable.data());
+        argv.push_back(nullptr);
+        envp.push_back(nullptr);
+
+        pid_t child = 0;
+        if (posix_spawn(&child, binary, nullptr, nullptr, argv.data(), envp.data()) != 0) {
+            ADD_FAILURE() << "cannot start " << binary;
+            return -1;
+        }
+        int status = 0;
+        bool exited = false;
+        WaitUntil([&] { return exited = exited || waitpid(child, &status, WNOHANG) == child; });
+        if (!exited) {
+            kill(child, SIGKILL);
+            waitpid(child, &status, 0);
+            ADD_FAILURE() << "the child did not exit: exit hangs";
+            return -1;
+        }
+        return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+    }
+
+    bool Left(const char* name) const { return std::filesystem::exists(mDirectory / name); }
+
+    testsupport::TempDir mDirectory;
+};
+
+TEST_F(ProcessExitTest, ExitWaitsForTheRunningHandlerAndRunsOrDestroysNoOther)
+{
+    ASSERT_EQ(RunChild("exit-while-handler-runs"), 0);
+    EXPECT_TRUE(Left("slow-finished"));
+    EXPECT_FALSE(Left("handler-ran"));
+    EXPECT_FALSE(Left("request-handler-destroyed"));
+    EXPECT_FALSE(Left("queued-handler-destroyed"));
+}
+
+TEST_F(ProcessExitTest, ExitFromInsideAHandlerEndsTheProcessCleanly)
+{
+    ASSERT_EQ(RunChild("exit-in-handler"), 0);
+    EXPECT_FALSE(Left("handler-ran"));
+    EXPECT_FALSE(Left("request-handler-destroyed"));
+    EXPECT_FALSE(Left("queued-handler-destroyed"));
+}
+
+}  // namespace
