@@ -47,7 +47,13 @@ std::map<std::string, std::string> InMemoryScenarioServer::Items(const std::stri
     const UTF8String id = Group(group, false);
     if (id.empty()) return items;
     testsupport::InMemoryTree& tree = mServer->Tree();
-    for (const UTF8String& child : tree.ChildIds(id)) items[ToNarrow(tree.Name(child))] = tree.Content(child);
+    for (const UTF8String& child : tree.ChildIds(id)) {
+        try {
+            items[ToNarrow(tree.Name(child))] = tree.Content(child);
+        } catch (const std::exception&) {
+            // A collection inside a group has no content; it is no item.
+        }
+    }
     return items;
 }
 
