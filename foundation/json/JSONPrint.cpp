@@ -2,6 +2,7 @@
 #include <cmath>
 #include <cstring>
 #include <string>
+#include <typeinfo>
 
 #include <boost/core/demangle.hpp>
 
@@ -40,6 +41,48 @@ std::size_t ValidSequenceLength(const unsigned char* bytes, std::size_t size)
     return length;
 }
 
+// What a value holds. Kind_Other is no JSON.
+enum Kind {
+    Kind_String,
+    Kind_Object,
+    Kind_Array,
+    Kind_Integer,
+    Kind_Bool,
+    Kind_Double,
+    Kind_Unsigned,
+    Kind_Other
+};
+
+// Almost always one type_info object stands for a type, so comparing
+// addresses settles the kind with one load per candidate; an equal type
+// described by a second object (from another module) takes the full
+// comparison, which compares names.
+Kind KindOf(const std::type_info& type)
+{
+    static const std::type_info* const kTypes[] = {
+        &typeid(UTF8String), &typeid(JSONObject), &typeid(JSONArray),
+        &typeid(long long),  &typeid(bool),       &typeid(double),
+        &typeid(unsigned long long)};
+    for (int kind = 0; kind < Kind_Other; ++kind) {
+        if (&type == kTypes[kind]) return static_cast<Kind>(kind);
+    }
+    for (int kind = 0; kind < Kind_Other; ++kind) {
+        if (type == *kTypes[kind]) return static_cast<Kind>(kind);
+    }
+    return Kind_Other;
+}
+
+// Bytes that go out as they are: printable ASCII but the quote and the backslash.
+struct PlainBytes {
+    constexpr PlainBytes() : mPlain()
+    {
+        for (int byte = 0x20; byte < 0x80; ++byte) mPlain[byte] = byte != '"' && byte != '\\';
+    }
+    constexpr bool operator[](unsigned char byte) const { return mPlain[byte]; }
+    bool mPlain[256];
+};
+constexpr PlainBytes kPlain;
+
 class Printer {
 public:
     explicit Printer(UTF8String& out) : mOut(out) {}
@@ -48,45 +91,58 @@ public:
     {
         if (!value || value->empty()) {
             Append("null", 4);
-        } else if (const UTF8String* text = boost::any_cast<UTF8String>(value)) {
-            PrintString(*text);
-        } else if (const JSONObject* object = boost::any_cast<JSONObject>(value)) {
-            CheckDepth(depth);
-            mOut.push_back('{');
-            bool first = true;
-            for (const JSONObject::value_type& member : *object) {
-                if (!first) mOut.push_back(',');
-                first = false;
-                PrintString(member.first);
-                mOut.push_back(':');
-                Print(member.second.get(), depth + 1);
+            return;
+        }
+        switch (KindOf(value->type())) {
+            case Kind_String:
+                PrintString(*boost::unsafe_any_cast<UTF8String>(value));
+                break;
+            case Kind_Object: {
+                CheckDepth(depth);
+                mOut.push_back('{');
+                bool first = true;
+                for (const JSONObject::value_type& member : *boost::unsafe_any_cast<JSONObject>(value)) {
+                    if (!first) mOut.push_back(',');
+                    first = false;
+                    PrintString(member.first);
+                    mOut.push_back(':');
+                    Print(member.second.get(), depth + 1);
+                }
+                mOut.push_back('}');
+                break;
             }
-            mOut.push_back('}');
-        } else if (const JSONArray* array = boost::any_cast<JSONArray>(value)) {
-            CheckDepth(depth);
-            mOut.push_back('[');
-            bool first = true;
-            for (const boost::shared_ptr<boost::any>& element : *array) {
-                if (!first) mOut.push_back(',');
-                first = false;
-                Print(element.get(), depth + 1);
+            case Kind_Array: {
+                CheckDepth(depth);
+                mOut.push_back('[');
+                bool first = true;
+                for (const boost::shared_ptr<boost::any>& element :
+                     *boost::unsafe_any_cast<JSONArray>(value)) {
+                    if (!first) mOut.push_back(',');
+                    first = false;
+                    Print(element.get(), depth + 1);
+                }
+                mOut.push_back(']');
+                break;
             }
-            mOut.push_back(']');
-        } else if (const long long* integer = boost::any_cast<long long>(value)) {
-            PrintNumber(*integer);
-        } else if (const bool* flag = boost::any_cast<bool>(value)) {
-            if (*flag) {
-                Append("true", 4);
-            } else {
-                Append("false", 5);
-            }
-        } else if (const double* number = boost::any_cast<double>(value)) {
-            PrintDouble(*number);
-        } else if (const unsigned long long* large = boost::any_cast<unsigned long long>(value)) {
-            PrintNumber(*large);
-        } else {
-            throw JSONError(std::string("a JSON tree cannot hold a value of type ") +
-                            boost::core::demangle(value->type().name()));
+            case Kind_Integer:
+                PrintNumber(*boost::unsafe_any_cast<long long>(value));
+                break;
+            case Kind_Bool:
+                if (*boost::unsafe_any_cast<bool>(value)) {
+                    Append("true", 4);
+                } else {
+                    Append("false", 5);
+                }
+                break;
+            case Kind_Double:
+                PrintDouble(*boost::unsafe_any_cast<double>(value));
+                break;
+            case Kind_Unsigned:
+                PrintNumber(*boost::unsafe_any_cast<unsigned long long>(value));
+                break;
+            case Kind_Other:
+                throw JSONError(std::string("a JSON tree cannot hold a value of type ") +
+                                boost::core::demangle(value->type().name()));
         }
     }
 
@@ -142,7 +198,7 @@ private:
         std::size_t i = 0;
         while (i < size) {
             const unsigned char byte = bytes[i];
-            if (byte >= 0x20 && byte < 0x80 && byte != '"' && byte != '\\') {
+            if (kPlain[byte]) {
                 ++i;
                 continue;
             }
