@@ -61,14 +61,17 @@ private:
             if (mLeftToStart == 0) return;
             --mLeftToStart;
         }
-        mProcessor.GET(Guid::CreateUnique(), [this](const Guid&, const boost::shared_ptr<Response>& response) {
-            benchmark::DoNotOptimize(response->body);
-            {
-                std::lock_guard<std::mutex> lock(mMutex);
-                if (--mLeftToFinish == 0) mDone.notify_one();
-            }
-            StartOne();
-        }, mUrl, HeaderList(), Configuration());
+        mProcessor.GET(
+            Guid::CreateUnique(),
+            [this](const Guid&, const boost::shared_ptr<Response>& response) {
+                benchmark::DoNotOptimize(response->body);
+                {
+                    std::lock_guard<std::mutex> lock(mMutex);
+                    if (--mLeftToFinish == 0) mDone.notify_one();
+                }
+                StartOne();
+            },
+            mUrl, HeaderList(), Configuration());
     }
 
     RequestProcessor& mProcessor;

@@ -2,6 +2,8 @@
 
 #include <exception>
 
+#include <pthread.h>
+
 #include "foundation/core/Trace.h"
 
 namespace tolmonet {
@@ -63,6 +65,7 @@ void CompletionQueue::PostAfter(CompletionJob job, std::chrono::milliseconds del
 
 void CompletionQueue::Run()
 {
+    pthread_setname_np(pthread_self(), "tolmo-handlers");
     std::unique_lock<std::mutex> lock(mMutex);
     while (!mStopping) {
         if (!mTimed.empty()) {

@@ -65,9 +65,9 @@ private:
 
     mutable std::mutex mMutex;
     std::condition_variable mWake;
-    std::deque<CompletionJob> mReady;                      // guarded by mMutex
+    std::deque<CompletionJob> mReady;                        // guarded by mMutex
     std::multimap<Clock::time_point, CompletionJob> mTimed;  // guarded by mMutex; equal times keep post order
-    bool mStopping = false;                                // guarded by mMutex
+    bool mStopping = false;                                  // guarded by mMutex
     std::thread mThread;
     std::thread::id mThreadId;  // written before any job can run, then constant
 };

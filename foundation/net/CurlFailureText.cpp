@@ -54,16 +54,14 @@ UTF8String DescribeCurlFailure(CURL* easy, CURLcode result, const char* errorTex
         long osError = 0;
         curl_easy_getinfo(easy, CURLINFO_OS_ERRNO, &osError);
         const std::string where = HostAndPort(easy);
-        if (osError != 0 && !where.empty())
-            return OneLine("Could not connect to " + where + ": " + ErrnoText(osError));
+        if (osError != 0 && !where.empty()) return OneLine("Could not connect to " + where + ": " + ErrnoText(osError));
     }
     std::string text = errorText ? errorText : "";
     if (text.empty()) text = curl_easy_strerror(result);
     if (text.empty()) text = "The request failed without an HTTP answer";
     // These texts do not say which server it was.
     const bool namesNoServer = result == CURLE_OPERATION_TIMEDOUT || result == CURLE_PARTIAL_FILE ||
-                               result == CURLE_GOT_NOTHING || result == CURLE_RECV_ERROR ||
-                               result == CURLE_SEND_ERROR;
+                               result == CURLE_GOT_NOTHING || result == CURLE_RECV_ERROR || result == CURLE_SEND_ERROR;
     const std::string where = namesNoServer ? HostAndPort(easy) : std::string();
     if (!where.empty()) text += " (" + where + ")";
     return OneLine(text);

@@ -4,6 +4,7 @@
 #include <cstring>
 #include <stdexcept>
 
+#include <pthread.h>
 #include <sys/eventfd.h>
 #include <unistd.h>
 
@@ -58,7 +59,10 @@ CurlNetworkLoop::CurlNetworkLoop(const CurlTransferEnvironment& environment, lon
     mThread = std::thread([this] { Run(); });
 }
 
-CurlNetworkLoop::~CurlNetworkLoop() { Stop(); }
+CurlNetworkLoop::~CurlNetworkLoop()
+{
+    Stop();
+}
 
 bool CurlNetworkLoop::Start(std::unique_ptr<CurlTransfer>& transfer)
 {
@@ -121,6 +125,7 @@ void CurlNetworkLoop::Poll()
 
 void CurlNetworkLoop::Run()
 {
+    pthread_setname_np(pthread_self(), "tolmo-network");
     std::vector<std::unique_ptr<CurlTransfer> > incoming;
     std::vector<std::unique_ptr<CurlTransfer> > cancelled;
     for (;;) {
@@ -128,7 +133,8 @@ void CurlNetworkLoop::Run()
         {
             std::lock_guard<std::mutex> lock(mMutex);
             if (mStopping) return;
-            for (auto& transfer : mIncoming) (transfer->mCancelled ? cancelled : incoming).push_back(std::move(transfer));
+            for (auto& transfer : mIncoming)
+                (transfer->mCancelled ? cancelled : incoming).push_back(std::move(transfer));
             mIncoming.clear();
             cancelPending = mCancelPending;
             mCancelPending = false;
@@ -203,7 +209,8 @@ void CurlNetworkLoop::Finish(CurlTransfer* transfer, CURLcode result, bool cance
     boost::shared_ptr<Response> response;
     if (!cancelled) response = transfer->MakeResponse(result);
     curl_multi_remove_handle(mMulti, transfer->Handle());
-    RecycleHandle(transfer->Detach());
+    // Reset after the handler is on its way: a chain's next step waits for it.
+    CURL* easy = transfer->Detach();
     {
         // A cancel that reached the request while it was live decides the
         // outcome, even when the answer came in the meantime.
@@ -213,6 +220,7 @@ void CurlNetworkLoop::Finish(CurlTransfer* transfer, CURLcode result, bool cance
     }
     if (cancelled) response = CurlTransfer::MakeCancelledResponse();
     Deliver(std::move(owned), response);
+    RecycleHandle(easy);
 }
 
 void CurlNetworkLoop::Deliver(std::unique_ptr<CurlTransfer> transfer, const boost::shared_ptr<Response>& response)

@@ -8,8 +8,8 @@
 #include <unordered_map>
 #include <vector>
 
-#include <boost/shared_ptr.hpp>
 #include <curl/curl.h>
+#include <boost/shared_ptr.hpp>
 
 #include "foundation/net/CompletionQueue.h"
 #include "foundation/net/CurlTransfer.h"
@@ -70,7 +70,7 @@ private:
 
     std::mutex mMutex;
     std::unordered_map<Guid, CurlTransfer*, GuidHash> mLive;  // guarded by mMutex
-    std::vector<std::unique_ptr<CurlTransfer> > mIncoming;   // guarded by mMutex
+    std::vector<std::unique_ptr<CurlTransfer> > mIncoming;    // guarded by mMutex
     bool mCancelPending = false;                              // guarded by mMutex
     bool mStopping = false;                                   // guarded by mMutex
     bool mPolling = false;  // guarded by mMutex: the thread waits in curl_multi_poll, needs a wake

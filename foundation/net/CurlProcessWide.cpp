@@ -30,8 +30,8 @@ boost::shared_ptr<RequestProcessor> CurlRequestProcessor::CreateProcessWide()
         // their making, so these outlive the hook. libcurl's TLS library
         // registers its own exit cleanup here as well.
         tolmocore::debug::TraceChangeCount();
-        sProcessWide = new boost::shared_ptr<CurlRequestProcessor>(
-            new CurlRequestProcessor(settings, &sProcessWideTimeouts));
+        sProcessWide =
+            new boost::shared_ptr<CurlRequestProcessor>(new CurlRequestProcessor(settings, &sProcessWideTimeouts));
         (*sProcessWide)->GetProcessUniqueID();
         std::atexit(&CurlRequestProcessor::StopProcessWideAtExit);
     });

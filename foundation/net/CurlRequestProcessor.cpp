@@ -50,8 +50,8 @@ CurlRequestProcessor::CurlRequestProcessor(const CurlProcessorSettings& settings
     environment.mNoProxy = NoProxyList();
     mCompletions = CompletionQueue::Start();
     try {
-        mNetwork.reset(new CurlNetworkLoop(environment, settings.mMaxConnections, settings.mMaxConnectionsPerHost,
-                                           mCompletions));
+        mNetwork.reset(
+            new CurlNetworkLoop(environment, settings.mMaxConnections, settings.mMaxConnectionsPerHost, mCompletions));
     } catch (...) {
         mCompletions->Stop();
         throw;
@@ -99,7 +99,10 @@ bool CurlRequestProcessor::SubmitForm(HttpMethod method, const Guid& requestUID,
                   kHEADER_CONTENT_TYPE_APPLICATION_WWW_FORM_URLENCODED.c_str());
 }
 
-void CurlRequestProcessor::TryToCancelRequest(const Guid& requestUID) { mNetwork->Cancel(requestUID); }
+void CurlRequestProcessor::TryToCancelRequest(const Guid& requestUID)
+{
+    mNetwork->Cancel(requestUID);
+}
 
 bool CurlRequestProcessor::GET(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
                                const HeaderList& headers, const Configuration&)
@@ -119,9 +122,8 @@ bool CurlRequestProcessor::PUT(const Guid& requestUID, const ResponseHandler& ha
     return Submit(HttpMethod_PUT, requestUID, handler, url, body, headers, nullptr);
 }
 
-bool CurlRequestProcessor::PUTForm(const Guid& requestUID, const ResponseHandler& handler,
-                                   const ImmutableString& url, const FormList& form, const HeaderList& headers,
-                                   const Configuration&)
+bool CurlRequestProcessor::PUTForm(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
+                                   const FormList& form, const HeaderList& headers, const Configuration&)
 {
     return SubmitForm(HttpMethod_PUT, requestUID, handler, url, form, headers);
 }
@@ -132,9 +134,8 @@ bool CurlRequestProcessor::POST(const Guid& requestUID, const ResponseHandler& h
     return Submit(HttpMethod_POST, requestUID, handler, url, body, headers, nullptr);
 }
 
-bool CurlRequestProcessor::POSTForm(const Guid& requestUID, const ResponseHandler& handler,
-                                    const ImmutableString& url, const FormList& form, const HeaderList& headers,
-                                    const Configuration&)
+bool CurlRequestProcessor::POSTForm(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
+                                    const FormList& form, const HeaderList& headers, const Configuration&)
 {
     return SubmitForm(HttpMethod_POST, requestUID, handler, url, form, headers);
 }
@@ -160,7 +161,10 @@ void CurlRequestProcessor::CallAsynchronously(const boost::function<void()>& fun
     mCompletions->PostAfter(std::move(job), std::chrono::milliseconds(delayMilliseconds));
 }
 
-bool CurlRequestProcessor::CurrentThreadIsCompletionThread() const { return mCompletions->IsCurrentThread(); }
+bool CurlRequestProcessor::CurrentThreadIsCompletionThread() const
+{
+    return mCompletions->IsCurrentThread();
+}
 
 Guid CurlRequestProcessor::GetProcessUniqueID() const
 {

@@ -97,8 +97,8 @@ public:
               const HeaderList& headers, const Configuration& configuration) override;
     bool POSTForm(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
                   const FormList& form, const HeaderList& headers, const Configuration& configuration) override;
-    bool PATCH(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
-               const Body& body, const HeaderList& headers, const Configuration& configuration) override;
+    bool PATCH(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url, const Body& body,
+               const HeaderList& headers, const Configuration& configuration) override;
     bool DEL(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
              const HeaderList& headers, const Configuration& configuration) override;
     // Runs the function on the completion thread once the delay (in
@@ -128,8 +128,8 @@ public:
 
 private:
     CurlRequestProcessor(const CurlProcessorSettings& settings, Timeouts* sharedTimeouts);
-    bool Submit(HttpMethod method, const Guid& requestUID, const ResponseHandler& handler,
-                const ImmutableString& url, const Body& body, const HeaderList& headers, const char* contentType);
+    bool Submit(HttpMethod method, const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
+                const Body& body, const HeaderList& headers, const char* contentType);
     bool SubmitForm(HttpMethod method, const Guid& requestUID, const ResponseHandler& handler,
                     const ImmutableString& url, const FormList& form, const HeaderList& headers);
     static void StoreTimeouts(Timeouts& timeouts, std::chrono::milliseconds connectTimeout,

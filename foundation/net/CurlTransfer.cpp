@@ -33,7 +33,10 @@ bool HasHeader(const HeaderList& headers, const char* name)
     return false;
 }
 
-bool IsBlank(char c) { return c == ' ' || c == '\t' || c == '\r' || c == '\n'; }
+bool IsBlank(char c)
+{
+    return c == ' ' || c == '\t' || c == '\r' || c == '\n';
+}
 
 // Builds the list libcurl sends. A line with CR or LF in it would let a value
 // smuggle in headers of its own, so such a line is dropped.
@@ -53,10 +56,11 @@ curl_slist* MakeHeaderList(const HeaderList& headers, const char* contentType, b
         if (line.find_first_of("\r\n") != std::string::npos) continue;
         list = curl_slist_append(list, line.c_str());
     }
+    if (!hasBody) return list;
     // Waiting for "100 Continue" costs a round trip, or a second when the
     // server does not know it.
     if (!HasHeader(headers, "Expect")) list = curl_slist_append(list, "Expect:");
-    if (hasBody && !HasHeader(headers, "Content-Type")) {
+    if (!HasHeader(headers, "Content-Type")) {
         if (contentType)
             list = curl_slist_append(list, (std::string("Content-Type: ") + contentType).c_str());
         else
@@ -70,20 +74,25 @@ curl_slist* MakeHeaderList(const HeaderList& headers, const char* contentType, b
 const char* MethodName(HttpMethod method)
 {
     switch (method) {
-    case HttpMethod_GET: return "GET";
-    case HttpMethod_HEAD: return "HEAD";
-    case HttpMethod_PUT: return "PUT";
-    case HttpMethod_POST: return "POST";
-    case HttpMethod_PATCH: return "PATCH";
-    case HttpMethod_DELETE: return "DELETE";
+        case HttpMethod_GET:
+            return "GET";
+        case HttpMethod_HEAD:
+            return "HEAD";
+        case HttpMethod_PUT:
+            return "PUT";
+        case HttpMethod_POST:
+            return "POST";
+        case HttpMethod_PATCH:
+            return "PATCH";
+        case HttpMethod_DELETE:
+            return "DELETE";
     }
     return "?";
 }
 
 CurlTransfer::CurlTransfer(const Guid& requestUID, const ResponseHandler& handler, HttpMethod method,
-                           const ImmutableString& url, const RequestProcessor::Body& body,
-                           const HeaderList& headers, const char* contentType,
-                           const CurlTransferTimeouts& timeouts)
+                           const ImmutableString& url, const RequestProcessor::Body& body, const HeaderList& headers,
+                           const char* contentType, const CurlTransferTimeouts& timeouts)
     : mRequestUID(requestUID),
       mHandler(handler),
       mMethod(method),
@@ -97,9 +106,15 @@ CurlTransfer::CurlTransfer(const Guid& requestUID, const ResponseHandler& handle
     mErrorText[0] = '\0';
 }
 
-CurlTransfer::~CurlTransfer() { curl_slist_free_all(mRequestHeaders); }
+CurlTransfer::~CurlTransfer()
+{
+    curl_slist_free_all(mRequestHeaders);
+}
 
-std::string CurlTransfer::UrlForTrace() const { return mUrl.substr(0, mUrl.find('?')); }
+std::string CurlTransfer::UrlForTrace() const
+{
+    return mUrl.substr(0, mUrl.find('?'));
+}
 
 void CurlTransfer::Attach(CURL* easy, const CurlTransferEnvironment& environment)
 {
@@ -129,24 +144,24 @@ void CurlTransfer::Attach(CURL* easy, const CurlTransferEnvironment& environment
     const char* data = mBody && mBody->Data() ? reinterpret_cast<const char*>(mBody->Data()) : "";
     const curl_off_t size = mBody ? static_cast<curl_off_t>(mBody->Size()) : 0;
     switch (mMethod) {
-    case HttpMethod_GET:
-        curl_easy_setopt(easy, CURLOPT_HTTPGET, 1L);
-        break;
-    case HttpMethod_HEAD:
-        curl_easy_setopt(easy, CURLOPT_NOBODY, 1L);
-        break;
-    case HttpMethod_DELETE:
-        curl_easy_setopt(easy, CURLOPT_CUSTOMREQUEST, "DELETE");
-        break;
-    case HttpMethod_PUT:
-    case HttpMethod_POST:
-    case HttpMethod_PATCH:
-        curl_easy_setopt(easy, CURLOPT_POST, 1L);
-        curl_easy_setopt(easy, CURLOPT_POSTFIELDSIZE_LARGE, size);
-        curl_easy_setopt(easy, CURLOPT_POSTFIELDS, data);
-        if (mMethod != HttpMethod_POST)
-            curl_easy_setopt(easy, CURLOPT_CUSTOMREQUEST, mMethod == HttpMethod_PUT ? "PUT" : "PATCH");
-        break;
+        case HttpMethod_GET:
+            curl_easy_setopt(easy, CURLOPT_HTTPGET, 1L);
+            break;
+        case HttpMethod_HEAD:
+            curl_easy_setopt(easy, CURLOPT_NOBODY, 1L);
+            break;
+        case HttpMethod_DELETE:
+            curl_easy_setopt(easy, CURLOPT_CUSTOMREQUEST, "DELETE");
+            break;
+        case HttpMethod_PUT:
+        case HttpMethod_POST:
+        case HttpMethod_PATCH:
+            curl_easy_setopt(easy, CURLOPT_POST, 1L);
+            curl_easy_setopt(easy, CURLOPT_POSTFIELDSIZE_LARGE, size);
+            curl_easy_setopt(easy, CURLOPT_POSTFIELDS, data);
+            if (mMethod != HttpMethod_POST)
+                curl_easy_setopt(easy, CURLOPT_CUSTOMREQUEST, mMethod == HttpMethod_PUT ? "PUT" : "PATCH");
+            break;
     }
 }
 

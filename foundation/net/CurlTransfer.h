@@ -42,9 +42,9 @@ class CurlTransfer {
 public:
     // `contentType` is sent when the headers name none; null sends no
     // Content-Type at all rather than libcurl's form default.
-    CurlTransfer(const Guid& requestUID, const ResponseHandler& handler, HttpMethod method,
-                 const ImmutableString& url, const RequestProcessor::Body& body, const HeaderList& headers,
-                 const char* contentType, const CurlTransferTimeouts& timeouts);
+    CurlTransfer(const Guid& requestUID, const ResponseHandler& handler, HttpMethod method, const ImmutableString& url,
+                 const RequestProcessor::Body& body, const HeaderList& headers, const char* contentType,
+                 const CurlTransferTimeouts& timeouts);
     ~CurlTransfer();
     CurlTransfer(const CurlTransfer&) = delete;
     CurlTransfer& operator=(const CurlTransfer&) = delete;

@@ -20,7 +20,7 @@ using HttpHeaders = std::vector<std::pair<std::string, std::string> >;
 
 struct HttpRequest {
     std::string mMethod;
-    std::string mTarget;  // path and query, as sent
+    std::string mTarget;   // path and query, as sent
     HttpHeaders mHeaders;  // names as sent
     std::string mBody;
 
@@ -72,9 +72,9 @@ private:
     int mPort = 0;
     mutable std::mutex mMutex;
     mutable std::condition_variable mArrived;
-    size_t mRequests = 0;          // guarded by mMutex
-    std::set<int> mConnections;    // guarded by mMutex
-    bool mStopping = false;        // guarded by mMutex
+    size_t mRequests = 0;               // guarded by mMutex
+    std::set<int> mConnections;         // guarded by mMutex
+    bool mStopping = false;             // guarded by mMutex
     std::vector<std::thread> mThreads;  // guarded by mMutex
     std::thread mAcceptThread;
 };

@@ -11,8 +11,8 @@
 #include <cstdlib>
 #include <thread>
 
-#include <boost/make_shared.hpp>
 #include <gtest/gtest.h>
+#include <boost/make_shared.hpp>
 
 #include "foundation/net/RequestProcessor.h"
 #include "support/LoopbackHttpServer.h"
@@ -44,7 +44,8 @@ struct DestructionMarker {
 
 // Plain atomics: they outlive every hook of exit.
 std::atomic<bool> sExitBegan{false};
-std::atomic<bool> sSlowStarted{false};
+std::atomic<bool> sHandlerStarted{false};
+std::atomic<bool> sMainParked{false};
 
 template <class Condition>
 bool WaitUntil(Condition condition)
@@ -53,53 +54,63 @@ bool WaitUntil(Condition condition)
     return condition();
 }
 
-// In the child: requests in flight to a server that never answers (made here,
-// and never destroyed, so that they stay in flight), then exit one way or
-// another. A handler that runs writes "handler-ran".
+// In the child: requests in flight to a server that never answers, a handler
+// queued behind a running one, then exit, from main or from a handler.
 TEST(ProcessExitChild, DISABLED_ExitsWithWorkPending)
 {
     const char* directoryVariable = std::getenv(kDirVariable);
     const char* modeVariable = std::getenv(kModeVariable);
     if (!directoryVariable || !modeVariable) GTEST_SKIP() << "run by ProcessExitTest only";
     const std::string directory = directoryVariable;
-    const std::string mode = modeVariable;
+    const bool exitFromHandler = std::string(modeVariable) == "exit-in-handler";
 
+    // Never destroyed, so that its requests stay in flight.
     static auto* sSilentServer = new testsupport::LoopbackHttpServer([](const testsupport::HttpRequest&) {
         HttpAnswer answer;
         answer.mFault = HttpAnswer::Fault_NeverAnswer;
         return answer;
     });
     const boost::shared_ptr<RequestProcessor> processor = GetGlobalRequestProcessor();
-    auto marker = boost::make_shared<DestructionMarker>(directory, "request-handler-destroyed");
-    for (int i = 0; i < 3; ++i)
-        ASSERT_TRUE(processor->GET(Guid::CreateUnique(),
-                                   [directory, marker](const Guid&, const boost::shared_ptr<Response>&) {
-                                       Touch(directory, "handler-ran");
-                                   },
-                                   ImmutableString::CreateDynamic(sSilentServer->Url("/")), HeaderList(),
-                                   Configuration()));
+    {
+        auto marker = boost::make_shared<DestructionMarker>(directory, "request-handler-destroyed");
+        for (int i = 0; i < 3; ++i)
+            ASSERT_TRUE(processor->GET(
+                Guid::CreateUnique(),
+                [directory, marker](const Guid&, const boost::shared_ptr<Response>&) {
+                    Touch(directory, "handler-ran");
+                },
+                ImmutableString::CreateDynamic(sSilentServer->Url("/")), HeaderList(), Configuration()));
+    }
     ASSERT_TRUE(sSilentServer->WaitForRequests(3, std::chrono::seconds(20)));
 
-    if (mode == "exit-in-handler") {
-        processor->CallAsynchronously([] { std::exit(0); }, 0);
+    if (exitFromHandler) {
+        processor->CallAsynchronously(
+            [] {
+                WaitUntil([] { return sMainParked.load(); });
+                std::exit(0);
+            },
+            0);
     } else {
         std::atexit([] { sExitBegan = true; });  // runs before the processor's own hook
-        processor->CallAsynchronously([directory] {
-            sSlowStarted = true;
-            WaitUntil([] { return sExitBegan.load(); });
-            // Long enough that an exit that did not wait would end the process first.
-            std::this_thread::sleep_for(std::chrono::milliseconds(300));
-            Touch(directory, "slow-finished");
-        }, 0);
+        processor->CallAsynchronously(
+            [directory] {
+                sHandlerStarted = true;
+                WaitUntil([] { return sExitBegan.load(); });
+                // Long enough that an exit that did not wait would end the process first.
+                std::this_thread::sleep_for(std::chrono::milliseconds(300));
+                Touch(directory, "running-handler-finished");
+            },
+            0);
     }
-    marker.reset();
-    auto queuedMarker = boost::make_shared<DestructionMarker>(directory, "queued-handler-destroyed");
-    processor->CallAsynchronously([directory, queuedMarker] { Touch(directory, "handler-ran"); }, 0);
-    queuedMarker.reset();
-    ASSERT_TRUE(mode == "exit-in-handler" || WaitUntil([] { return sSlowStarted.load(); }));
-    if (mode == "exit-in-handler") {
-        for (;;) pause();  // the completion thread ends the process
+    {
+        auto marker = boost::make_shared<DestructionMarker>(directory, "queued-handler-destroyed");
+        processor->CallAsynchronously([directory, marker] { Touch(directory, "handler-ran"); }, 0);
     }
+    if (exitFromHandler) {
+        sMainParked = true;
+        for (;;) pause();
+    }
+    ASSERT_TRUE(WaitUntil([] { return sHandlerStarted.load(); }));
 }
 
 class ProcessExitTest : public ::testing::Test {
@@ -149,7 +160,7 @@ protected:
 TEST_F(ProcessExitTest, ExitWaitsForTheRunningHandlerAndRunsOrDestroysNoOther)
 {
     ASSERT_EQ(RunChild("exit-while-handler-runs"), 0);
-    EXPECT_TRUE(Left("slow-finished"));
+    EXPECT_TRUE(Left("running-handler-finished"));
     EXPECT_FALSE(Left("handler-ran"));
     EXPECT_FALSE(Left("request-handler-destroyed"));
     EXPECT_FALSE(Left("queued-handler-destroyed"));

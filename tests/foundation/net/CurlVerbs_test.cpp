@@ -1,5 +1,6 @@
 // What each verb sends, and what the handler gets back, over loopback.
 
+#include <functional>
 #include <mutex>
 #include <random>
 
@@ -38,18 +39,16 @@ HttpAnswer Echo(const HttpRequest& request)
     return answer;
 }
 
-std::string HeaderValue(const Response& response, const char* name)
+std::string HeaderValue(const Response& response, const ImmutableString& name)
 {
-    const ImmutableString* value = FindHeader(response.headers, ImmutableString::CreateDynamic(name));
+    const ImmutableString* value = FindHeader(response.headers, name);
     return value ? value->ToStdString() : "(absent)";
 }
 
-using BodyVerb = bool (RequestProcessor::*)(const Guid&, const ResponseHandler&, const ImmutableString&,
-                                            const RequestProcessor::Body&, const HeaderList&, const Configuration&);
-using FormVerb = bool (RequestProcessor::*)(const Guid&, const ResponseHandler&, const ImmutableString&,
-                                            const FormList&, const HeaderList&, const Configuration&);
-using PlainVerb = bool (RequestProcessor::*)(const Guid&, const ResponseHandler&, const ImmutableString&,
-                                             const HeaderList&, const Configuration&);
+std::string HeaderValue(const Response& response, const char* name)
+{
+    return HeaderValue(response, ImmutableString::CreateDynamic(name));
+}
 
 class CurlVerbsTest : public ::testing::Test {
 protected:
@@ -69,7 +68,10 @@ protected:
         return responses[index].mResponse;
     }
 
-    static RequestProcessor::Body Bytes(const std::string& text) { return RecycledMemory::CopyOf(text.data(), text.size()); }
+    static RequestProcessor::Body Bytes(const std::string& text)
+    {
+        return RecycledMemory::CopyOf(text.data(), text.size());
+    }
 
     testsupport::LoopbackHttpServer mServer;
     boost::shared_ptr<CurlRequestProcessor> mProcessor;
@@ -88,75 +90,59 @@ TEST_F(CurlVerbsTest, GetDeliversStatusHeadersInCapitalsAndTheIdentifier)
     const boost::shared_ptr<Response> response = Next();
     EXPECT_EQ(mRecorder.Responses().at(0).mRequestUID, requestUID);
     EXPECT_EQ(response->status, 404);
-    ASSERT_TRUE(FindHeader(response->headers, kHEADER_ETAG));
-    EXPECT_EQ(FindHeader(response->headers, kHEADER_ETAG)->ToStdString(), "\"v1\"");
-    ASSERT_TRUE(FindHeader(response->headers, kHEADER_CONTENT_TYPE));
-    EXPECT_EQ(FindHeader(response->headers, kHEADER_CONTENT_TYPE)->ToStdString(), "text/plain; charset=UTF-8");
+    EXPECT_EQ(HeaderValue(*response, kHEADER_ETAG), "\"v1\"");
+    EXPECT_EQ(HeaderValue(*response, kHEADER_CONTENT_TYPE), "text/plain; charset=UTF-8");
     EXPECT_EQ(HeaderValue(*response, "X-METHOD"), "GET");
     EXPECT_EQ(HeaderValue(*response, "X-REQUEST-TOKEN"), "secret");
     EXPECT_EQ(HeaderValue(*response, "X-REQUEST-EXPECT"), "no");
-    EXPECT_FALSE(response->body) << "an empty body arrives as no body";
 }
 
-TEST_F(CurlVerbsTest, PutPostAndPatchSendTheirBodyAsGiven)
+TEST_F(CurlVerbsTest, EachVerbSendsItsMethodBodyAndContentType)
 {
-    const std::pair<BodyVerb, const char*> verbs[] = {
-        {&RequestProcessor::PUT, "PUT"}, {&RequestProcessor::POST, "POST"}, {&RequestProcessor::PATCH, "PATCH"}};
-    HeaderList headers;
-    headers.emplace(kHEADER_CONTENT_TYPE, kHEADER_CONTENT_TYPE_APPLICATION_JSON);
-    for (const auto& verb : verbs) {
-        const std::string body = std::string("{\"verb\":\"") + verb.second + "\"}";
-        ASSERT_TRUE(((*mProcessor).*verb.first)(Guid::CreateUnique(), mRecorder.Handler(), Url("/status/201"),
-                                                 Bytes(body), headers, mConfiguration));
-        const boost::shared_ptr<Response> response = Next();
-        EXPECT_EQ(response->status, 201);
-        EXPECT_EQ(HeaderValue(*response, "X-METHOD"), verb.second);
-        EXPECT_EQ(HeaderValue(*response, "X-REQUEST-CONTENT-TYPE"), "application/json");
-        EXPECT_EQ(HeaderValue(*response, "X-REQUEST-EXPECT"), "no");
-        EXPECT_EQ(response->BodyText().ToStdString(), body);
-    }
-}
-
-TEST_F(CurlVerbsTest, PostWithoutBodyIsAnEmptyPostWithoutContentType)
-{
-    ASSERT_TRUE(mProcessor->POST(Guid(), mRecorder.Handler(), Url("/"), RequestProcessor::Body(), HeaderList(),
-                                 mConfiguration));
-    const boost::shared_ptr<Response> response = Next();
-    EXPECT_EQ(HeaderValue(*response, "X-METHOD"), "POST");
-    EXPECT_EQ(HeaderValue(*response, "X-REQUEST-LENGTH"), "0");
-    EXPECT_EQ(HeaderValue(*response, "X-REQUEST-CONTENT-TYPE"), "");
-    EXPECT_FALSE(response->body);
-}
-
-TEST_F(CurlVerbsTest, FormVerbsSendTheQuotedFormAsUrlEncoded)
-{
+    RequestProcessor& processor = *mProcessor;
+    const ResponseHandler handler = mRecorder.Handler();
+    const ImmutableString url = Url("/item");
+    const Guid id = Guid::CreateUnique();  // each step reuses it, as a chain does
+    HeaderList json;
+    json.emplace(kHEADER_CONTENT_TYPE, kHEADER_CONTENT_TYPE_APPLICATION_JSON);
     FormList form;
     form.emplace_back(ImmutableString::CreateStatic("name"), UTF8String("a b&c"));
     form.emplace_back(ImmutableString::CreateStatic("city"), UTF8String("K\xc3\xb6ln"));
-    const std::pair<FormVerb, const char*> verbs[] = {{&RequestProcessor::PUTForm, "PUT"},
-                                                      {&RequestProcessor::POSTForm, "POST"}};
-    for (const auto& verb : verbs) {
-        ASSERT_TRUE(((*mProcessor).*verb.first)(Guid::CreateUnique(), mRecorder.Handler(), Url("/form"), form,
-                                                 HeaderList(), mConfiguration));
-        const boost::shared_ptr<Response> response = Next();
-        EXPECT_EQ(HeaderValue(*response, "X-METHOD"), verb.second);
-        EXPECT_EQ(HeaderValue(*response, "X-REQUEST-CONTENT-TYPE"), "application/x-www-form-urlencoded");
-        EXPECT_EQ(response->BodyText().ToStdString(), "name=a%20b%26c&city=K%c3%b6ln");
-    }
-}
-
-TEST_F(CurlVerbsTest, HeadAndDeleteSendNoBody)
-{
-    const std::pair<PlainVerb, const char*> verbs[] = {{&RequestProcessor::HEAD, "HEAD"},
-                                                       {&RequestProcessor::DEL, "DELETE"}};
-    for (const auto& verb : verbs) {
-        ASSERT_TRUE(((*mProcessor).*verb.first)(Guid::CreateUnique(), mRecorder.Handler(), Url("/item"),
-                                                 HeaderList(), mConfiguration));
+    const std::string quotedForm = "name=a%20b%26c&city=K%c3%b6ln";
+    const char* const formType = "application/x-www-form-urlencoded";
+    const RequestProcessor::Body none;
+    struct Case {
+        const char* mMethod;
+        std::function<bool()> mSend;
+        std::string mBody;         // sent, and so echoed
+        const char* mContentType;  // as the server saw it
+        const char* mLength;       // Content-Length as the server saw it
+    };
+    const Case cases[] = {
+        {"PUT", [&] { return processor.PUT(id, handler, url, Bytes("{\"a\":1}"), json, mConfiguration); }, "{\"a\":1}",
+         "application/json", "7"},
+        {"POST", [&] { return processor.POST(id, handler, url, Bytes("{\"b\":2}"), json, mConfiguration); },
+         "{\"b\":2}", "application/json", "7"},
+        {"PATCH", [&] { return processor.PATCH(id, handler, url, Bytes("[]"), json, mConfiguration); }, "[]",
+         "application/json", "2"},
+        {"POST", [&] { return processor.POST(id, handler, url, none, HeaderList(), mConfiguration); }, "", "", "0"},
+        {"PUT", [&] { return processor.PUTForm(id, handler, url, form, HeaderList(), mConfiguration); }, quotedForm,
+         formType, "29"},
+        {"POST", [&] { return processor.POSTForm(id, handler, url, form, HeaderList(), mConfiguration); }, quotedForm,
+         formType, "29"},
+        {"HEAD", [&] { return processor.HEAD(id, handler, url, HeaderList(), mConfiguration); }, "", "", "none"},
+        {"DELETE", [&] { return processor.DEL(id, handler, url, HeaderList(), mConfiguration); }, "", "", "none"},
+    };
+    for (const Case& step : cases) {
+        ASSERT_TRUE(step.mSend()) << step.mMethod;
         const boost::shared_ptr<Response> response = Next();
         EXPECT_EQ(response->status, 200);
-        EXPECT_EQ(HeaderValue(*response, "X-METHOD"), verb.second);
-        EXPECT_EQ(HeaderValue(*response, "X-REQUEST-LENGTH"), "none");
-        EXPECT_FALSE(response->body);
+        EXPECT_EQ(HeaderValue(*response, "X-METHOD"), step.mMethod);
+        EXPECT_EQ(HeaderValue(*response, "X-REQUEST-CONTENT-TYPE"), step.mContentType) << step.mMethod;
+        EXPECT_EQ(HeaderValue(*response, "X-REQUEST-LENGTH"), step.mLength) << step.mMethod;
+        EXPECT_EQ(HeaderValue(*response, "X-REQUEST-EXPECT"), "no");
+        EXPECT_EQ(response->BodyText().ToStdString(), step.mBody) << step.mMethod;
+        EXPECT_EQ(!response->body, step.mBody.empty()) << "an empty body arrives as no body";
     }
 }
 
