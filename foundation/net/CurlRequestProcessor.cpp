@@ -6,6 +6,7 @@
 
 #include "foundation/net/CompletionQueue.h"
 #include "foundation/net/CurlNetworkLoop.h"
+#include "foundation/net/CurlTransfer.h"
 #include "foundation/net/HeaderConstants.h"
 #include "foundation/net/QuoteURL.h"
 

@@ -56,7 +56,6 @@
 #include <memory>
 #include <string>
 
-#include "foundation/net/CurlTransfer.h"
 #include "foundation/net/RequestProcessor.h"
 
 namespace tolmonet {
@@ -64,6 +63,7 @@ namespace http {
 
 class CompletionQueue;
 class CurlNetworkLoop;
+enum HttpMethod : int;  // CurlTransfer.h; kept out so that this header needs no libcurl
 
 struct CurlProcessorSettings {
     // Time allowed to open a connection, TLS handshake included.

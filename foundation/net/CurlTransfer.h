@@ -15,7 +15,7 @@
 namespace tolmonet {
 namespace http {
 
-enum HttpMethod {
+enum HttpMethod : int {
     HttpMethod_GET,
     HttpMethod_HEAD,
     HttpMethod_PUT,
