@@ -24,5 +24,6 @@ write_basic_package_version_file(${PROJECT_BINARY_DIR}/tolmonetsyncConfigVersion
 install(FILES ${PROJECT_BINARY_DIR}/tolmonetsyncConfig.cmake ${PROJECT_BINARY_DIR}/tolmonetsyncConfigVersion.cmake
   DESTINATION ${CMAKE_INSTALL_LIBDIR}/cmake/tolmonetsync)
 
+file(RELATIVE_PATH PC_RELATIVE_PREFIX ${CMAKE_INSTALL_FULL_LIBDIR}/pkgconfig ${CMAKE_INSTALL_PREFIX})
 configure_file(${PROJECT_SOURCE_DIR}/cmake/tolmonetsync.pc.in ${PROJECT_BINARY_DIR}/tolmonetsync.pc @ONLY)
 install(FILES ${PROJECT_BINARY_DIR}/tolmonetsync.pc DESTINATION ${CMAKE_INSTALL_LIBDIR}/pkgconfig)

@@ -7,6 +7,7 @@ namespace synctest {
 
 INSTANTIATE_TEST_SUITE_P(InMemory, SyncScenarios, ::testing::Values(ScenarioServerFactory([] {
                              return std::unique_ptr<ScenarioServer>(new InMemoryScenarioServer);
-                         })));
+                         })),
+                         [](const ::testing::TestParamInfo<ScenarioServerFactory>&) { return "Server"; });
 
 }  // namespace synctest
