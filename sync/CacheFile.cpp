@@ -2,8 +2,7 @@
 
 #include "sync/CacheFile.h"
 
-#include <map>
-#include <tuple>
+#include <unordered_map>
 
 #include "foundation/core/ByteStreams.h"
 #include "foundation/core/Trace.h"
@@ -56,11 +55,16 @@ namespace {
 // A cache file this large is no file of ours; reading it whole could exhaust memory.
 constexpr std::uint64_t kMaxCacheFileSize = 64ull * 1024 * 1024;
 
-// Records are the same file when name, group and media type agree.
-using RecordKey = std::tuple<UTF16String, UTF16String, std::string>;
-RecordKey KeyOf(const CachedSyncFile& record)
+// Records are the same file when name, group and media type agree. The key
+// joins the three with separators no UTF-8 text holds (0xFF never occurs).
+std::string KeyOf(const CachedSyncFile& record)
 {
-    return RecordKey(record.mName, record.mCollectionName, record.mMimeType.ToStdString());
+    std::string key = tolmocore::utility::UTF16to8(record.mName).ToStdString();
+    key += '\xFF';
+    key += tolmocore::utility::UTF16to8(record.mCollectionName).ToStdString();
+    key += '\xFF';
+    key.append(record.mMimeType.c_str(), record.mMimeType.size());
+    return key;
 }
 
 std::vector<CachedSyncFile> ReadCacheFile(const File& cacheFile)
@@ -91,7 +95,7 @@ void SyncCache::LoadCache()
         }
 
         const std::vector<CachedSyncFile> parsed = ReadCacheFile(GetCache());
-        std::map<RecordKey, const CachedSyncFile*> firstOfKey;
+        std::unordered_map<std::string, const CachedSyncFile*> firstOfKey;
         for (const CachedSyncFile& entry : parsed) firstOfKey.emplace(KeyOf(entry), &entry);
 
         for (CachedSyncFile& record : mFiles) {
