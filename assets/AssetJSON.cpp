@@ -50,24 +50,24 @@ boost::shared_ptr<AssetBase> JSONConvert<boost::shared_ptr<AssetBase> >::FromJSO
     if (id.empty()) ExtractOptionalPropertyFromObjectGeneric(object, "url", id);
     const UTF8String type = ExtractPropertyFromObject<UTF8String>(object, "type");
 
+    auto fill = [&](AssetBase& asset) {
+        asset.mId = id;
+        asset.mName = name;
+        asset.mCreated = created;
+        asset.mModified = modified;
+    };
     const CollectionType collectionType = tarnvault::StringToCollectionType(type);
     if (collectionType != kCollectionType_None) {
         boost::shared_ptr<Collection> collection(new Collection);
         EraseAll(id, "/api/collections/");
         EraseAll(id, "/collections/");
-        collection->mId = id;
-        collection->mName = name;
-        collection->mCreated = created;
-        collection->mModified = modified;
+        fill(*collection);
         collection->mType = collectionType;
         return collection;
     }
     boost::shared_ptr<Item> item(new Item);
     EraseAll(id, "/assets/");
-    item->mId = id;
-    item->mName = name;
-    item->mCreated = created;
-    item->mModified = modified;
+    fill(*item);
     item->mContentType = type;
     ReadItemFields(object, *item);
     return item;
