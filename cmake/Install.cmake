@@ -2,10 +2,10 @@
 # a CMake package (tolmonetsync::tolmonetsync) and a pkg-config file.
 include(CMakePackageConfigHelpers)
 
-foreach(dir foundation/core foundation/net foundation/json assets sync)
+foreach(dir foundation/core foundation/net foundation/json assets sync tarnvault)
   install(DIRECTORY ${PROJECT_SOURCE_DIR}/${dir}/
     DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/tolmonetsync/${dir}
-    FILES_MATCHING PATTERN "*.h")
+    FILES_MATCHING PATTERN "*.h" PATTERN "*Private.h" EXCLUDE)
 endforeach()
 install(FILES ${PROJECT_SOURCE_DIR}/lib/tolmonetsync.h DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/tolmonetsync)
 

@@ -11,3 +11,4 @@
 #include "foundation/net/HeaderConstants.h"
 #include "foundation/net/RequestProcessor.h"
 #include "foundation/net/Response.h"
+#include "tarnvault/Tarnvault.h"

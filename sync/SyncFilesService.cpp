@@ -99,10 +99,4 @@ void SyncFilesService::DeleteCaches()
     }
 }
 
-boost::shared_ptr<SyncFilesService> CreateSyncFilesService(SyncServiceType type, const ParameterList&)
-{
-    if (type != SyncServiceType_Tarnvault) throw std::runtime_error("Unimplemented");
-    throw std::runtime_error("This build of the library has no asset service client");
-}
-
 }  // namespace tolmonetsync

@@ -1,0 +1,216 @@
+// The client object: its configuration, its ownership, the connection state,
+// and the service and cache types that hold it.
+
+#include <stdexcept>
+
+#include <boost/algorithm/string/classification.hpp>
+#include <boost/algorithm/string/split.hpp>
+#include <boost/bind/bind.hpp>
+#include <boost/thread/lock_guard.hpp>
+
+#include "assets/ChildrenMutex.h"
+#include "foundation/net/HeaderConstants.h"
+#include "tarnvault/TarnvaultPrivate.h"
+
+namespace tolmonetsync {
+namespace tarnvault {
+
+namespace {
+
+bool IsForm(const UTF8String& value, const char* form) { return value == form; }
+
+}  // namespace
+
+Tarnvault::Tarnvault(const ParameterList& parameters)
+{
+    bool autoLogin = false;
+    for (const auto& parameter : parameters) {
+        const ImmutableString& key = parameter.first;
+        const UTF8String& value = parameter.second;
+        if (key.IsSameAs(tolmonet::kHEADER_LOCATION)) {
+            mServerURL = value;
+        } else if (key.IsSameAs(tolmonet::kHEADER_COOKIE)) {
+            mAccessToken = value;
+        } else if (key.IsSameAs(tolmonet::kHEADER_USER_AGENT)) {
+            mClientID = value;
+        } else if (key.IsSameAs(tolmonet::kHEADER_SET_COOKIE)) {
+            autoLogin = IsForm(value, "auto");
+        } else if (key.IsSameAs(tolmonet::kHEADER_CACHECONTROL) && IsForm(value, "migrate-major")) {
+            mMigrateMajor = true;
+        } else if (key.IsSameAs(tolmonet::kHEADER_CACHECONTROL) && IsForm(value, "migrate-previous-major")) {
+            mMigratePreviousMajor = true;
+        } else {
+            TOLMO_TRACE("Tarnvault", 1, "Unknown form parameter: " << key);
+        }
+    }
+    if (mServerURL.empty()) mServerURL = kProduction.ToUTF8String();
+    mAutoLogin = autoLogin;
+    if (autoLogin && mAccessToken.empty())
+        throw std::runtime_error("Environment login is not available in this build");
+    mProcessor.reset(new TarnvaultProcessor(GetGlobalSyncProcessor(), &mAccessToken));
+}
+
+Tarnvault::~Tarnvault()
+{
+    // The root first and the processor before the token it points at.
+    mRootCollection.reset();
+    mProcessor.reset();
+}
+
+UTF8String Tarnvault::GetUIDFromLocation(const boost::shared_ptr<tolmonet::Response>& response)
+{
+    const std::string location = LastHeader(response, tolmonet::kHEADER_LOCATION).ToStdString();
+    std::vector<std::string> pieces;
+    boost::algorithm::split(pieces, location, boost::algorithm::is_any_of("/"));
+    if (pieces.size() < 3) return UTF8String();
+    return UTF8String(pieces.back());
+}
+
+boost::shared_ptr<Collection> Tarnvault::CachedRoot() const
+{
+    boost::lock_guard<boost::recursive_mutex> lock(ChildrenMutex());
+    return mRootCollection;
+}
+
+// Credentials live in the object only: nothing is stored in the keychain or
+// the last-user file yet, so a new process starts signed out unless the
+// parameter list carries a token.
+
+void Tarnvault::ReportState(const ConnectionStateCallback& stateCallback, SyncServer_ConnectionState state)
+{
+    __atomic_store_n(&mConnectionState, static_cast<std::uint64_t>(state), __ATOMIC_SEQ_CST);
+    stateCallback(static_cast<SyncServer_ConnectionState>(__atomic_load_n(&mConnectionState, __ATOMIC_SEQ_CST)));
+}
+
+boost::shared_ptr<Tarnvault> Tarnvault::MakeProbe() const
+{
+    ParameterList parameters;
+    parameters.push_back(std::make_pair(tolmonet::kHEADER_LOCATION, mServerURL));
+    parameters.push_back(std::make_pair(tolmonet::kHEADER_USER_AGENT, mClientID));
+    parameters.push_back(std::make_pair(tolmonet::kHEADER_COOKIE, mAccessToken));
+    return boost::shared_ptr<Tarnvault>(new Tarnvault(parameters));
+}
+
+bool Tarnvault::SetCredentials(const ConnectionStateCallback& stateCallback, const OvraCredentials& credentials)
+{
+    TOLMO_TRACE("Tarnvault", 8,
+                "SetCredentials: inAccessToken: <obfuscated>, inRefreshToken: <obfuscated>, inUserID: "
+                    << credentials.userID);
+    if (!credentials.accessToken.empty()) {
+        mAccessToken = credentials.accessToken;
+        mRefreshToken = credentials.refreshToken;
+        mUserID = credentials.userID;
+    }
+    return CheckConnection(stateCallback);
+}
+
+bool Tarnvault::CheckConnection(const ConnectionStateCallback& stateCallback)
+{
+    mConnectionState = SyncServer_Checking;
+    if (mAccessToken.empty()) {
+        ReportState(stateCallback, SyncServer_NotLoggedIn);
+        return true;
+    }
+    const boost::shared_ptr<Tarnvault> probe = MakeProbe();
+    const boost::shared_ptr<Tarnvault> self = shared_from_this();
+    const Guid sent = probe->GetRootAsync(
+        boost::bind(&Tarnvault::_HandleCheckConnection, self, probe, stateCallback,
+                    boost::placeholders::_1, boost::placeholders::_2),
+        boost::bind(&Tarnvault::_HandleCheckConnectionError, self, probe,
+                    stateCallback, boost::placeholders::_1, boost::placeholders::_2),
+        Guid::CreateUnique());
+    return !sent.IsNil();
+}
+
+void Tarnvault::_HandleCheckConnection(const boost::weak_ptr<Tarnvault>& self, const boost::shared_ptr<Tarnvault>&,
+                                       const ConnectionStateCallback& stateCallback, const Guid&,
+                                       const boost::shared_ptr<Collection>&)
+{
+    const boost::shared_ptr<Tarnvault> client = self.lock();
+    if (!client) return;
+    client->ReportState(stateCallback, SyncServer_Connected);
+}
+
+void Tarnvault::_HandleCheckConnectionError(const boost::weak_ptr<Tarnvault>& self,
+                                            const boost::shared_ptr<Tarnvault>&,
+                                            const ConnectionStateCallback& stateCallback, const Guid& requestUID,
+                                            const boost::shared_ptr<tolmonet::Response>& response)
+{
+    const boost::shared_ptr<Tarnvault> client = self.lock();
+    if (!client) return;
+    try {
+        ThrowResponse(requestUID, response);
+    } catch (const std::exception& e) {
+        TOLMO_TRACE("Tarnvault", 1,
+                    "CheckConnectionError: " << ", requestUID: " << requestUID << ", error: " << e.what());
+    }
+    client->ReportState(stateCallback, SyncServer_ConnectionFailed);
+}
+
+bool Tarnvault::Logout(const ConnectionStateCallback& stateCallback)
+{
+    mConnectionState = SyncServer_Checking;
+    mAccessToken.clear();
+    mRefreshToken.clear();
+    mUserID.clear();
+    ReportState(stateCallback, SyncServer_NotLoggedIn);
+    return true;
+}
+
+Guid Tarnvault::GetRootForCinderalOldClientIDAsync(const CollectionCallback&, const ErrorCallback&, const Guid&)
+{
+    TOLMO_TRACE("Tarnvault", 1, "GetRootForCinderalOldClientID: not available in this build");
+    return Guid();
+}
+
+Guid Tarnvault::CopyAsync(const SuccessCallback&, const ErrorCallback&, const boost::shared_ptr<Collection>&,
+                          const boost::shared_ptr<Collection>&, const Guid&, const NameMap&)
+{
+    TOLMO_TRACE("Tarnvault", 1, "Copy: not available in this build");
+    return Guid();
+}
+
+SyncTarnvault::SyncTarnvault(const ParameterList& parameters)
+    : SyncFilesService(parameters), mApi(boost::shared_ptr<Tarnvault>(new Tarnvault(parameters)))
+{
+}
+
+SyncTarnvault::~SyncTarnvault() = default;
+
+boost::shared_ptr<SyncFilesService> SyncTarnvault::CreateTarnvaultHelper(const ParameterList& parameters)
+{
+    return boost::shared_ptr<SyncFilesService>(new SyncTarnvault(parameters));
+}
+
+const boost::shared_ptr<SyncServer>& SyncTarnvault::GetApi() const { return mApi; }
+
+SyncServiceType SyncTarnvault::GetType() const { return SyncServiceType_Tarnvault; }
+
+boost::shared_ptr<SyncCache> SyncTarnvault::CreateCache(const std::vector<SyncFile>& files,
+                                                        const std::vector<SyncDir>& dirs,
+                                                        const ProgressCallback& progress,
+                                                        const ItemToFileCallback& itemToFile)
+{
+    return boost::shared_ptr<SyncCache>(new TarnvaultCache(files, dirs, progress, itemToFile, mApi));
+}
+
+TarnvaultCache::TarnvaultCache(const std::vector<SyncFile>& files, const std::vector<SyncDir>& dirs,
+                               const ProgressCallback& progress, const ItemToFileCallback& itemToFile,
+                               const boost::shared_ptr<SyncServer>& api)
+    : SyncCache(files, dirs, progress, itemToFile), mApi(api)
+{
+}
+
+TarnvaultCache::~TarnvaultCache() = default;
+
+const boost::shared_ptr<SyncServer>& TarnvaultCache::GetApi() const { return mApi; }
+
+}  // namespace tarnvault
+
+boost::shared_ptr<SyncFilesService> CreateSyncFilesService(SyncServiceType type, const ParameterList& parameters)
+{
+    if (type != SyncServiceType_Tarnvault) throw std::runtime_error("Unimplemented");
+    return tarnvault::SyncTarnvault::CreateTarnvaultHelper(parameters);
+}
+
+}  // namespace tolmonetsync

@@ -1,0 +1,105 @@
+#pragma once
+// Helpers shared by the client's sources; not installed.
+
+#include <cstdint>
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+#include <boost/shared_ptr.hpp>
+
+#include "assets/RestException.h"
+#include "foundation/core/Trace.h"
+#include "foundation/json/JSON.h"
+#include "foundation/net/Response.h"
+#include "tarnvault/Tarnvault.h"
+
+namespace tolmonetsync {
+namespace tarnvault {
+
+// An answer above this size is refused before it is parsed: the whole body
+// already sits in memory, and its tree would take several times as much.
+constexpr std::size_t kMaxJSONAnswer = std::size_t(64) << 20;
+
+// Raised for an answer of kMaxJSONAnswer bytes or more, so that the caller
+// can say so instead of calling it a parsing problem.
+class OversizedAnswer : public std::runtime_error {
+public:
+    explicit OversizedAnswer(std::size_t size)
+        : std::runtime_error("JSON answer of " + std::to_string(size) + " bytes is larger than 64 MiB")
+    {
+    }
+};
+
+// Raised where an answer holds a collection where an item belongs, or the
+// reverse.
+class WrongAssetClass : public std::runtime_error {
+public:
+    using std::runtime_error::runtime_error;
+};
+
+namespace {
+
+inline std::string HeaderTraceText(const boost::shared_ptr<tolmonet::Response>& response)
+{
+    std::string text;
+    for (const auto& header : response->headers)
+        text += ", " + header.first.ToStdString() + "=" + header.second.ToStdString();
+    return text;
+}
+
+// Every handler starts here: the body as text, and the response's trace line.
+inline UTF8String _HandleBody(const char* name, const Guid& requestUID,
+                              const boost::shared_ptr<tolmonet::Response>& response)
+{
+    UTF8String body;
+    if (response->body && response->body->Data())
+        body.assign(response->body->Data(), response->body->Size());
+    // Two statements, so that each level keeps a guard of its own.
+    if (response->status >= 200 && response->status <= 299) {
+        TOLMO_TRACE("Tarnvault", 8, name << ", status_code: " << response->status << ", body: " << body
+                                          << ", requestUID: " << requestUID << HeaderTraceText(response));
+    } else {
+        TOLMO_TRACE("Tarnvault", 1, name << ", status_code: " << response->status << ", body: " << body
+                                          << ", requestUID: " << requestUID << HeaderTraceText(response));
+    }
+    return body;
+}
+
+inline boost::any ParseAnswer(const UTF8String& body)
+{
+    if (body.size() >= kMaxJSONAnswer) throw OversizedAnswer(body.size());
+    return tolmocore::serialization::JSONParse(body);
+}
+
+// The error a handler reports for an exception out of its parsing: the
+// handler's own text, or a plain refusal of an oversized answer or of an
+// asset of the wrong class.
+inline void ReportParseFailure(const char* handler, const ErrorCallback& error, const Guid& requestUID,
+                               const std::exception& exception)
+{
+    TOLMO_TRACE("Tarnvault", 1, "Warning: " << handler << ": " << requestUID << ": " << exception.what());
+    std::string text = std::string(handler) + ": JSON parsing problem";
+    if (dynamic_cast<const OversizedAnswer*>(&exception) || dynamic_cast<const WrongAssetClass*>(&exception))
+        text = std::string(handler) + ": " + exception.what();
+    error(requestUID, MakeErrorResponse(tolmocore::utility::ToUTF16(text)));
+}
+
+// The last value of a response header, or empty.
+inline UTF8String LastHeader(const boost::shared_ptr<tolmonet::Response>& response, const ImmutableString& name)
+{
+    const ImmutableString* value = tolmonet::FindHeader(response->headers, name);
+    return value ? value->ToUTF8String() : UTF8String();
+}
+
+inline boost::shared_ptr<RecycledMemory const> BodyOf(const UTF8String& text)
+{
+    boost::shared_ptr<std::vector<unsigned char> > bytes(new std::vector<unsigned char>(text.begin(), text.end()));
+    return RecycledMemory::AdaptAsRecycledMemory(bytes);
+}
+
+inline Guid Sent(bool taken, const Guid& requestUID) { return taken ? requestUID : Guid(); }
+
+}  // namespace
+}  // namespace tarnvault
+}  // namespace tolmonetsync

@@ -1,0 +1,203 @@
+// Moving content: upload (after deleting what has the name) and conditional
+// download into a given file.
+
+#include <cstdio>
+
+#include <boost/bind/bind.hpp>
+#include <boost/function.hpp>
+#include <boost/thread/lock_guard.hpp>
+
+#include "assets/ChildrenMutex.h"
+#include "foundation/core/ByteStreams.h"
+#include "foundation/net/HeaderConstants.h"
+#include "foundation/net/QuoteURL.h"
+#include "tarnvault/TarnvaultPrivate.h"
+
+namespace tolmonetsync {
+namespace tarnvault {
+
+namespace json = tolmocore::serialization;
+using tolmocore::filesupport::File;
+using tolmocore::utility::UTF16to8;
+using boost::placeholders::_1;
+using boost::placeholders::_2;
+
+namespace {
+
+// The 32-bit size argument of the block calls bounds one transfer.
+constexpr std::uint64_t kMaxBlock = std::uint64_t(1) << 32;
+
+using Assets = std::vector<boost::shared_ptr<AssetBase> >;
+
+void _HandleHeaderUpload(const boost::shared_ptr<Collection>& collection, const UTF8String& etag,
+                         const ItemCallback& success, const ErrorCallback& error, const Guid& requestUID,
+                         const boost::shared_ptr<AssetBase>& asset)
+{
+    // A collection's description for a new file is no answer we can use.
+    const boost::shared_ptr<Item> item = boost::dynamic_pointer_cast<Item>(asset);
+    if (!item) {
+        TOLMO_TRACE("Tarnvault", 1, "Warning: _HandleHeaderUpload: " << requestUID << ": not an item");
+        error(requestUID,
+              MakeErrorResponse(tolmocore::utility::ToUTF16("Upload: the new asset's metadata is not an item")));
+        return;
+    }
+    item->mEtag = etag;
+    {
+        boost::lock_guard<boost::recursive_mutex> lock(ChildrenMutex());
+        collection->mChildren.push_back(item);
+    }
+    success(requestUID, item);
+}
+
+void _HandleUpload(const boost::weak_ptr<Tarnvault>& self, const boost::shared_ptr<Collection>& collection,
+                   const ItemCallback& success, const ErrorCallback& error, const Guid& requestUID,
+                   const boost::shared_ptr<tolmonet::Response>& response)
+{
+    const boost::shared_ptr<Tarnvault> client = self.lock();
+    if (!client) return;
+    _HandleBody("Upload", requestUID, response);
+    if (response->status != 201) {
+        error(requestUID, response);
+        return;
+    }
+    const UTF8String uid = Tarnvault::GetUIDFromLocation(response);
+    const UTF8String etag = LastHeader(response, tolmonet::kHEADER_ETAG);
+    const Guid sent = client->HeaderAsync(boost::bind(&_HandleHeaderUpload, collection, etag, success, error, _1, _2),
+                                          error, uid, false, requestUID);
+    if (sent.IsNil()) error(requestUID, MakeErrorResponse(tolmocore::utility::ToUTF16("Upload Header failed")));
+}
+
+}  // namespace
+
+// Runs again after each delete, with one asset fewer; posts when none is left.
+void Tarnvault::_HandleUploadAsyncSearch(const boost::weak_ptr<Tarnvault>& self,
+                                         const boost::shared_ptr<Collection>& collection, const File& file,
+                                         const ImmutableString& contentType, const UTF16String& name,
+                                         const ItemCallback& success, const ErrorCallback& error,
+                                         const Guid& requestUID, const Assets& assets)
+{
+    const boost::shared_ptr<Tarnvault> client = self.lock();
+    if (!client) return;
+    if (!assets.empty()) {
+        const Assets rest(assets.begin(), assets.end() - 1);
+        const SuccessCallback next = boost::bind(&Tarnvault::_HandleUploadAsyncSearch, client, collection, file,
+                                                 contentType, name, success, error, _1, rest);
+        if (client->DeleteAsync(next, error, assets.back(), true, requestUID).IsNil())
+            error(requestUID, boost::shared_ptr<tolmonet::Response>());
+        return;
+    }
+
+    tolmonet::FormList pairs;
+    pairs.push_back(std::make_pair(kName, UTF16to8(name)));
+    boost::any collections = json::JSONArray();
+    json::AppendToArray(collections, boost::any(UTF8String("/api/collections/") + collection->mId));
+    pairs.push_back(std::make_pair(kCollections, json::GetJSONUTF8String(collections, false)));
+    const UTF8String url = client->mServerURL + "/assets" + "?" + tolmonet::QuoteURL(pairs);
+
+    boost::shared_ptr<std::vector<unsigned char> > bytes;
+    std::uint64_t length = 0;
+    try {
+        tolmocore::filesupport::IPlatformByteStream stream(file, 0);
+        length = stream.Length();
+        if (length >= kMaxBlock) throw std::runtime_error("File size beyond the limitation!");
+        if (length != 0) {
+            bytes.reset(new std::vector<unsigned char>(length));
+            stream.ReadBlock(bytes->data(), static_cast<unsigned int>(length));
+        }
+    } catch (const std::exception& e) {
+        TOLMO_TRACE("Tarnvault", 1,
+                    "Error: Upload: " << file.FullPath() << ", error: " << e.what() << ", requestUID: " << requestUID);
+        error(requestUID, MakeErrorResponse(tolmocore::utility::AsciiToUTF16(e.what())));
+        return;
+    }
+
+    char lengthText[32];
+    std::snprintf(lengthText, sizeof lengthText, "%llu", static_cast<unsigned long long>(length));
+    tolmonet::HeaderList headers;
+    headers.insert(std::make_pair(tolmonet::kHEADER_CONTENT_TYPE, contentType));
+    headers.insert(std::make_pair(tolmonet::kHEADER_CONTENT_LENGTH, ImmutableString::CreateDynamic(lengthText)));
+    headers.insert(std::make_pair(kPersistencePolicy, kEthereal));
+    TOLMO_TRACE("Tarnvault", 8,
+                "Upload" << ", path: " << file.FullPath() << ", collection: " << collection << ", url: " << url
+                         << ", requestUID: " << requestUID);
+    const bool taken = client->mProcessor->POST(
+        requestUID, boost::bind(&_HandleUpload, client, collection, success, error, _1, _2),
+        ImmutableString::CreateDynamic(url), RecycledMemory::AdaptAsRecycledMemory(bytes), headers,
+        tolmonet::Configuration());
+    if (!taken) error(requestUID, boost::shared_ptr<tolmonet::Response>());
+}
+
+Guid Tarnvault::UploadAsync(const ItemCallback& success, const ErrorCallback& error,
+                            const boost::shared_ptr<Collection>& collection, const File& file,
+                            const ImmutableString& contentType, const UTF16String& name, const Guid& requestUID)
+{
+    const UTF16String assetName = name.empty() ? file.GetName() : name;
+    const SearchQuery query(collection, assetName);
+    const boost::shared_ptr<Tarnvault> self = shared_from_this();
+    return SearchAsync(boost::bind(&Tarnvault::_HandleUploadAsyncSearch, self, collection, file, contentType,
+                                   assetName, success, error, _1, _2),
+                       error, query, requestUID);
+}
+
+namespace {
+
+void _HandleDownload(const File& file, const DownloadCallback& success, const ErrorCallback& error,
+                     const Guid& requestUID, const boost::shared_ptr<tolmonet::Response>& response)
+{
+    const UTF8String body = _HandleBody("Download", requestUID, response);
+    DownloadResult result;
+    if (response->status == 304) {
+        success(requestUID, result);
+        return;
+    }
+    if (response->status != 200) {
+        error(requestUID, response);
+        return;
+    }
+    try {
+        file.Create(false);
+        tolmocore::filesupport::OPlatformByteStream stream(file, 0);
+        if (body.size() >= kMaxBlock) throw std::runtime_error("Data size beyond the limitation!");
+        if (!body.empty()) stream.WriteBlock(body.data(), static_cast<unsigned int>(body.size()));
+        result.mContentType = LastHeader(response, tolmonet::kHEADER_CONTENT_TYPE);
+        result.mEtag = LastHeader(response, tolmonet::kHEADER_ETAG);
+        result.mLastModified = tolmocore::utility::UTF8to16(LastHeader(response, kLastModified));
+        result.mContentSize = body.size();
+        result.mDownloaded = true;
+        TOLMO_TRACE("Tarnvault", 8,
+                    "Download" << ", content-type: " << result.mContentType << ", content-size: "
+                               << result.mContentSize << ", etag: " << result.mEtag
+                               << ", last_modified: " << result.mLastModified);
+        stream.Close();
+    } catch (const std::exception& e) {
+        TOLMO_TRACE("Tarnvault", 1,
+                    "Error: Download: " << file.FullPath() << ", error: " << e.what() << ", requestUID: " << requestUID);
+        error(requestUID, MakeErrorResponse(tolmocore::utility::AsciiToUTF16(e.what())));
+        try {
+            if (file.Exists()) file.Delete();
+        } catch (const std::exception&) {
+        }
+        return;
+    }
+    success(requestUID, result);
+}
+
+}  // namespace
+
+Guid Tarnvault::DownloadAsync(const DownloadCallback& success, const ErrorCallback& error,
+                              const boost::shared_ptr<Item>& item, const File& file, const UTF8String& etag,
+                              const Guid& requestUID)
+{
+    const UTF8String url = mServerURL + "/assets/" + item->mId;
+    tolmonet::HeaderList headers;
+    if (!etag.empty()) headers.insert(std::make_pair(tolmonet::kHEADER_IF_NONE_MATCH, ImmutableString::CreateDynamic(etag)));
+    TOLMO_TRACE("Tarnvault", 8,
+                "Download" << ", path: " << file.FullPath() << ", asset: " << item << ", url: " << url
+                           << ", etag: " << etag << ", requestUID: " << requestUID);
+    const bool taken = mProcessor->GET(requestUID, boost::bind(&_HandleDownload, file, success, error, _1, _2),
+                                       ImmutableString::CreateDynamic(url), headers, tolmonet::Configuration());
+    return Sent(taken, requestUID);
+}
+
+}  // namespace tarnvault
+}  // namespace tolmonetsync
