@@ -1,0 +1,320 @@
+#pragma once
+// A scripted service on loopback, a client pointed at it, and a recorder of
+// what the client's callbacks receive.
+
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <condition_variable>
+#include <deque>
+#include <filesystem>
+#include <mutex>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include <boost/shared_ptr.hpp>
+#include <boost/weak_ptr.hpp>
+
+#include "assets/RestException.h"
+#include "foundation/core/Trace.h"
+#include "foundation/net/HeaderConstants.h"
+#include "support/LoopbackHttpServer.h"
+#include "support/TempDir.h"
+#include "tarnvault/Tarnvault.h"
+
+namespace tvtest {
+
+using namespace tolmonetsync;
+using namespace tolmonetsync::tarnvault;
+using testsupport::HttpAnswer;
+using testsupport::HttpHeaders;
+using testsupport::HttpRequest;
+
+constexpr char kCollectionMedia[] = "application/vnd.halvane.tarnvault.collection";
+constexpr char kRootMedia[] = "application/vnd.halvane.tarnvault.collection.root";
+constexpr char kPreferencesMedia[] = "application/vnd.halvane.tarnvault.collection.preferences";
+
+// Answers from a queue, in order, and records every request. An unscripted
+// request gets 599.
+class ScriptedService {
+public:
+    ScriptedService() : mServer([this](const HttpRequest& request) { return Answer(request); }) {}
+
+    void Script(int status, const std::string& body = std::string(), const HttpHeaders& headers = HttpHeaders())
+    {
+        HttpAnswer answer;
+        answer.mStatus = status;
+        answer.mBody = body;
+        answer.mHeaders = headers;
+        std::lock_guard<std::mutex> lock(mMutex);
+        mAnswers.push_back(answer);
+    }
+    std::vector<HttpRequest> Requests() const
+    {
+        std::lock_guard<std::mutex> lock(mMutex);
+        return mRequests;
+    }
+    HttpRequest Request(size_t index) const
+    {
+        const std::vector<HttpRequest> requests = Requests();
+        return index < requests.size() ? requests[index] : HttpRequest();
+    }
+    std::string ApiUrl() const { return mServer.Url("/api"); }
+
+private:
+    HttpAnswer Answer(const HttpRequest& request)
+    {
+        std::lock_guard<std::mutex> lock(mMutex);
+        mRequests.push_back(request);
+        HttpAnswer answer;
+        answer.mStatus = 599;
+        if (!mAnswers.empty()) {
+            answer = mAnswers.front();
+            mAnswers.pop_front();
+        }
+        return answer;
+    }
+
+    mutable std::mutex mMutex;
+    std::deque<HttpAnswer> mAnswers;
+    std::vector<HttpRequest> mRequests;
+    testsupport::LoopbackHttpServer mServer;  // last: its threads stop first
+};
+
+// What one operation's callbacks received. Every callback made by it holds
+// the alive token, so a test can tell that the client let go of them.
+class Outcome {
+public:
+    Outcome() : mState(new State), mAlive(new int(0)), mWatch(mAlive) {}
+
+    ErrorCallback Error()
+    {
+        auto state = mState;
+        auto alive = mAlive;
+        return [state, alive](const Guid& id, const boost::shared_ptr<tolmonet::Response>& response) {
+            state->Finish(id, false, response, [](State&) {});
+        };
+    }
+    SuccessCallback Success()
+    {
+        auto state = mState;
+        auto alive = mAlive;
+        return [state, alive](const Guid& id) { state->Finish(id, true, nullptr, [](State&) {}); };
+    }
+    AssetsCallback Assets()
+    {
+        auto state = mState;
+        auto alive = mAlive;
+        return [state, alive](const Guid& id, const std::vector<boost::shared_ptr<AssetBase> >& assets) {
+            state->Finish(id, true, nullptr, [&](State& s) { s.mAssets = assets; });
+        };
+    }
+    AssetCallback Asset()
+    {
+        auto state = mState;
+        auto alive = mAlive;
+        return [state, alive](const Guid& id, const boost::shared_ptr<AssetBase>& asset) {
+            state->Finish(id, true, nullptr, [&](State& s) { s.mAsset = asset; });
+        };
+    }
+    CollectionCallback CollectionDone()
+    {
+        auto state = mState;
+        auto alive = mAlive;
+        return [state, alive](const Guid& id, const boost::shared_ptr<Collection>& collection) {
+            state->Finish(id, true, nullptr, [&](State& s) { s.mAsset = collection; });
+        };
+    }
+    ItemCallback ItemDone()
+    {
+        auto state = mState;
+        auto alive = mAlive;
+        return [state, alive](const Guid& id, const boost::shared_ptr<Item>& item) {
+            state->Finish(id, true, nullptr, [&](State& s) { s.mAsset = item; });
+        };
+    }
+    DownloadCallback Downloaded()
+    {
+        auto state = mState;
+        auto alive = mAlive;
+        return [state, alive](const Guid& id, const DownloadResult& result) {
+            state->Finish(id, true, nullptr, [&](State& s) { s.mDownload = result; });
+        };
+    }
+    // Drops the test's own hold on the token: from now on only callbacks keep it.
+    void LetGo() { mAlive.reset(); }
+
+    // Waits for a callback, at most 30 s; false if none came.
+    bool Wait()
+    {
+        std::unique_lock<std::mutex> lock(mState->mMutex);
+        return mState->mChanged.wait_for(lock, std::chrono::seconds(30), [&] { return mState->mCalls > 0; });
+    }
+    // Waits until every callback made here is gone (LetGo first), at most 30 s.
+    bool WaitReleased() const
+    {
+        for (int i = 0; i < 3000 && !mWatch.expired(); ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
+        return mWatch.expired();
+    }
+
+    int Calls() const { return Locked().mCalls; }
+    bool Succeeded() const { return Locked().mSuccess; }
+    Guid Id() const { return Locked().mId; }
+    boost::shared_ptr<tolmonet::Response> Response() const { return Locked().mResponse; }
+    int Status() const
+    {
+        const auto response = Response();
+        return response ? response->status : 0;
+    }
+    std::string ErrorText() const
+    {
+        const auto response = Response();
+        return response ? response->BodyText().ToStdString() : std::string("(null response)");
+    }
+    std::vector<boost::shared_ptr<AssetBase> > AssetsSeen() const { return Locked().mAssets; }
+    boost::shared_ptr<AssetBase> AssetSeen() const { return Locked().mAsset; }
+    DownloadResult DownloadSeen() const { return Locked().mDownload; }
+
+private:
+    struct State {
+        std::mutex mMutex;
+        std::condition_variable mChanged;
+        int mCalls = 0;
+        bool mSuccess = false;
+        Guid mId;
+        boost::shared_ptr<tolmonet::Response> mResponse;
+        std::vector<boost::shared_ptr<AssetBase> > mAssets;
+        boost::shared_ptr<AssetBase> mAsset;
+        DownloadResult mDownload;
+
+        template <typename Fill>
+        void Finish(const Guid& id, bool success, const boost::shared_ptr<tolmonet::Response>& response, Fill fill)
+        {
+            std::lock_guard<std::mutex> lock(mMutex);
+            ++mCalls;
+            mSuccess = success;
+            mId = id;
+            mResponse = response;
+            fill(*this);
+            mChanged.notify_all();
+        }
+    };
+    struct Snapshot {
+        int mCalls;
+        bool mSuccess;
+        Guid mId;
+        boost::shared_ptr<tolmonet::Response> mResponse;
+        std::vector<boost::shared_ptr<AssetBase> > mAssets;
+        boost::shared_ptr<AssetBase> mAsset;
+        DownloadResult mDownload;
+    };
+    Snapshot Locked() const
+    {
+        std::lock_guard<std::mutex> lock(mState->mMutex);
+        return Snapshot{mState->mCalls,    mState->mSuccess, mState->mId,      mState->mResponse,
+                        mState->mAssets,   mState->mAsset,   mState->mDownload};
+    }
+
+    boost::shared_ptr<State> mState;
+    boost::shared_ptr<int> mAlive;
+    boost::weak_ptr<int> mWatch;
+};
+
+inline ParameterList Parameters(const std::string& url, const std::string& token, const std::string& clientID)
+{
+    ParameterList parameters;
+    parameters.push_back(std::make_pair(tolmonet::kHEADER_LOCATION, UTF8String(url)));
+    parameters.push_back(std::make_pair(tolmonet::kHEADER_COOKIE, UTF8String(token)));
+    parameters.push_back(std::make_pair(tolmonet::kHEADER_USER_AGENT, UTF8String(clientID)));
+    return parameters;
+}
+
+inline std::string Decode(const std::string& text)
+{
+    std::string out;
+    for (size_t i = 0; i < text.size(); ++i) {
+        if (text[i] == '%' && i + 2 < text.size()) {
+            out += static_cast<char>(std::stoi(text.substr(i + 1, 2), nullptr, 16));
+            i += 2;
+        } else {
+            out += text[i];
+        }
+    }
+    return out;
+}
+
+// A collection or an item as the service describes it.
+inline std::string CollectionJSON(const std::string& id, const std::string& name, const char* media = kCollectionMedia)
+{
+    return R"({"id":")" + id + R"(","name":")" + name + R"(","type":")" + media + R"("})";
+}
+inline std::string ItemJSON(const std::string& id, const std::string& name)
+{
+    return R"({"id":")" + id + R"(","name":")" + name + R"(","type":"text/plain","size":3})";
+}
+
+inline boost::shared_ptr<Collection> MakeCollection(const std::string& id)
+{
+    boost::shared_ptr<Collection> collection(new Collection);
+    collection->mId = UTF8String(id);
+    collection->mName = tolmocore::utility::ToUTF16(id);
+    return collection;
+}
+inline boost::shared_ptr<Item> MakeItem(const std::string& id)
+{
+    boost::shared_ptr<Item> item(new Item);
+    item->mId = UTF8String(id);
+    item->mName = tolmocore::utility::ToUTF16(id);
+    return item;
+}
+
+// The fixture of most client tests: a scripted service and a client of it
+// with token "tok" and client identifier "client-1".
+class ClientTest : public ::testing::Test {
+protected:
+    ClientTest() : mClient(new Tarnvault(Parameters(mService.ApiUrl(), "tok", "client-1"))) {}
+
+    // Checks what every request of a client carries.
+    void ExpectAuthorised(const HttpRequest& request, const Guid& id)
+    {
+        EXPECT_EQ(request.Header("Authorization"), "Bearer tok");
+        EXPECT_EQ(request.Header("X-REQUEST-ID"), id.AsStdString());
+    }
+
+    ScriptedService mService;
+    boost::shared_ptr<Tarnvault> mClient;
+};
+
+// Collects trace lines while it lives.
+class TraceLines {
+public:
+    explicit TraceLines(const std::string& spec)
+    {
+        tolmocore::debug::SetTraceFile("/dev/null");
+        tolmocore::debug::SetTraceSpec(spec);
+        tolmocore::debug::SetTraceListener([this](const std::string& line) {
+            std::lock_guard<std::mutex> lock(mMutex);
+            mLines.push_back(line);
+        });
+    }
+    ~TraceLines()
+    {
+        tolmocore::debug::SetTraceListener(tolmocore::debug::TraceListener());
+        tolmocore::debug::SetTraceSpec("");
+        tolmocore::debug::SetTraceFile("");
+    }
+    bool Contains(const std::string& text)
+    {
+        std::lock_guard<std::mutex> lock(mMutex);
+        for (const std::string& line : mLines)
+            if (line.find(text) != std::string::npos) return true;
+        return false;
+    }
+
+private:
+    std::mutex mMutex;
+    std::vector<std::string> mLines;
+};
+
+}  // namespace tvtest

@@ -1,0 +1,264 @@
+// Creating collections, adding to them, deleting and fetching members: the
+// requests on the wire, the chains they form, and where each chain stops.
+
+#include "ClientTestSupport.h"
+
+using namespace tvtest;
+
+namespace {
+
+HttpHeaders Location(const std::string& value) { return HttpHeaders{{"Location", value}}; }
+
+}  // namespace
+
+TEST_F(ClientTest, CreateWithoutParentPostsTheHeaderThenReadsIt)
+{
+    mService.Script(201, "", Location("/api/collections/new1"));
+    mService.Script(200, CollectionJSON("ignored", "Gr\u00fcppe"));
+    Outcome outcome;
+    const Guid id = Guid::CreateUnique();
+    EXPECT_EQ(mClient->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), u"Grüppe",
+                                             kCollectionType_Collection, id),
+              id);
+    ASSERT_TRUE(outcome.Wait());
+    ASSERT_EQ(mService.Requests().size(), 2u);
+    const HttpRequest create = mService.Request(0);
+    EXPECT_EQ(create.mMethod, "POST");
+    EXPECT_EQ(create.mTarget, "/api/collections");
+    EXPECT_EQ(create.Header("Content-Type"), "application/json");
+    EXPECT_EQ(create.mBody,
+              "{\"header\":{\"name\":\"Gr\xc3\xbcppe\",\"type\":\"application/vnd.halvane.tarnvault.collection\"}}");
+    ExpectAuthorised(create, id);
+    EXPECT_EQ(mService.Request(1).mMethod, "GET");
+    EXPECT_EQ(mService.Request(1).mTarget, "/api/collections/new1/header");
+    ExpectAuthorised(mService.Request(1), id);
+    ASSERT_TRUE(outcome.Succeeded());
+    EXPECT_EQ(outcome.Id(), id);
+    EXPECT_EQ(outcome.AssetSeen()->mId, "new1");
+}
+
+TEST_F(ClientTest, CreateOfNoTypeSendsAnEmptyType)
+{
+    mService.Script(400, "bad");
+    Outcome outcome;
+    mClient->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), u"g", kCollectionType_None,
+                                   Guid::CreateUnique());
+    ASSERT_TRUE(outcome.Wait());
+    EXPECT_EQ(mService.Request(0).mBody, R"({"header":{"name":"g","type":""}})");
+    EXPECT_EQ(outcome.Status(), 400);
+}
+
+TEST_F(ClientTest, CreateFailures)
+{
+    // 200 is not the creation status; nothing follows it.
+    mService.Script(200, "", Location("/api/collections/new1"));
+    Outcome ok200;
+    mClient->CreateCollectionAsync(ok200.CollectionDone(), ok200.Error(), u"g", kCollectionType_Collection,
+                                   Guid::CreateUnique());
+    ASSERT_TRUE(ok200.Wait());
+    EXPECT_FALSE(ok200.Succeeded());
+    EXPECT_EQ(ok200.Status(), 200);
+    EXPECT_EQ(mService.Requests().size(), 1u);
+
+    // No identifier in the Location: the header request goes out without one
+    // and the service's refusal comes back.
+    mService.Script(201, "", Location("/"));
+    mService.Script(404, "no such collection");
+    Outcome noId;
+    mClient->CreateCollectionAsync(noId.CollectionDone(), noId.Error(), u"g", kCollectionType_Collection,
+                                   Guid::CreateUnique());
+    ASSERT_TRUE(noId.Wait());
+    EXPECT_EQ(mService.Request(2).mTarget, "/api/collections//header");
+    EXPECT_EQ(noId.Status(), 404);
+    EXPECT_EQ(noId.ErrorText(), "no such collection");
+
+    // The header describes an item: a plain error, not a null collection.
+    mService.Script(201, "", Location("/api/collections/new2"));
+    mService.Script(200, ItemJSON("new2", "g"));
+    Outcome item;
+    mClient->CreateCollectionAsync(item.CollectionDone(), item.Error(), u"g", kCollectionType_Collection,
+                                   Guid::CreateUnique());
+    ASSERT_TRUE(item.Wait());
+    EXPECT_FALSE(item.Succeeded());
+    EXPECT_EQ(item.Status(), -100);
+    EXPECT_EQ(item.ErrorText(), "CreateCollection: the new asset's header is not a collection");
+}
+
+TEST_F(ClientTest, CreateInAParentIsCreateHeaderAndAddUnderANewIdentifier)
+{
+    const auto parent = MakeCollection("P");
+    mService.Script(201, "", Location("http://elsewhere/api/collections/new1"));
+    mService.Script(200, CollectionJSON("new1", "g"));
+    mService.Script(200, "");
+    Outcome outcome;
+    const Guid given = Guid::CreateUnique();
+    const Guid chain =
+        mClient->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), parent, u"g",
+                                       kCollectionType_Collection, given);
+    ASSERT_FALSE(chain.IsNil());
+    EXPECT_NE(chain, given);
+    ASSERT_TRUE(outcome.Wait());
+    ASSERT_EQ(mService.Requests().size(), 3u);
+    const HttpRequest add = mService.Request(2);
+    EXPECT_EQ(add.mMethod, "PUT");
+    EXPECT_EQ(add.mTarget, "/api/collections/P/members");
+    EXPECT_EQ(add.Header("Content-Type"), "application/json");
+    EXPECT_EQ(add.mBody, R"(["/collections/new1"])");
+    for (const HttpRequest& request : mService.Requests()) ExpectAuthorised(request, chain);
+    ASSERT_TRUE(outcome.Succeeded());
+    EXPECT_EQ(outcome.Id(), chain);
+    EXPECT_EQ(outcome.AssetSeen()->mId, "new1");
+    ASSERT_EQ(parent->mChildren.size(), 1u);
+    EXPECT_EQ(parent->mChildren[0], outcome.AssetSeen());
+}
+
+TEST_F(ClientTest, CreateInAParentStopsWhereTheAddFails)
+{
+    const auto parent = MakeCollection("P");
+    mService.Script(201, "", Location("/api/collections/new1"));
+    mService.Script(200, CollectionJSON("new1", "g"));
+    mService.Script(403, "not yours");
+    Outcome outcome;
+    const Guid chain = mClient->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), parent, u"g",
+                                                      kCollectionType_Collection, Guid::CreateUnique());
+    ASSERT_TRUE(outcome.Wait());
+    EXPECT_FALSE(outcome.Succeeded());
+    EXPECT_EQ(outcome.Id(), chain);
+    EXPECT_EQ(outcome.Status(), 403);
+    EXPECT_TRUE(parent->mChildren.empty());
+}
+
+TEST_F(ClientTest, AddSendsThePathOfItsKindAndAppendsTheSameObject)
+{
+    const auto collection = MakeCollection("C");
+    const auto item = MakeItem("i1");
+    const auto child = MakeCollection("c2");
+    mService.Script(200, "");
+    mService.Script(200, "");
+    mService.Script(409, "conflict");
+    Outcome first, second, refused;
+    const Guid id = Guid::CreateUnique();
+    EXPECT_EQ(mClient->AddAsync(first.Success(), first.Error(), collection, item, id), id);
+    ASSERT_TRUE(first.Wait());
+    mClient->AddAsync(second.Success(), second.Error(), collection, child, Guid::CreateUnique());
+    ASSERT_TRUE(second.Wait());
+    mClient->AddAsync(refused.Success(), refused.Error(), collection, MakeItem("i3"), Guid::CreateUnique());
+    ASSERT_TRUE(refused.Wait());
+
+    EXPECT_EQ(mService.Request(0).mMethod, "PUT");
+    EXPECT_EQ(mService.Request(0).mTarget, "/api/collections/C/members");
+    EXPECT_EQ(mService.Request(0).mBody, R"(["/assets/i1"])");
+    ExpectAuthorised(mService.Request(0), id);
+    EXPECT_EQ(mService.Request(1).mBody, R"(["/collections/c2"])");
+    EXPECT_TRUE(first.Succeeded());
+    EXPECT_EQ(first.Id(), id);
+    EXPECT_FALSE(refused.Succeeded());
+    EXPECT_EQ(refused.Status(), 409);
+    ASSERT_EQ(collection->mChildren.size(), 2u);
+    EXPECT_EQ(collection->mChildren[0], item);
+    EXPECT_EQ(collection->mChildren[1], child);
+}
+
+TEST_F(ClientTest, DeleteSendsRecursiveAndLeavesMembersAlone)
+{
+    const auto collection = MakeCollection("C");
+    const auto item = MakeItem("i1");
+    collection->mChildren.push_back(item);
+    mService.Script(200, "");
+    mService.Script(200, "");
+    mService.Script(404, "gone");
+    Outcome plain, recursive, missing;
+    const Guid id = Guid::CreateUnique();
+    EXPECT_EQ(mClient->DeleteAsync(plain.Success(), plain.Error(), item, false, id), id);
+    ASSERT_TRUE(plain.Wait());
+    mClient->DeleteAsync(recursive.Success(), recursive.Error(), collection, true, Guid::CreateUnique());
+    ASSERT_TRUE(recursive.Wait());
+    mClient->DeleteAsync(missing.Success(), missing.Error(), item, false, Guid::CreateUnique());
+    ASSERT_TRUE(missing.Wait());
+
+    EXPECT_EQ(mService.Request(0).mMethod, "DELETE");
+    EXPECT_EQ(mService.Request(0).mTarget, "/api/assets/i1?recursive=false");
+    ExpectAuthorised(mService.Request(0), id);
+    EXPECT_EQ(mService.Request(1).mTarget, "/api/collections/C?recursive=true");
+    EXPECT_TRUE(plain.Succeeded());
+    EXPECT_TRUE(recursive.Succeeded());
+    EXPECT_FALSE(missing.Succeeded());
+    EXPECT_EQ(missing.Status(), 404);
+    EXPECT_EQ(collection->mChildren.size(), 1u);
+}
+
+TEST_F(ClientTest, DeleteByNameSearchesThenDeletesWhatItFound)
+{
+    mService.Script(200, "[" + ItemJSON("i7", "a.txt") + "]");
+    mService.Script(200, "");
+    Outcome outcome;
+    const Guid id = Guid::CreateUnique();
+    EXPECT_EQ(mClient->DeleteAsync(outcome.Success(), outcome.Error(), MakeCollection("C"), u"a.txt", true, id), id);
+    ASSERT_TRUE(outcome.Wait());
+    ASSERT_EQ(mService.Requests().size(), 2u);
+    EXPECT_EQ(mService.Request(0).mMethod, "POST");
+    EXPECT_NE(Decode(mService.Request(0).mTarget).find(R"("name":"a.txt")"), std::string::npos);
+    EXPECT_EQ(mService.Request(1).mTarget, "/api/assets/i7?recursive=true");
+    ExpectAuthorised(mService.Request(1), id);
+    EXPECT_TRUE(outcome.Succeeded());
+    EXPECT_EQ(outcome.Id(), id);
+}
+
+TEST_F(ClientTest, DeleteByNameOfNothingCallsNeitherCallback)
+{
+    mService.Script(200, "[]");
+    Outcome outcome;
+    mClient->DeleteAsync(outcome.Success(), outcome.Error(), MakeCollection("C"), u"absent", false,
+                         Guid::CreateUnique());
+    outcome.LetGo();
+    ASSERT_TRUE(outcome.WaitReleased());
+    EXPECT_EQ(outcome.Calls(), 0);
+    EXPECT_EQ(mService.Requests().size(), 1u);
+}
+
+TEST_F(ClientTest, DeleteByNameOfTwoDeletesNothing)
+{
+    mService.Script(200, "[" + ItemJSON("i1", "a") + "," + ItemJSON("i2", "a") + "]");
+    Outcome outcome;
+    mClient->DeleteAsync(outcome.Success(), outcome.Error(), MakeCollection("C"), u"a", false, Guid::CreateUnique());
+    ASSERT_TRUE(outcome.Wait());
+    EXPECT_EQ(outcome.ErrorText(), "SearchOne: too many results");
+    EXPECT_EQ(mService.Requests().size(), 1u);
+}
+
+TEST_F(ClientTest, FetchChildrenReplacesTheMembersOrLeavesThemEmpty)
+{
+    const auto collection = MakeCollection("C");
+    collection->mChildren.push_back(MakeItem("old"));
+    mService.Script(200, "[" + ItemJSON("i1", "a") + "," + CollectionJSON("c1", "g") + "]");
+    Outcome fetched;
+    const Guid id = Guid::CreateUnique();
+    EXPECT_EQ(mClient->FetchChildrenAsync(fetched.Success(), fetched.Error(), collection, id), id);
+    ASSERT_TRUE(fetched.Wait());
+    EXPECT_TRUE(fetched.Succeeded());
+    ASSERT_EQ(collection->mChildren.size(), 2u);
+    EXPECT_EQ(collection->mChildren[0]->mId, "i1");
+    EXPECT_NE(mService.Request(0).mTarget.find("&scope=%5b%22%2fcollections%2fC%22%5d"), std::string::npos);
+
+    mService.Script(500, "down");
+    Outcome failed;
+    mClient->FetchChildrenAsync(failed.Success(), failed.Error(), collection, Guid::CreateUnique());
+    ASSERT_TRUE(failed.Wait());
+    EXPECT_EQ(failed.Status(), 500);
+    EXPECT_TRUE(collection->mChildren.empty());
+}
+
+TEST(GetUIDFromLocation, LastPieceOfTheLastLocation)
+{
+    auto withLocation = [](std::vector<std::string> values) {
+        boost::shared_ptr<tolmonet::Response> response(new tolmonet::Response);
+        for (const std::string& value : values)
+            response->headers.insert(std::make_pair(tolmonet::kHEADER_LOCATION, ImmutableString::CreateDynamic(value)));
+        return Tarnvault::GetUIDFromLocation(response).ToStdString();
+    };
+    EXPECT_EQ(withLocation({"/api/collections/abc"}), "abc");
+    EXPECT_EQ(withLocation({"http://h:1/api/collections/abc"}), "abc");
+    EXPECT_EQ(withLocation({"/api/collections/abc/"}), "");
+    EXPECT_EQ(withLocation({"a/b"}), "");
+    EXPECT_EQ(withLocation({}), "");
+}

@@ -1,0 +1,205 @@
+// Upload (search, deletes, post, metadata) and conditional download.
+
+#include "ClientTestSupport.h"
+
+using namespace tvtest;
+using testsupport::ReadFileBytes;
+using testsupport::WriteFileBytes;
+using tolmocore::filesupport::File;
+
+namespace {
+
+File FileAt(const std::filesystem::path& path) { return File(tolmocore::utility::ToUTF16(path.string())); }
+
+const ImmutableString kText = ImmutableString::CreateStatic("text/plain");
+
+class TransferTest : public ClientTest {
+protected:
+    testsupport::TempDir mDir;
+};
+
+}  // namespace
+
+TEST_F(TransferTest, UploadDeletesEveryNamesakeLastFirstThenPostsAndReadsBack)
+{
+    WriteFileBytes(mDir / "a.txt", "abc");
+    const auto collection = MakeCollection("C");
+    mService.Script(200, "[" + ItemJSON("old1", "a.txt") + "," + ItemJSON("old2", "a.txt") + "]");
+    mService.Script(200, "");
+    mService.Script(200, "");
+    mService.Script(201, "", {{"Location", "/api/assets/new1"}, {"ETag", "\"e1\""}});
+    mService.Script(200, ItemJSON("x", "a.txt"));
+    Outcome outcome;
+    const Guid id = Guid::CreateUnique();
+    EXPECT_EQ(mClient->UploadAsync(outcome.ItemDone(), outcome.Error(), collection, FileAt(mDir / "a.txt"), kText,
+                                   u"", id),
+              id);
+    ASSERT_TRUE(outcome.Wait());
+    const auto requests = mService.Requests();
+    ASSERT_EQ(requests.size(), 5u);
+    EXPECT_NE(Decode(requests[0].mTarget).find(R"("name":"a.txt")"), std::string::npos);
+    EXPECT_EQ(requests[1].mTarget, "/api/assets/old2?recursive=true");
+    EXPECT_EQ(requests[2].mTarget, "/api/assets/old1?recursive=true");
+    const HttpRequest& post = requests[3];
+    EXPECT_EQ(post.mMethod, "POST");
+    EXPECT_EQ(post.mTarget, "/api/assets?name=a.txt&collections=%5b%22%2fapi%2fcollections%2fC%22%5d");
+    EXPECT_EQ(post.Header("Content-Type"), "text/plain");
+    EXPECT_EQ(post.Header("Content-Length"), "3");
+    EXPECT_EQ(post.Header("X-Persistence-Policy"), "ethereal");
+    EXPECT_EQ(post.mBody, "abc");
+    EXPECT_EQ(requests[4].mMethod, "GET");
+    EXPECT_EQ(requests[4].mTarget, "/api/assets/new1/metadata");
+    for (const HttpRequest& request : requests) ExpectAuthorised(request, id);
+
+    ASSERT_TRUE(outcome.Succeeded());
+    EXPECT_EQ(outcome.Id(), id);
+    const auto item = outcome.AssetSeen();
+    EXPECT_EQ(item->mId, "new1");
+    EXPECT_EQ(item->mEtag, "\"e1\"");
+    ASSERT_EQ(collection->mChildren.size(), 1u);
+    EXPECT_EQ(collection->mChildren.back(), item);
+}
+
+TEST_F(TransferTest, UploadOfAnEmptyFileUnderItsGivenNameSendsNoBody)
+{
+    WriteFileBytes(mDir / "empty.bin", "");
+    mService.Script(200, "[]");
+    mService.Script(201, "", {{"Location", "/api/assets/n"}});
+    mService.Script(200, ItemJSON("n", "given name"));
+    Outcome outcome;
+    mClient->UploadAsync(outcome.ItemDone(), outcome.Error(), MakeCollection("C"), FileAt(mDir / "empty.bin"), kText,
+                         u"given name", Guid::CreateUnique());
+    ASSERT_TRUE(outcome.Wait());
+    ASSERT_EQ(mService.Requests().size(), 3u);
+    const HttpRequest post = mService.Request(1);
+    EXPECT_EQ(post.mTarget.substr(0, post.mTarget.find('&')), "/api/assets?name=given%20name");
+    EXPECT_EQ(post.Header("Content-Length"), "0");
+    EXPECT_TRUE(post.mBody.empty());
+    ASSERT_TRUE(outcome.Succeeded());
+    EXPECT_TRUE(outcome.AssetSeen()->mEtag.empty());
+}
+
+TEST_F(TransferTest, UploadFailures)
+{
+    // A file that is not there: only the search went out.
+    mService.Script(200, "[]");
+    Outcome missing;
+    mClient->UploadAsync(missing.ItemDone(), missing.Error(), MakeCollection("C"), FileAt(mDir / "none.txt"), kText,
+                         u"", Guid::CreateUnique());
+    ASSERT_TRUE(missing.Wait());
+    EXPECT_EQ(missing.Status(), -100);
+    EXPECT_FALSE(missing.ErrorText().empty());
+    EXPECT_EQ(mService.Requests().size(), 1u);
+
+    // A failed delete stops the upload.
+    WriteFileBytes(mDir / "a.txt", "abc");
+    mService.Script(200, "[" + ItemJSON("old", "a.txt") + "]");
+    mService.Script(403, "locked");
+    Outcome deleteFailed;
+    mClient->UploadAsync(deleteFailed.ItemDone(), deleteFailed.Error(), MakeCollection("C"), FileAt(mDir / "a.txt"),
+                         kText, u"", Guid::CreateUnique());
+    ASSERT_TRUE(deleteFailed.Wait());
+    EXPECT_EQ(deleteFailed.Status(), 403);
+    EXPECT_EQ(mService.Requests().size(), 3u);
+
+    // The post answered with something other than 201.
+    mService.Script(200, "[]");
+    mService.Script(200, "");
+    Outcome notCreated;
+    mClient->UploadAsync(notCreated.ItemDone(), notCreated.Error(), MakeCollection("C"), FileAt(mDir / "a.txt"),
+                         kText, u"", Guid::CreateUnique());
+    ASSERT_TRUE(notCreated.Wait());
+    EXPECT_EQ(notCreated.Status(), 200);
+    EXPECT_EQ(mService.Requests().size(), 5u);
+}
+
+TEST_F(TransferTest, UploadWhoseMetadataIsACollectionFailsPlainly)
+{
+    WriteFileBytes(mDir / "a.txt", "abc");
+    const auto collection = MakeCollection("C");
+    mService.Script(200, "[]");
+    mService.Script(201, "", {{"Location", "/api/assets/n"}});
+    mService.Script(200, CollectionJSON("n", "a.txt"));
+    Outcome outcome;
+    mClient->UploadAsync(outcome.ItemDone(), outcome.Error(), collection, FileAt(mDir / "a.txt"), kText, u"",
+                         Guid::CreateUnique());
+    ASSERT_TRUE(outcome.Wait());
+    EXPECT_FALSE(outcome.Succeeded());
+    EXPECT_EQ(outcome.ErrorText(), "Upload: the new asset's metadata is not an item");
+    EXPECT_TRUE(collection->mChildren.empty());
+}
+
+TEST_F(TransferTest, DownloadWritesTheBodyAndReportsTheHeaders)
+{
+    mService.Script(200, "content", {{"Content-Type", "text/plain"}, {"ETag", "\"v2\""},
+                                     {"Last-Modified", "Mon, 02 Mar 2026 10:00:00 GMT"}});
+    Outcome outcome;
+    const Guid id = Guid::CreateUnique();
+    EXPECT_EQ(mClient->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i1"), FileAt(mDir / "f.txt"),
+                                     "\"v1\"", id),
+              id);
+    ASSERT_TRUE(outcome.Wait());
+    const HttpRequest request = mService.Request(0);
+    EXPECT_EQ(request.mMethod, "GET");
+    EXPECT_EQ(request.mTarget, "/api/assets/i1");
+    EXPECT_EQ(request.Header("If-None-Match"), "\"v1\"");
+    ExpectAuthorised(request, id);
+    ASSERT_TRUE(outcome.Succeeded());
+    const DownloadResult result = outcome.DownloadSeen();
+    EXPECT_TRUE(result.mDownloaded);
+    EXPECT_EQ(result.mContentType, "text/plain");
+    EXPECT_EQ(result.mEtag, "\"v2\"");
+    EXPECT_EQ(result.mLastModified, UTF16String(u"Mon, 02 Mar 2026 10:00:00 GMT"));
+    EXPECT_EQ(result.mContentSize, 7u);
+    EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "content");
+}
+
+TEST_F(TransferTest, DownloadWithoutEtagSendsNoConditionAndTakesAnEmptyBody)
+{
+    mService.Script(200, "");
+    Outcome outcome;
+    mClient->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i1"), FileAt(mDir / "f.txt"), "",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(outcome.Wait());
+    EXPECT_FALSE(mService.Request(0).HasHeader("If-None-Match"));
+    ASSERT_TRUE(outcome.Succeeded());
+    EXPECT_TRUE(outcome.DownloadSeen().mDownloaded);
+    EXPECT_EQ(outcome.DownloadSeen().mContentSize, 0u);
+    EXPECT_TRUE(outcome.DownloadSeen().mEtag.empty());
+    EXPECT_TRUE(std::filesystem::exists(mDir / "f.txt"));
+    EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "");
+}
+
+TEST_F(TransferTest, DownloadUnchangedOrRefusedLeavesTheFileAlone)
+{
+    WriteFileBytes(mDir / "kept.txt", "old");
+    mService.Script(304, "");
+    mService.Script(404, "no such asset");
+    Outcome unchanged, refused;
+    mClient->DownloadAsync(unchanged.Downloaded(), unchanged.Error(), MakeItem("i1"), FileAt(mDir / "new.txt"), "e",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(unchanged.Wait());
+    mClient->DownloadAsync(refused.Downloaded(), refused.Error(), MakeItem("i1"), FileAt(mDir / "kept.txt"), "",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(refused.Wait());
+    ASSERT_TRUE(unchanged.Succeeded());
+    EXPECT_FALSE(unchanged.DownloadSeen().mDownloaded);
+    EXPECT_TRUE(unchanged.DownloadSeen().mEtag.empty());
+    EXPECT_FALSE(std::filesystem::exists(mDir / "new.txt"));
+    EXPECT_EQ(refused.Status(), 404);
+    EXPECT_EQ(refused.ErrorText(), "no such asset");
+    EXPECT_EQ(ReadFileBytes(mDir / "kept.txt"), "old");
+}
+
+TEST_F(TransferTest, DownloadIntoAMissingDirectoryFailsWithoutAFile)
+{
+    mService.Script(200, "content");
+    Outcome outcome;
+    mClient->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i1"), FileAt(mDir / "no" / "f.txt"), "",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(outcome.Wait());
+    EXPECT_FALSE(outcome.Succeeded());
+    EXPECT_EQ(outcome.Status(), -100);
+    EXPECT_FALSE(outcome.ErrorText().empty());
+    EXPECT_FALSE(std::filesystem::exists(mDir / "no" / "f.txt"));
+}
