@@ -1,0 +1,39 @@
+#pragma once
+// Users and access tokens. Passwords are kept as a random salt and a
+// PBKDF2-HMAC-SHA256 hash; tokens are kept only as their SHA-256, so the
+// database never holds a usable secret.
+//
+// Threads: any. Errors: DatabaseError from the storage; std::invalid_argument
+// for an empty user name or token.
+
+#include <cstdint>
+#include <string>
+
+#include <boost/optional.hpp>
+
+#include "server/Database.h"
+
+namespace tolmonetsync {
+namespace server {
+
+class Accounts {
+public:
+    explicit Accounts(Database& database);
+
+    // Creates the user or replaces its password and email. An empty email
+    // becomes NAME@localhost. Gives the user's number.
+    std::int64_t SetUser(const std::string& name, const std::string& password, const std::string& email);
+    bool CheckPassword(const std::string& name, const std::string& password);
+    // The user's number, made with no password if there is none yet.
+    std::int64_t EnsureUser(const std::string& name);
+    // A token for that user; ttlSeconds 0 never expires.
+    void GrantToken(const std::string& name, const std::string& token, std::int64_t ttlSeconds = 0);
+    // The user a token opens, if it is known and has not expired.
+    boost::optional<std::int64_t> UserForToken(const std::string& token);
+
+private:
+    Database& mDatabase;
+};
+
+}  // namespace server
+}  // namespace tolmonetsync

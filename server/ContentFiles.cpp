@@ -1,0 +1,134 @@
+#include "server/ContentFiles.h"
+
+#include <cerrno>
+#include <cstring>
+#include <stdexcept>
+
+#include <dirent.h>
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
+namespace tolmonetsync {
+namespace server {
+
+namespace {
+
+const char kTemporaryPrefix[] = "incoming.";
+
+[[noreturn]] void Fail(const std::string& what, const std::string& path)
+{
+    throw std::runtime_error(what + " " + path + ": " + std::strerror(errno));
+}
+
+void MakeDirectory(const std::string& path)
+{
+    if (::mkdir(path.c_str(), 0700) != 0 && errno != EEXIST) Fail("cannot create", path);
+}
+
+void SyncDirectory(const std::string& path)
+{
+    const int fd = ::open(path.c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
+    if (fd < 0) Fail("cannot open", path);
+    const int rc = ::fsync(fd);
+    ::close(fd);
+    if (rc != 0) Fail("cannot sync", path);
+}
+
+bool IsTemporary(const char* name)
+{
+    return std::strncmp(name, kTemporaryPrefix, sizeof(kTemporaryPrefix) - 1) == 0;
+}
+
+}  // namespace
+
+ContentFiles::ContentFiles(const std::string& dataDirectory) : mDirectory(dataDirectory + "/content")
+{
+    MakeDirectory(dataDirectory);
+    MakeDirectory(mDirectory);
+    DIR* dir = ::opendir(mDirectory.c_str());
+    if (!dir) Fail("cannot list", mDirectory);
+    while (dirent* entry = ::readdir(dir)) {
+        if (IsTemporary(entry->d_name)) ::unlink((mDirectory + "/" + entry->d_name).c_str());
+    }
+    ::closedir(dir);
+}
+
+std::string ContentFiles::PathOf(const std::string& id) const
+{
+    return mDirectory + "/" + id;
+}
+
+void ContentFiles::Write(const std::string& id, const std::string& bytes)
+{
+    std::string temporary = mDirectory + "/" + kTemporaryPrefix + id + ".XXXXXX";
+    const int fd = ::mkstemp(&temporary[0]);
+    if (fd < 0) Fail("cannot create", temporary);
+    std::size_t written = 0;
+    while (written < bytes.size()) {
+        const ssize_t n = ::write(fd, bytes.data() + written, bytes.size() - written);
+        if (n < 0) {
+            if (errno == EINTR) continue;
+            const int saved = errno;
+            ::close(fd);
+            ::unlink(temporary.c_str());
+            errno = saved;
+            Fail("cannot write", temporary);
+        }
+        written += static_cast<std::size_t>(n);
+    }
+    if (::fsync(fd) != 0 || ::close(fd) != 0) {
+        const int saved = errno;
+        ::unlink(temporary.c_str());
+        errno = saved;
+        Fail("cannot sync", temporary);
+    }
+    if (::rename(temporary.c_str(), PathOf(id).c_str()) != 0) {
+        const int saved = errno;
+        ::unlink(temporary.c_str());
+        errno = saved;
+        Fail("cannot rename", temporary);
+    }
+    SyncDirectory(mDirectory);
+}
+
+std::string ContentFiles::Read(const std::string& id) const
+{
+    const std::string path = PathOf(id);
+    const int fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
+    if (fd < 0) Fail("cannot open", path);
+    std::string bytes;
+    char buffer[65536];
+    for (;;) {
+        const ssize_t n = ::read(fd, buffer, sizeof(buffer));
+        if (n < 0) {
+            if (errno == EINTR) continue;
+            ::close(fd);
+            Fail("cannot read", path);
+        }
+        if (n == 0) break;
+        bytes.append(buffer, static_cast<std::size_t>(n));
+    }
+    ::close(fd);
+    return bytes;
+}
+
+void ContentFiles::Remove(const std::string& id)
+{
+    ::unlink(PathOf(id).c_str());
+}
+
+std::size_t ContentFiles::TemporaryCount() const
+{
+    std::size_t count = 0;
+    DIR* dir = ::opendir(mDirectory.c_str());
+    if (!dir) return 0;
+    while (dirent* entry = ::readdir(dir)) {
+        if (IsTemporary(entry->d_name)) ++count;
+    }
+    ::closedir(dir);
+    return count;
+}
+
+}  // namespace server
+}  // namespace tolmonetsync

@@ -1,0 +1,178 @@
+#include "server/LocalService.h"
+
+#include <atomic>
+#include <chrono>
+#include <memory>
+#include <stdexcept>
+
+#include "server/Accounts.h"
+#include "server/AssetRoutes.h"
+#include "server/AssetStore.h"
+#include "server/ContentFiles.h"
+#include "server/Database.h"
+#include "server/Router.h"
+
+namespace tolmonetsync {
+namespace server {
+
+namespace {
+
+const char kBearer[] = "Bearer ";
+const std::size_t kMidBodySize = 4096;
+
+std::string BearerToken(const httplib::Request& request)
+{
+    const std::string value = request.get_header_value("Authorization");
+    if (value.compare(0, sizeof(kBearer) - 1, kBearer) != 0) return std::string();
+    return value.substr(sizeof(kBearer) - 1);
+}
+
+}  // namespace
+
+LocalService::LocalService(const LocalServiceOptions& options) : mOptions(options)
+{
+    if (mOptions.mDataDirectory.empty()) throw std::runtime_error("the service needs a data directory");
+    mContent = std::make_unique<ContentFiles>(mOptions.mDataDirectory);
+    mDatabase = std::make_unique<Database>(mOptions.mDataDirectory + "/service.sqlite3",
+                                           static_cast<std::size_t>(mOptions.mWorkers));
+    mAccounts = std::make_unique<Accounts>(*mDatabase);
+    mAssets = std::make_unique<AssetStore>(*mDatabase, *mContent);
+    mRouter = std::make_unique<Router>(AssetRoutes());
+    for (const ServiceUser& user : mOptions.mUsers) mAccounts->SetUser(user.mName, user.mPassword, user.mEmail);
+    for (const ServiceToken& token : mOptions.mTokens) mAccounts->GrantToken(token.mUser, token.mToken);
+}
+
+LocalService::~LocalService()
+{
+    Stop();
+}
+
+void LocalService::Start()
+{
+    if (mServer) throw std::runtime_error("the service is running already");
+    auto server = std::make_unique<httplib::Server>();
+    const int workers = mOptions.mWorkers;
+    server->new_task_queue = [workers] { return new httplib::ThreadPool(static_cast<size_t>(workers)); };
+    server->set_keep_alive_max_count(100000);
+    // Faults apply once the body is read, so an answer never leaves unread
+    // bytes on a kept-alive connection.
+    const auto handler = [this](const httplib::Request& request, httplib::Response& response) {
+        const boost::optional<FaultRule> fault = mFaults.Match(request.method, request.path);
+        if (fault && ApplyFault(*fault, request, response)) return;
+        Serve(request, response);
+    };
+    server->Get(".*", handler);
+    server->Post(".*", handler);
+    server->Put(".*", handler);
+    server->Delete(".*", handler);
+    server->Patch(".*", handler);
+    int port = mOptions.mPort;
+    if (port == 0) {
+        port = server->bind_to_any_port(mOptions.mHost.c_str());
+    } else if (!server->bind_to_port(mOptions.mHost.c_str(), port)) {
+        port = -1;
+    }
+    if (port <= 0) throw std::runtime_error("cannot listen on " + mOptions.mHost + ":" + std::to_string(mOptions.mPort));
+    mPort = port;
+    mServer = std::move(server);
+    httplib::Server* raw = mServer.get();
+    auto ended = std::make_shared<std::atomic<bool> >(false);
+    mThread = std::thread([raw, ended] {
+        raw->listen_after_bind();
+        *ended = true;
+    });
+    // A stop before the accept loop runs would be lost, and the join would hang.
+    while (!raw->is_running() && !*ended) std::this_thread::sleep_for(std::chrono::milliseconds(1));
+}
+
+void LocalService::Stop()
+{
+    if (!mServer) return;
+    mServer->stop();
+    if (mThread.joinable()) mThread.join();
+    mServer.reset();
+}
+
+int LocalService::Port() const
+{
+    return mPort;
+}
+
+std::string LocalService::AssetServiceUrl() const
+{
+    return "http://" + mOptions.mHost + ":" + std::to_string(mPort) + "/api";
+}
+
+void LocalService::SetAnswerStyle(const AnswerStyle& style)
+{
+    std::lock_guard<std::mutex> lock(mStyleMutex);
+    mStyle = style;
+}
+
+AnswerStyle LocalService::GetAnswerStyle() const
+{
+    std::lock_guard<std::mutex> lock(mStyleMutex);
+    return mStyle;
+}
+
+void LocalService::Serve(const httplib::Request& request, httplib::Response& response)
+{
+    Exchange exchange{request, response, {}, 0, GetAnswerStyle(), *mAssets, mPort};
+    if (request.path.compare(0, 5, "/api/") != 0 && request.path != "/api") {
+        exchange.Text(404, "no such resource " + request.path);
+        return;
+    }
+    try {
+        const boost::optional<std::int64_t> user = mAccounts->UserForToken(BearerToken(request));
+        if (!user) {
+            exchange.Text(401, "missing or unknown access token");
+            return;
+        }
+        exchange.mUser = *user;
+        mRouter->Dispatch(exchange);
+    } catch (const StoreFailure& failure) {
+        exchange.Text(failure.Status(), failure.what());
+    } catch (const std::exception& failure) {
+        exchange.Text(500, std::string("internal error: ") + failure.what());
+    }
+}
+
+bool LocalService::ApplyFault(const FaultRule& rule, const httplib::Request& request, httplib::Response& response)
+{
+    switch (rule.mAction) {
+        case FaultAction_Status:
+            response.status = rule.mStatus;
+            response.set_content(OneLine(rule.mBody), "text/plain; charset=utf-8");
+            return true;
+        case FaultAction_Delay:
+            std::this_thread::sleep_for(rule.mDelay);
+            return false;
+        case FaultAction_CloseBeforeAnswer:
+            DropConnection(mPort, request.remote_port);
+            response.status = 500;
+            return true;
+        case FaultAction_CloseMidBody:
+            response.status = 200;
+            response.set_content_provider(kMidBodySize, "application/json",
+                                          [](size_t offset, size_t, httplib::DataSink& sink) {
+                                              if (offset > 0) return false;  // half is all it gets
+                                              const std::string half(kMidBodySize / 2, ' ');
+                                              sink.write(half.data(), half.size());
+                                              return true;
+                                          });
+            return true;
+        case FaultAction_NotJson:
+            response.status = 200;
+            response.set_content("<html>this is not JSON</html>", "application/json");
+            return true;
+        case FaultAction_WrongShapeJson:
+            // An array of an object with a numeric "type": no asset and no list of assets reads it.
+            response.status = 200;
+            response.set_content("[{\"type\": 5}]", "application/json");
+            return true;
+    }
+    return false;
+}
+
+}  // namespace server
+}  // namespace tolmonetsync

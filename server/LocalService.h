@@ -1,0 +1,105 @@
+#pragma once
+// The local asset service: a real HTTP service on loopback, storing users,
+// tokens and assets in SQLite under a data directory and content as files
+// beside it. Host developers run it, tests start it in-process on port 0.
+//
+// Every request under /api needs "Authorization: Bearer TOKEN"; a missing or
+// unknown token is 401 with a one-line text. Each user sees only their own
+// tree. Routes and answers: server/AssetRoutes.h. Refusals are one line of
+// text with the status AssetStore gives; a malformed request is 400.
+//
+// Lifetime. The constructor opens the storage and records the users and
+// tokens; Start binds and serves on a thread of its own; Stop (also from the
+// destructor) ends every connection and waits for the threads. A service
+// may be started again on the same data directory after a stop, and what it
+// acknowledged before is there.
+//
+// Threads: Port, Faults, SetAnswerStyle, Assets and Accounts may be used from
+// any thread while the service runs. Start and Stop from one thread.
+
+#include <cstdint>
+#include <memory>
+#include <mutex>
+#include <string>
+#include <thread>
+#include <vector>
+
+#include <httplib.h>
+
+#include "server/AnswerStyle.h"
+#include "server/FaultHooks.h"
+
+namespace tolmonetsync {
+namespace server {
+
+class Accounts;
+class AssetStore;
+class ContentFiles;
+class Database;
+class Router;
+
+struct ServiceUser {
+    std::string mName;
+    std::string mPassword;
+    std::string mEmail;  // empty: NAME@localhost
+};
+
+struct ServiceToken {
+    std::string mUser;
+    std::string mToken;
+};
+
+struct LocalServiceOptions {
+    std::string mDataDirectory;
+    std::string mHost = "127.0.0.1";
+    int mPort = 0;  // 0 picks a free port
+    std::vector<ServiceUser> mUsers;
+    std::vector<ServiceToken> mTokens;
+    int mWorkers = 32;  // each kept-alive connection holds one while it lasts
+};
+
+class LocalService {
+public:
+    // Throws std::runtime_error (DatabaseError among them) if the storage
+    // cannot be opened.
+    explicit LocalService(const LocalServiceOptions& options);
+    ~LocalService();
+    LocalService(const LocalService&) = delete;
+    LocalService& operator=(const LocalService&) = delete;
+
+    // Binds and starts serving; throws std::runtime_error if it cannot bind.
+    void Start();
+    void Stop();
+
+    int Port() const;
+    // "http://127.0.0.1:PORT/api", the client's base URL.
+    std::string AssetServiceUrl() const;
+
+    FaultHooks& Faults() { return mFaults; }
+    void SetAnswerStyle(const AnswerStyle& style);
+    AnswerStyle GetAnswerStyle() const;
+    Accounts& GetAccounts() { return *mAccounts; }
+    AssetStore& Assets() { return *mAssets; }
+    ContentFiles& Content() { return *mContent; }
+
+private:
+    void Serve(const httplib::Request& request, httplib::Response& response);
+    // Handled means the fault is the whole answer.
+    bool ApplyFault(const FaultRule& rule, const httplib::Request& request, httplib::Response& response);
+
+    LocalServiceOptions mOptions;
+    std::unique_ptr<Database> mDatabase;
+    std::unique_ptr<ContentFiles> mContent;
+    std::unique_ptr<Accounts> mAccounts;
+    std::unique_ptr<AssetStore> mAssets;
+    std::unique_ptr<Router> mRouter;
+    std::unique_ptr<httplib::Server> mServer;
+    std::thread mThread;
+    int mPort = 0;
+    FaultHooks mFaults;
+    mutable std::mutex mStyleMutex;  // guards mStyle
+    AnswerStyle mStyle;
+};
+
+}  // namespace server
+}  // namespace tolmonetsync

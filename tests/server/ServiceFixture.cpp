@@ -1,0 +1,124 @@
+#include "ServiceFixture.h"
+
+#include "assets/AssetJSON.h"
+#include "foundation/json/JSONText.h"
+
+namespace servertest {
+
+const char kAliceToken[] = "alice-token_0123456789";
+const char kBobToken[] = "bob-token_9876543210";
+const char kCollectionType[] = "application/vnd.halvane.tarnvault.collection";
+const char kPreferencesType[] = "application/vnd.halvane.tarnvault.collection.preferences";
+const char kRootType[] = "application/vnd.halvane.tarnvault.collection.root";
+
+using tolmonetsync::server::LocalService;
+using tolmonetsync::server::LocalServiceOptions;
+
+LocalServiceOptions ServiceTest::Options() const
+{
+    LocalServiceOptions options;
+    options.mDataDirectory = mData.Path().string() + "/data";
+    options.mTokens.push_back({"alice", kAliceToken});
+    options.mTokens.push_back({"bob", kBobToken});
+    return options;
+}
+
+void ServiceTest::SetUp()
+{
+    mService = std::make_unique<LocalService>(Options());
+    mService->Start();
+    mAlice = Client(kAliceToken);
+    mBob = Client(kBobToken);
+}
+
+void ServiceTest::TearDown()
+{
+    mAlice.reset();
+    mBob.reset();
+    mService.reset();
+}
+
+void ServiceTest::Restart()
+{
+    mAlice.reset();
+    mBob.reset();
+    mService.reset();
+    mService = std::make_unique<LocalService>(Options());
+    mService->Start();
+    mAlice = Client(kAliceToken);
+    mBob = Client(kBobToken);
+}
+
+std::unique_ptr<ServiceClient> ServiceTest::Client(const std::string& token) const
+{
+    return std::make_unique<ServiceClient>(mService->AssetServiceUrl(), token);
+}
+
+std::string ServiceTest::ClientRoot(ServiceClient& client, const std::string& clientId)
+{
+    const Reply reply = client.Send("GET", "/collections?name=" + Quote(clientId));
+    EXPECT_EQ(200, reply.mStatus) << reply.mBody;
+    const std::vector<std::string> ids = Ids(reply);
+    EXPECT_EQ(1u, ids.size());
+    return ids.empty() ? std::string() : ids.front();
+}
+
+std::string ServiceTest::CreateCollection(ServiceClient& client, const std::string& name, const std::string& type)
+{
+    const std::string body = "{\"header\":{\"name\":\"" + name + "\",\"type\":\"" + type + "\"}}";
+    const Reply reply = client.Send("POST", "/collections", body, {"Content-Type: application/json"});
+    EXPECT_EQ(201, reply.mStatus) << reply.mBody;
+    return IdFromLocation(reply.Header("Location"));
+}
+
+void ServiceTest::AddMember(ServiceClient& client, const std::string& collectionId, const std::string& path)
+{
+    const Reply reply = client.Send("PUT", "/collections/" + collectionId + "/members", "[\"" + path + "\"]",
+                                    {"Content-Type: application/json"});
+    EXPECT_EQ(200, reply.mStatus) << reply.mBody;
+}
+
+std::string ServiceTest::Upload(ServiceClient& client, const std::string& collectionId, const std::string& name,
+                                const std::string& bytes, const std::string& type)
+{
+    const std::string query =
+        "?name=" + Quote(name) + "&collections=" + Quote("[\"/api/collections/" + collectionId + "\"]");
+    const Reply reply = client.Send("POST", "/assets" + query, bytes,
+                                    {"Content-Type: " + type, "X-Persistence-Policy: ethereal"});
+    EXPECT_EQ(201, reply.mStatus) << reply.mBody;
+    EXPECT_FALSE(reply.Header("ETag").empty());
+    return IdFromLocation(reply.Header("Location"));
+}
+
+Reply ServiceTest::Search(ServiceClient& client, const std::string& query, const std::string& scopes)
+{
+    std::string path = "/search?q=" + Quote(query) + "&metadata=true";
+    if (!scopes.empty()) path += "&scope=" + Quote(scopes);
+    return client.Send("POST", path);
+}
+
+std::vector<boost::shared_ptr<tolmonetsync::AssetBase> > ServiceTest::Assets(const Reply& reply)
+{
+    using namespace tolmocore::serialization;
+    return JSONConvert<std::vector<boost::shared_ptr<tolmonetsync::AssetBase> > >::FromJSON(
+        JSONParse(UTF8String(reply.mBody)));
+}
+
+std::vector<std::string> ServiceTest::Ids(const Reply& reply)
+{
+    std::vector<std::string> ids;
+    try {
+        for (const auto& asset : Assets(reply)) ids.push_back(asset->mId.ToStdString());
+    } catch (const std::exception& failure) {
+        ADD_FAILURE() << "the client cannot read " << reply.mBody << ": " << failure.what();
+    }
+    return ids;
+}
+
+std::string IdFromLocation(const std::string& location)
+{
+    const std::size_t slash = location.rfind('/');
+    return slash == std::string::npos ? std::string() : location.substr(slash + 1);
+}
+
+}  // namespace servertest
