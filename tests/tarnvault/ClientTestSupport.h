@@ -221,6 +221,14 @@ private:
     boost::weak_ptr<int> mWatch;
 };
 
+// Waits until the object is gone, at most 30 s; true if it went.
+template <typename T>
+bool WaitExpired(const boost::weak_ptr<T>& watch)
+{
+    for (int i = 0; i < 3000 && !watch.expired(); ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    return watch.expired();
+}
+
 inline ParameterList Parameters(const std::string& url, const std::string& token, const std::string& clientID)
 {
     ParameterList parameters;

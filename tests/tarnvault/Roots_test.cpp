@@ -1,0 +1,220 @@
+// The client root (cached), the user root, and the preferences root of this
+// host version.
+
+#include <future>
+
+#include "ClientTestSupport.h"
+#include "foundation/core/HostConfig.h"
+
+using namespace tvtest;
+
+namespace {
+
+const std::string kRoot = CollectionJSON("root1", "client-1", kRootMedia);
+
+// Sets the host's identity for one test.
+class HostIdentity {
+public:
+    HostIdentity(const char16_t* company, const char16_t* client, const char16_t* version)
+        : mCompany(tolmocore::config::GetCompanyName()),
+          mClient(tolmocore::config::GetClientName()),
+          mVersion(tolmocore::config::GetClientInternalVersion())
+    {
+        tolmocore::config::SetCompanyName(UTF16String(company));
+        tolmocore::config::SetClientName(UTF16String(client));
+        tolmocore::config::SetClientInternalVersion(UTF16String(version));
+    }
+    ~HostIdentity()
+    {
+        tolmocore::config::SetCompanyName(mCompany);
+        tolmocore::config::SetClientName(mClient);
+        tolmocore::config::SetClientInternalVersion(mVersion);
+    }
+
+private:
+    UTF16String mCompany, mClient, mVersion;
+};
+
+}  // namespace
+
+TEST_F(ClientTest, RootIsAskedForByNameOnceAndThenCached)
+{
+    mService.Script(200, "[" + CollectionJSON("plain", "client-1") + "," + kRoot + "]");
+    Outcome first;
+    const Guid id = Guid::CreateUnique();
+    EXPECT_EQ(mClient->GetRootAsync(first.CollectionDone(), first.Error(), id), id);
+    ASSERT_TRUE(first.Wait());
+    const HttpRequest request = mService.Request(0);
+    EXPECT_EQ(request.mMethod, "GET");
+    EXPECT_EQ(request.mTarget, "/api/collections?name=client-1");
+    ExpectAuthorised(request, id);
+    ASSERT_TRUE(first.Succeeded());
+    EXPECT_EQ(first.AssetSeen()->mId, "root1");
+    EXPECT_EQ(mClient->CachedRoot(), first.AssetSeen());
+
+    Outcome second;
+    const Guid again = Guid::CreateUnique();
+    EXPECT_EQ(mClient->GetRootAsync(second.CollectionDone(), second.Error(), again), again);
+    EXPECT_EQ(second.Calls(), 1);  // before the call returned
+    EXPECT_EQ(second.Id(), again);
+    EXPECT_EQ(second.AssetSeen(), first.AssetSeen());
+    EXPECT_EQ(mService.Requests().size(), 1u);
+
+    // Signing out keeps the cached root.
+    mClient->Logout([](SyncServer_ConnectionState) {});
+    Outcome third;
+    mClient->GetRootAsync(third.CollectionDone(), third.Error(), Guid::CreateUnique());
+    EXPECT_EQ(third.Calls(), 1);
+    EXPECT_EQ(mService.Requests().size(), 1u);
+}
+
+TEST_F(ClientTest, RootFailures)
+{
+    struct Case {
+        int mStatus;
+        std::string mBody;
+        int mExpectedStatus;
+        std::string mExpectedText;
+    };
+    const std::vector<Case> cases = {
+        {200, "[]", -100, "Could not find root collection!"},
+        {200, "[" + CollectionJSON("plain", "client-1") + "]", -100, "Could not find root collection!"},
+        {204, "", 204, ""},
+        {401, "token expired", 401, "token expired"},
+        {200, "{}", -100, "_HandleGetRoot: JSON parsing problem"},
+    };
+    for (const Case& c : cases) {
+        SCOPED_TRACE(c.mBody);
+        mService.Script(c.mStatus, c.mBody);
+        Outcome outcome;
+        mClient->GetRootAsync(outcome.CollectionDone(), outcome.Error(), Guid::CreateUnique());
+        ASSERT_TRUE(outcome.Wait());
+        EXPECT_FALSE(outcome.Succeeded());
+        EXPECT_EQ(outcome.Status(), c.mExpectedStatus);
+        EXPECT_EQ(outcome.ErrorText(), c.mExpectedText);
+        EXPECT_FALSE(mClient->CachedRoot());
+    }
+}
+
+TEST(UserRoot, WithoutClientIdentifierEveryCallSearchesByTypeAndCachesNothing)
+{
+    ScriptedService service;
+    boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(service.ApiUrl(), "tok", "")));
+    service.Script(200, "[" + kRoot + "]");
+    service.Script(200, "[" + kRoot + "]");
+    service.Script(200, "[" + ItemJSON("i", "x") + "]");
+    service.Script(200, "[]");
+    std::vector<Outcome> outcomes(4);
+    for (Outcome& outcome : outcomes) {
+        client->GetRootAsync(outcome.CollectionDone(), outcome.Error(), Guid::CreateUnique());
+        ASSERT_TRUE(outcome.Wait());
+    }
+    ASSERT_EQ(service.Requests().size(), 4u);
+    EXPECT_EQ(service.Request(0).mMethod, "POST");
+    EXPECT_NE(Decode(service.Request(0).mTarget).find(std::string(R"("type":")") + kRootMedia), std::string::npos);
+    EXPECT_TRUE(outcomes[0].Succeeded());
+    EXPECT_TRUE(outcomes[1].Succeeded());
+    EXPECT_EQ(outcomes[2].ErrorText(), "GetRoot missing or too many root");
+    EXPECT_EQ(outcomes[3].ErrorText(), "GetRoot missing or too many root");
+    EXPECT_FALSE(client->CachedRoot());
+}
+
+TEST(PreferencesRoot, NameJoinsCompanyClientAndVersion)
+{
+    HostIdentity host(u"A", u"B C", u"9.0");
+    boost::shared_ptr<Tarnvault> client(new Tarnvault(ParameterList()));
+    EXPECT_EQ(client->GetPreferencesRootName(), UTF16String(u"A_B C_9.0"));
+}
+
+TEST_F(ClientTest, PreferencesRootIsMadeOnFirstUseUnderAChainIdentifier)
+{
+    HostIdentity host(u"A", u"B", u"9.0");
+    mService.Script(200, "[" + kRoot + "]");
+    mService.Script(200, "[]");
+    mService.Script(201, "", {{"Location", "/api/collections/pref1"}});
+    mService.Script(200, CollectionJSON("pref1", "A_B_9.0", kPreferencesMedia));
+    mService.Script(200, "");
+    Outcome outcome;
+    const Guid given = Guid::CreateUnique();
+    const Guid chain = mClient->GetPreferencesRootAsync(outcome.CollectionDone(), outcome.Error(), given);
+    EXPECT_NE(chain, given);
+    ASSERT_TRUE(outcome.Wait());
+    const auto requests = mService.Requests();
+    ASSERT_EQ(requests.size(), 5u);
+    EXPECT_EQ(requests[0].mTarget, "/api/collections?name=client-1");
+    const std::string search = Decode(requests[1].mTarget);
+    EXPECT_NE(search.find(R"("name":"A_B_9.0")"), std::string::npos);
+    EXPECT_NE(search.find(R"(scope=["/collections/root1"])"), std::string::npos);
+    EXPECT_EQ(requests[2].mBody, std::string(R"({"header":{"name":"A_B_9.0","type":")") + kPreferencesMedia + "\"}}");
+    EXPECT_EQ(requests[3].mTarget, "/api/collections/pref1/header");
+    EXPECT_EQ(requests[4].mTarget, "/api/collections/root1/members");
+    EXPECT_EQ(requests[4].mBody, R"(["/collections/pref1"])");
+    for (const HttpRequest& request : requests) ExpectAuthorised(request, chain);
+    ASSERT_TRUE(outcome.Succeeded());
+    EXPECT_EQ(outcome.Id(), chain);
+    EXPECT_EQ(outcome.AssetSeen()->mId, "pref1");
+
+    // Next time the root is cached and the search finds it.
+    mService.Script(200, "[" + CollectionJSON("pref1", "A_B_9.0", kPreferencesMedia) + "]");
+    Outcome again;
+    mClient->GetPreferencesRootAsync(again.CollectionDone(), again.Error(), Guid::CreateUnique());
+    ASSERT_TRUE(again.Wait());
+    EXPECT_EQ(mService.Requests().size(), 6u);
+    ASSERT_TRUE(again.Succeeded());
+    EXPECT_EQ(again.AssetSeen()->mId, "pref1");
+}
+
+TEST_F(ClientTest, PreferencesRootOfTheWrongKindOrTwiceIsRefused)
+{
+    mService.Script(200, "[" + kRoot + "]");
+    mService.Script(200, "[" + ItemJSON("i", "A_B_9.0") + "]");
+    mService.Script(200, "[" + CollectionJSON("p1", "n") + "," + CollectionJSON("p2", "n") + "]");
+    Outcome item, two;
+    mClient->GetPreferencesRootAsync(item.CollectionDone(), item.Error(), Guid::CreateUnique());
+    ASSERT_TRUE(item.Wait());
+    mClient->GetPreferencesRootAsync(two.CollectionDone(), two.Error(), Guid::CreateUnique());
+    ASSERT_TRUE(two.Wait());
+    EXPECT_EQ(item.ErrorText(), "Too many PreferencesRoot, or bad type, try resetting!");
+    EXPECT_EQ(two.ErrorText(), "Too many PreferencesRoot, or bad type, try resetting!");
+    EXPECT_EQ(mService.Requests().size(), 3u);
+}
+
+TEST(PreferencesRoot, MigrationSwitchFailsInsteadOfMakingAnEmptyRoot)
+{
+    ScriptedService service;
+    ParameterList parameters = Parameters(service.ApiUrl(), "tok", "client-1");
+    parameters.push_back(std::make_pair(tolmonet::kHEADER_CACHECONTROL, UTF8String("migrate-major")));
+    boost::shared_ptr<Tarnvault> client(new Tarnvault(parameters));
+    service.Script(200, "[" + kRoot + "]");
+    service.Script(200, "[]");
+    Outcome outcome;
+    client->GetPreferencesRootAsync(outcome.CollectionDone(), outcome.Error(), Guid::CreateUnique());
+    ASSERT_TRUE(outcome.Wait());
+    EXPECT_EQ(outcome.ErrorText(), "Preference migration is not available in this build");
+    EXPECT_EQ(service.Requests().size(), 2u);
+}
+
+TEST(Ownership, AClientWithARequestInFlightLivesUntilItsCallback)
+{
+    std::promise<void> release;
+    std::shared_future<void> released(release.get_future());
+    testsupport::LoopbackHttpServer server([released](const HttpRequest&) {
+        released.wait();
+        HttpAnswer answer;
+        answer.mBody = "[" + kRoot + "]";
+        return answer;
+    });
+    boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(server.Url("/api"), "tok", "client-1")));
+    const boost::weak_ptr<Tarnvault> watch(client);
+    Outcome outcome;
+    ASSERT_FALSE(client->GetRootAsync(outcome.CollectionDone(), outcome.Error(), Guid::CreateUnique()).IsNil());
+    ASSERT_TRUE(server.WaitForRequests(1, std::chrono::seconds(30)));
+    client.reset();
+    EXPECT_FALSE(watch.expired());
+    release.set_value();
+    ASSERT_TRUE(outcome.Wait());
+    EXPECT_TRUE(outcome.Succeeded());
+    outcome.LetGo();
+    EXPECT_TRUE(outcome.WaitReleased());
+    EXPECT_TRUE(WaitExpired(watch));
+}
