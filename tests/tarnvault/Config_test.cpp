@@ -222,19 +222,25 @@ TEST(Service, TypeZeroMakesTheClientThatServiceAndCachesShare)
 {
     testsupport::TempDir prefs;
     const tolmocore::filesupport::Dir previous = tolmocore::filesupport::Dir::PrefDir();
-    tolmocore::filesupport::Dir::SetPrefDir(tolmocore::filesupport::Dir(tolmocore::utility::ToUTF16(prefs.Path().string())));
+    tolmocore::filesupport::Dir::SetPrefDir(
+        tolmocore::filesupport::Dir(tolmocore::utility::ToUTF16(prefs.Path().string())));
     {
-        const boost::shared_ptr<SyncFilesService> service =
+        boost::shared_ptr<SyncFilesService> service =
             CreateSyncFilesService(SyncServiceType_Tarnvault, One(tolmonet::kHEADER_USER_AGENT, "client-9"));
         EXPECT_EQ(service->GetType(), SyncServiceType_Tarnvault);
-        const auto client = boost::dynamic_pointer_cast<Tarnvault>(service->GetApi());
-        ASSERT_TRUE(client);
-        EXPECT_EQ(client->mClientID, "client-9");
-        const boost::shared_ptr<SyncCache> cache =
-            service->CreateCache(std::vector<SyncFile>(), std::vector<SyncDir>(), ProgressCallback(),
-                                 ItemToFileCallback());
+        boost::weak_ptr<Tarnvault> client = boost::dynamic_pointer_cast<Tarnvault>(service->GetApi());
+        ASSERT_FALSE(client.expired());
+        EXPECT_EQ(client.lock()->mClientID, "client-9");
+        boost::shared_ptr<SyncCache> cache = service->CreateCache(std::vector<SyncFile>(), std::vector<SyncDir>(),
+                                                                  ProgressCallback(), ItemToFileCallback());
         EXPECT_TRUE(boost::dynamic_pointer_cast<TarnvaultCache>(cache));
         EXPECT_EQ(cache->GetApi(), service->GetApi());
+
+        // The client lives until the service and its last cache are gone.
+        service.reset();
+        EXPECT_FALSE(client.expired());
+        cache.reset();
+        EXPECT_TRUE(client.expired());
     }
     tolmocore::filesupport::Dir::SetPrefDir(previous);
 }

@@ -167,3 +167,28 @@ TEST_F(ClientTest, HeaderFailures)
     EXPECT_EQ(failed.Status(), 500);
     EXPECT_EQ(unreadable.ErrorText(), "_HandleHeader: JSON parsing problem");
 }
+
+TEST_F(ClientTest, BadSearchModifierThrowsOnTheCallersThreadAndSendsNothing)
+{
+    SearchQuery query;
+    query.mTrashed.mModifier = static_cast<SearchModifier>(9);
+    Outcome outcome;
+    EXPECT_THROW(mClient->SearchAsync(outcome.Assets(), outcome.Error(), query, Guid::CreateUnique()),
+                 std::runtime_error);
+    EXPECT_TRUE(mService.Requests().empty());
+    EXPECT_EQ(outcome.Calls(), 0);
+}
+
+TEST_F(ClientTest, FailedAnswersTraceAsWarningsAndGoodOnesOnlyAsProgress)
+{
+    TraceLines trace("Tarnvault:1");
+    mService.Script(200, "[]");
+    mService.Script(404, "not here");
+    Outcome good, bad;
+    mClient->SearchAsync(good.Assets(), good.Error(), SearchQuery(), Guid::CreateUnique());
+    ASSERT_TRUE(good.Wait());
+    mClient->SearchAsync(bad.Assets(), bad.Error(), SearchQuery(), Guid::CreateUnique());
+    ASSERT_TRUE(bad.Wait());
+    EXPECT_FALSE(trace.Contains("Search, status_code: 200"));
+    EXPECT_TRUE(trace.Contains("Search, status_code: 404, body: not here"));
+}
