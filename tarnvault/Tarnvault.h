@@ -145,8 +145,8 @@ public:
 
 private:
     // The probe of CheckConnection: a client of its own, with our address,
-    // client identifier and token.
-    boost::shared_ptr<Tarnvault> MakeProbe() const;
+    // client identifier and the candidate token.
+    boost::shared_ptr<Tarnvault> MakeProbe(const OvraCredentials& credentials) const;
     void ReportState(const ConnectionStateCallback& stateCallback, SyncServer_ConnectionState state);
     static void _HandleCheckConnection(const boost::weak_ptr<Tarnvault>& self,
                                        const boost::shared_ptr<Tarnvault>& probe,

@@ -1,5 +1,5 @@
-// The client object: its configuration, its ownership, the connection state,
-// and the service and cache types that hold it.
+// The client object: its configuration and its ownership, and the service and
+// cache types that hold it.
 
 #include <stdexcept>
 
@@ -70,91 +70,6 @@ boost::shared_ptr<Collection> Tarnvault::CachedRoot() const
 {
     boost::lock_guard<boost::recursive_mutex> lock(ChildrenMutex());
     return mRootCollection;
-}
-
-// Credentials live in the object only: nothing is stored in the keychain or
-// the last-user file yet, so a new process starts signed out unless the
-// parameter list carries a token.
-
-void Tarnvault::ReportState(const ConnectionStateCallback& stateCallback, SyncServer_ConnectionState state)
-{
-    __atomic_store_n(&mConnectionState, static_cast<std::uint64_t>(state), __ATOMIC_SEQ_CST);
-    stateCallback(static_cast<SyncServer_ConnectionState>(__atomic_load_n(&mConnectionState, __ATOMIC_SEQ_CST)));
-}
-
-boost::shared_ptr<Tarnvault> Tarnvault::MakeProbe() const
-{
-    ParameterList parameters;
-    parameters.push_back(std::make_pair(tolmonet::kHEADER_LOCATION, mServerURL));
-    parameters.push_back(std::make_pair(tolmonet::kHEADER_USER_AGENT, mClientID));
-    parameters.push_back(std::make_pair(tolmonet::kHEADER_COOKIE, mAccessToken));
-    return boost::shared_ptr<Tarnvault>(new Tarnvault(parameters));
-}
-
-bool Tarnvault::SetCredentials(const ConnectionStateCallback& stateCallback, const OvraCredentials& credentials)
-{
-    TOLMO_TRACE("Tarnvault", 8,
-                "SetCredentials: inAccessToken: <obfuscated>, inRefreshToken: <obfuscated>, inUserID: "
-                    << credentials.userID);
-    if (!credentials.accessToken.empty()) {
-        mAccessToken = credentials.accessToken;
-        mRefreshToken = credentials.refreshToken;
-        mUserID = credentials.userID;
-    }
-    return CheckConnection(stateCallback);
-}
-
-bool Tarnvault::CheckConnection(const ConnectionStateCallback& stateCallback)
-{
-    mConnectionState = SyncServer_Checking;
-    if (mAccessToken.empty()) {
-        ReportState(stateCallback, SyncServer_NotLoggedIn);
-        return true;
-    }
-    const boost::shared_ptr<Tarnvault> probe = MakeProbe();
-    const boost::shared_ptr<Tarnvault> self = shared_from_this();
-    const Guid sent = probe->GetRootAsync(
-        boost::bind(&Tarnvault::_HandleCheckConnection, self, probe, stateCallback,
-                    boost::placeholders::_1, boost::placeholders::_2),
-        boost::bind(&Tarnvault::_HandleCheckConnectionError, self, probe,
-                    stateCallback, boost::placeholders::_1, boost::placeholders::_2),
-        Guid::CreateUnique());
-    return !sent.IsNil();
-}
-
-void Tarnvault::_HandleCheckConnection(const boost::weak_ptr<Tarnvault>& self, const boost::shared_ptr<Tarnvault>&,
-                                       const ConnectionStateCallback& stateCallback, const Guid&,
-                                       const boost::shared_ptr<Collection>&)
-{
-    const boost::shared_ptr<Tarnvault> client = self.lock();
-    if (!client) return;
-    client->ReportState(stateCallback, SyncServer_Connected);
-}
-
-void Tarnvault::_HandleCheckConnectionError(const boost::weak_ptr<Tarnvault>& self,
-                                            const boost::shared_ptr<Tarnvault>&,
-                                            const ConnectionStateCallback& stateCallback, const Guid& requestUID,
-                                            const boost::shared_ptr<tolmonet::Response>& response)
-{
-    const boost::shared_ptr<Tarnvault> client = self.lock();
-    if (!client) return;
-    try {
-        ThrowResponse(requestUID, response);
-    } catch (const std::exception& e) {
-        TOLMO_TRACE("Tarnvault", 1,
-                    "CheckConnectionError: " << ", requestUID: " << requestUID << ", error: " << e.what());
-    }
-    client->ReportState(stateCallback, SyncServer_ConnectionFailed);
-}
-
-bool Tarnvault::Logout(const ConnectionStateCallback& stateCallback)
-{
-    mConnectionState = SyncServer_Checking;
-    mAccessToken.clear();
-    mRefreshToken.clear();
-    mUserID.clear();
-    ReportState(stateCallback, SyncServer_NotLoggedIn);
-    return true;
 }
 
 Guid Tarnvault::GetRootForCinderalOldClientIDAsync(const CollectionCallback&, const ErrorCallback&, const Guid&)

@@ -17,6 +17,8 @@
 #include <boost/weak_ptr.hpp>
 
 #include "assets/RestException.h"
+#include "foundation/core/Dir.h"
+#include "foundation/core/HostConfig.h"
 #include "foundation/core/Trace.h"
 #include "foundation/net/HeaderConstants.h"
 #include "support/LoopbackHttpServer.h"
@@ -292,6 +294,46 @@ protected:
 
     ScriptedService mService;
     boost::shared_ptr<Tarnvault> mClient;
+};
+
+// Sets the host's identity for one test.
+class HostIdentity {
+public:
+    HostIdentity(const char16_t* company, const char16_t* client, const char16_t* version)
+        : mCompany(tolmocore::config::GetCompanyName()),
+          mClient(tolmocore::config::GetClientName()),
+          mVersion(tolmocore::config::GetClientInternalVersion())
+    {
+        tolmocore::config::SetCompanyName(UTF16String(company));
+        tolmocore::config::SetClientName(UTF16String(client));
+        tolmocore::config::SetClientInternalVersion(UTF16String(version));
+    }
+    ~HostIdentity()
+    {
+        tolmocore::config::SetCompanyName(mCompany);
+        tolmocore::config::SetClientName(mClient);
+        tolmocore::config::SetClientInternalVersion(mVersion);
+    }
+
+private:
+    UTF16String mCompany, mClient, mVersion;
+};
+
+// Points the preference directory (last-user file, keychain store) at a
+// fresh temporary directory for one test.
+class PrefDirScope {
+public:
+    PrefDirScope() : mPrevious(tolmocore::filesupport::Dir::PrefDir())
+    {
+        tolmocore::filesupport::Dir::SetPrefDir(
+            tolmocore::filesupport::Dir(tolmocore::utility::ToUTF16(mDir.Path().string())));
+    }
+    ~PrefDirScope() { tolmocore::filesupport::Dir::SetPrefDir(mPrevious); }
+    const std::filesystem::path& Path() const { return mDir.Path(); }
+
+private:
+    testsupport::TempDir mDir;
+    tolmocore::filesupport::Dir mPrevious;
 };
 
 // Collects trace lines while it lives.

@@ -1,5 +1,5 @@
-// The client's configuration from the parameter list, the connection state
-// it reports, the service and cache that hold it, and what its traces show.
+// The client's configuration from the parameter list, and the service and
+// cache that hold it.
 
 #include "ClientTestSupport.h"
 
@@ -13,32 +13,6 @@ ParameterList One(const ImmutableString& key, const char* value)
     parameters.push_back(std::make_pair(key, UTF8String(value)));
     return parameters;
 }
-
-// Records the reported states.
-struct States {
-    std::mutex mMutex;
-    std::condition_variable mChanged;
-    std::vector<SyncServer_ConnectionState> mSeen;
-
-    ConnectionStateCallback Callback()
-    {
-        return [this](SyncServer_ConnectionState state) {
-            std::lock_guard<std::mutex> lock(mMutex);
-            mSeen.push_back(state);
-            mChanged.notify_all();
-        };
-    }
-    bool Wait()
-    {
-        std::unique_lock<std::mutex> lock(mMutex);
-        return mChanged.wait_for(lock, std::chrono::seconds(30), [&] { return !mSeen.empty(); });
-    }
-    std::vector<SyncServer_ConnectionState> Seen()
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        return mSeen;
-    }
-};
 
 }  // namespace
 
@@ -131,99 +105,9 @@ TEST(Configuration, AutoLoginWithoutATokenIsRefusedPlainly)
     }
 }
 
-TEST(Connection, WithoutATokenIsNotLoggedInAtOnce)
-{
-    ScriptedService service;
-    boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(service.ApiUrl(), "", "c")));
-    States states;
-    EXPECT_TRUE(client->CheckConnection(states.Callback()));
-    EXPECT_EQ(states.Seen(), std::vector<SyncServer_ConnectionState>{SyncServer_NotLoggedIn});
-    EXPECT_TRUE(service.Requests().empty());
-}
-
-TEST(Connection, TheTokenIsProvedByAskingForTheRoot)
-{
-    ScriptedService service;
-    boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(service.ApiUrl(), "tok", "client-1")));
-    service.Script(200, "[" + CollectionJSON("r", "client-1", kRootMedia) + "]");
-    States good;
-    EXPECT_TRUE(client->CheckConnection(good.Callback()));
-    ASSERT_TRUE(good.Wait());
-    EXPECT_EQ(good.Seen(), std::vector<SyncServer_ConnectionState>{SyncServer_Connected});
-    EXPECT_EQ(service.Request(0).mTarget, "/api/collections?name=client-1");
-    EXPECT_EQ(service.Request(0).Header("Authorization"), "Bearer tok");
-    // The probe's root is its own.
-    EXPECT_FALSE(client->CachedRoot());
-
-    service.Script(401, "expired");
-    States bad;
-    EXPECT_TRUE(client->CheckConnection(bad.Callback()));
-    ASSERT_TRUE(bad.Wait());
-    EXPECT_EQ(bad.Seen(), std::vector<SyncServer_ConnectionState>{SyncServer_ConnectionFailed});
-}
-
-TEST(Connection, SetCredentialsChecksTheNewTokenAndLogoutForgetsIt)
-{
-    ScriptedService service;
-    boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(service.ApiUrl(), "", "client-1")));
-    service.Script(200, "[" + CollectionJSON("r", "client-1", kRootMedia) + "]");
-    OvraCredentials credentials;
-    credentials.accessToken = "new-token";
-    credentials.refreshToken = "refresh";
-    credentials.userID = "user-7";
-    States set;
-    EXPECT_TRUE(client->SetCredentials(set.Callback(), credentials));
-    ASSERT_TRUE(set.Wait());
-    EXPECT_EQ(set.Seen(), std::vector<SyncServer_ConnectionState>{SyncServer_Connected});
-    EXPECT_EQ(service.Request(0).Header("Authorization"), "Bearer new-token");
-    EXPECT_EQ(client->mUserID, "user-7");
-
-    States out;
-    EXPECT_TRUE(client->Logout(out.Callback()));
-    EXPECT_EQ(out.Seen(), std::vector<SyncServer_ConnectionState>{SyncServer_NotLoggedIn});
-    EXPECT_TRUE(client->mAccessToken.empty());
-    EXPECT_TRUE(client->mUserID.empty());
-}
-
-TEST(Connection, ProbeThatCannotConnectReportsConnectionFailed)
-{
-    const std::string url = "http://127.0.0.1:" + std::to_string(testsupport::ClosedLoopbackPort()) + "/api";
-    boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(url, "tok", "c")));
-    States states;
-    EXPECT_TRUE(client->CheckConnection(states.Callback()));
-    ASSERT_TRUE(states.Wait());
-    EXPECT_EQ(states.Seen(), std::vector<SyncServer_ConnectionState>{SyncServer_ConnectionFailed});
-}
-
-TEST(Tracing, NoLineShowsTheBearerToken)
-{
-    TraceLines trace("8");
-    ScriptedService service;
-    boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(service.ApiUrl(), "", "client-1")));
-    service.Script(200, "[" + CollectionJSON("r", "client-1", kRootMedia) + "]");
-    service.Script(404, "missing");
-    OvraCredentials credentials;
-    credentials.accessToken = "secret-access-7";
-    credentials.refreshToken = "secret-refresh-7";
-    States states;
-    client->SetCredentials(states.Callback(), credentials);
-    ASSERT_TRUE(states.Wait());
-    Outcome outcome;
-    client->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i1"), File(u"/nonexistent/x"), "",
-                          Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_TRUE(trace.Contains("GetRoot, name: <obfuscated>"));
-    EXPECT_TRUE(trace.Contains("Download, status_code: 404, body: missing"));
-    EXPECT_FALSE(trace.Contains("secret-access-7"));
-    EXPECT_FALSE(trace.Contains("secret-refresh-7"));
-}
-
 TEST(Service, TypeZeroMakesTheClientThatServiceAndCachesShare)
 {
-    testsupport::TempDir prefs;
-    const tolmocore::filesupport::Dir previous = tolmocore::filesupport::Dir::PrefDir();
-    tolmocore::filesupport::Dir::SetPrefDir(
-        tolmocore::filesupport::Dir(tolmocore::utility::ToUTF16(prefs.Path().string())));
+    PrefDirScope prefs;
     {
         boost::shared_ptr<SyncFilesService> service =
             CreateSyncFilesService(SyncServiceType_Tarnvault, One(tolmonet::kHEADER_USER_AGENT, "client-9"));
@@ -242,5 +126,4 @@ TEST(Service, TypeZeroMakesTheClientThatServiceAndCachesShare)
         cache.reset();
         EXPECT_TRUE(client.expired());
     }
-    tolmocore::filesupport::Dir::SetPrefDir(previous);
 }

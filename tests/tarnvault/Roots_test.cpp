@@ -4,36 +4,12 @@
 #include <future>
 
 #include "ClientTestSupport.h"
-#include "foundation/core/HostConfig.h"
 
 using namespace tvtest;
 
 namespace {
 
 const std::string kRoot = CollectionJSON("root1", "client-1", kRootMedia);
-
-// Sets the host's identity for one test.
-class HostIdentity {
-public:
-    HostIdentity(const char16_t* company, const char16_t* client, const char16_t* version)
-        : mCompany(tolmocore::config::GetCompanyName()),
-          mClient(tolmocore::config::GetClientName()),
-          mVersion(tolmocore::config::GetClientInternalVersion())
-    {
-        tolmocore::config::SetCompanyName(UTF16String(company));
-        tolmocore::config::SetClientName(UTF16String(client));
-        tolmocore::config::SetClientInternalVersion(UTF16String(version));
-    }
-    ~HostIdentity()
-    {
-        tolmocore::config::SetCompanyName(mCompany);
-        tolmocore::config::SetClientName(mClient);
-        tolmocore::config::SetClientInternalVersion(mVersion);
-    }
-
-private:
-    UTF16String mCompany, mClient, mVersion;
-};
 
 }  // namespace
 
