@@ -125,10 +125,14 @@ public:
     Guid FetchChildrenAsync(const SuccessCallback& success, const ErrorCallback& error,
                             const boost::shared_ptr<Collection>& collection, const Guid& requestUID) override;
 
-    // Not in this build yet: both give a nil Guid and call nothing.
+    // Renames a source asset for its copy; empty: names stay.
     using NameMap = boost::function<UTF16String(const boost::shared_ptr<AssetBase>&)>;
+    // Not in this build yet: gives a nil Guid and calls nothing.
     virtual Guid GetRootForCinderalOldClientIDAsync(const CollectionCallback& success, const ErrorCallback& error,
                                                     const Guid& requestUID);
+    // Copies everything below `source` into `destination`, at any depth.
+    // `completion` once when all has arrived; else `error` once, with the
+    // first failure's text, after the rest has run. What arrived stays.
     virtual Guid CopyAsync(const SuccessCallback& completion, const ErrorCallback& error,
                            const boost::shared_ptr<Collection>& source,
                            const boost::shared_ptr<Collection>& destination, const Guid& requestUID,

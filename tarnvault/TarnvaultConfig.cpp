@@ -78,13 +78,6 @@ Guid Tarnvault::GetRootForCinderalOldClientIDAsync(const CollectionCallback&, co
     return Guid();
 }
 
-Guid Tarnvault::CopyAsync(const SuccessCallback&, const ErrorCallback&, const boost::shared_ptr<Collection>&,
-                          const boost::shared_ptr<Collection>&, const Guid&, const NameMap&)
-{
-    TOLMO_TRACE("Tarnvault", 1, "Copy: not available in this build");
-    return Guid();
-}
-
 SyncTarnvault::SyncTarnvault(const ParameterList& parameters)
     : SyncFilesService(parameters), mApi(boost::shared_ptr<Tarnvault>(new Tarnvault(parameters)))
 {
