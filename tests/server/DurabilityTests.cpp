@@ -1,0 +1,153 @@
+// What the service acknowledged is there after a restart or an abrupt exit,
+// and an upload cut short leaves nothing behind.
+
+#include <arpa/inet.h>
+#include <netinet/in.h>
+#include <sys/socket.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include <filesystem>
+
+#include "ServiceFixture.h"
+#include "server/ContentFiles.h"
+
+namespace servertest {
+namespace {
+
+class DurabilityTest : public ServiceTest {
+protected:
+    std::size_t ContentFileCount() const
+    {
+        std::size_t count = 0;
+        for (const auto& entry : std::filesystem::directory_iterator(mData.Path() / "data" / "content")) {
+            (void)entry;
+            ++count;
+        }
+        return count;
+    }
+
+    // Sends the headers and only part of the body it announces, then closes.
+    void SendTruncatedUpload(const std::string& folder)
+    {
+        const int fd = ::socket(AF_INET, SOCK_STREAM, 0);
+        ASSERT_GE(fd, 0);
+        sockaddr_in address{};
+        address.sin_family = AF_INET;
+        address.sin_port = htons(static_cast<uint16_t>(mService->Port()));
+        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+        ASSERT_EQ(0, ::connect(fd, reinterpret_cast<sockaddr*>(&address), sizeof(address)));
+        const std::string request = "POST /api/assets?name=cut&collections=" +
+                                    Quote("[\"/api/collections/" + folder + "\"]") +
+                                    " HTTP/1.1\r\nHost: 127.0.0.1\r\nAuthorization: Bearer " + kAliceToken +
+                                    "\r\nContent-Type: text/plain\r\nContent-Length: 100000\r\n\r\n" +
+                                    std::string(1000, 'x');
+        ASSERT_EQ(static_cast<ssize_t>(request.size()), ::send(fd, request.data(), request.size(), MSG_NOSIGNAL));
+        ::close(fd);
+    }
+};
+
+TEST_F(DurabilityTest, TreeAndContentSurviveARestart)
+{
+    const std::string root = ClientRoot(*mAlice, "app");
+    const std::string folder = CreateCollection(*mAlice, "folder", kPreferencesType);
+    AddMember(*mAlice, root, "/collections/" + folder);
+    const std::string second = Upload(*mAlice, folder, "second", "2");
+    const std::string first = Upload(*mAlice, folder, "first", "1");
+    const std::string etag = mAlice->Send("GET", "/assets/" + first).Header("ETag");
+
+    Restart();
+
+    EXPECT_EQ(root, ClientRoot(*mAlice, "app"));
+    EXPECT_EQ((std::vector<std::string>{folder}), Ids(mAlice->Send("GET", "/collections/" + root + "/members")));
+    EXPECT_EQ((std::vector<std::string>{second, first}),
+              Ids(mAlice->Send("GET", "/collections/" + folder + "/members")));
+    const Reply download = mAlice->Send("GET", "/assets/" + first);
+    EXPECT_EQ("1", download.mBody);
+    EXPECT_EQ(etag, download.Header("ETag"));
+    EXPECT_EQ(304, mAlice->Send("GET", "/assets/" + first, "", {"If-None-Match: " + etag}).mStatus);
+    EXPECT_EQ(404, mBob->Send("GET", "/assets/" + first).mStatus);
+}
+
+TEST_F(DurabilityTest, UploadCutShortLeavesNoHalfItem)
+{
+    const std::string folder = CreateCollection(*mAlice, "folder");
+    SendTruncatedUpload(folder);
+    // Stopping waits for every connection's thread, so the cut upload has been dealt with.
+    Restart();
+    EXPECT_TRUE(Ids(mAlice->Send("GET", "/collections/" + folder + "/members")).empty());
+    EXPECT_TRUE(Ids(Search(*mAlice, "{\"name\":\"cut\"}")).empty());
+    EXPECT_EQ(0u, ContentFileCount());
+    // The service still takes a whole upload afterwards.
+    Upload(*mAlice, folder, "whole", "w");
+    EXPECT_EQ(1u, ContentFileCount());
+}
+
+TEST_F(DurabilityTest, DeletedItemsLeaveNoContentBehind)
+{
+    const std::string folder = CreateCollection(*mAlice, "folder");
+    const std::string item = Upload(*mAlice, folder, "gone", "g");
+    ASSERT_EQ(1u, ContentFileCount());
+    ASSERT_EQ(200, mAlice->Send("DELETE", "/assets/" + item + "?recursive=true").mStatus);
+    EXPECT_EQ(0u, ContentFileCount());
+    EXPECT_EQ(0u, mService->Content().TemporaryCount());
+}
+
+// Forks before any thread exists: a child forked from a process with running
+// threads may inherit a lock that no thread will ever release.
+class AbruptExitTest : public ::testing::Test {
+protected:
+    testsupport::TempDir mData;
+};
+
+TEST_F(AbruptExitTest, AcknowledgedUploadSurvivesAnAbruptExit)
+{
+    // The child runs the service and leaves with _exit right after the 201:
+    // no destructor, no checkpoint, no close.
+    const std::string directory = (mData.Path() / "abrupt").string();
+    int pipeFds[2];
+    ASSERT_EQ(0, ::pipe(pipeFds));
+    const pid_t child = ::fork();
+    ASSERT_GE(child, 0);
+    if (child == 0) {
+        ::close(pipeFds[0]);
+        tolmonetsync::server::LocalServiceOptions options;
+        options.mDataDirectory = directory;
+        options.mTokens.push_back({"alice", kAliceToken});
+        auto* service = new tolmonetsync::server::LocalService(options);
+        service->Start();
+        auto* client = new ServiceClient(service->AssetServiceUrl(), kAliceToken);
+        const std::string body = "{\"header\":{\"name\":\"f\",\"type\":\"" + std::string(kCollectionType) + "\"}}";
+        const std::string folder = IdFromLocation(
+            client->Send("POST", "/collections", body, {"Content-Type: application/json"}).Header("Location"));
+        const Reply upload = client->Send(
+            "POST", "/assets?name=kept&collections=" + Quote("[\"/api/collections/" + folder + "\"]"), "survivor");
+        const std::string line = upload.mStatus == 201 ? IdFromLocation(upload.Header("Location")) : "failed";
+        if (::write(pipeFds[1], line.data(), line.size()) < 0) ::_exit(2);
+        ::_exit(0);
+    }
+    ::close(pipeFds[1]);
+    std::string id;
+    char buffer[256];
+    for (ssize_t n; (n = ::read(pipeFds[0], buffer, sizeof(buffer))) > 0;) id.append(buffer, n);
+    ::close(pipeFds[0]);
+    int status = 0;
+    ASSERT_EQ(child, ::waitpid(child, &status, 0));
+    ASSERT_TRUE(WIFEXITED(status));
+    ASSERT_EQ(0, WEXITSTATUS(status));
+    ASSERT_NE("failed", id);
+    ASSERT_FALSE(id.empty());
+
+    tolmonetsync::server::LocalServiceOptions options;
+    options.mDataDirectory = directory;
+    options.mTokens.push_back({"alice", kAliceToken});
+    tolmonetsync::server::LocalService reopened(options);
+    reopened.Start();
+    ServiceClient client(reopened.AssetServiceUrl(), kAliceToken);
+    const Reply download = client.Send("GET", "/assets/" + id);
+    EXPECT_EQ(200, download.mStatus);
+    EXPECT_EQ("survivor", download.mBody);
+}
+
+}  // namespace
+}  // namespace servertest
