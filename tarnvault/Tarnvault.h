@@ -127,7 +127,8 @@ public:
 
     // Renames a source asset for its copy; empty: names stay.
     using NameMap = boost::function<UTF16String(const boost::shared_ptr<AssetBase>&)>;
-    // Not in this build yet: gives a nil Guid and calls nothing.
+    // The root of the client identifier that host versions up to 8.0 used;
+    // never cached.
     virtual Guid GetRootForCinderalOldClientIDAsync(const CollectionCallback& success, const ErrorCallback& error,
                                                     const Guid& requestUID);
     // Copies everything below `source` into `destination`, at any depth.

@@ -72,12 +72,6 @@ boost::shared_ptr<Collection> Tarnvault::CachedRoot() const
     return mRootCollection;
 }
 
-Guid Tarnvault::GetRootForCinderalOldClientIDAsync(const CollectionCallback&, const ErrorCallback&, const Guid&)
-{
-    TOLMO_TRACE("Tarnvault", 1, "GetRootForCinderalOldClientID: not available in this build");
-    return Guid();
-}
-
 SyncTarnvault::SyncTarnvault(const ParameterList& parameters)
     : SyncFilesService(parameters), mApi(boost::shared_ptr<Tarnvault>(new Tarnvault(parameters)))
 {

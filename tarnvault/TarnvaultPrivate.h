@@ -38,6 +38,14 @@ public:
     using std::runtime_error::runtime_error;
 };
 
+// The migration decision for a missing preferences root: leaves `next` as
+// it is when no migration was asked for, or makes it the migration step and
+// clears both switches. False: `error` has been called, and no root is to be
+// made.
+bool DecideMigration(const boost::shared_ptr<Tarnvault>& client, const boost::shared_ptr<Collection>& root,
+                     const CollectionCallback& success, const ErrorCallback& error, const Guid& guid,
+                     CollectionCallback& next);
+
 namespace {
 
 inline std::string HeaderTraceText(const boost::shared_ptr<tolmonet::Response>& response)

@@ -63,14 +63,10 @@ void _HandleGetPreferencesRoot(const boost::weak_ptr<Tarnvault>& self, const boo
         success(requestUID, boost::static_pointer_cast<Collection>(assets.front()));
         return;
     }
-    // Migration of an earlier version's tree is not in this build: better no
-    // sync than an empty preferences root where the user expects old data.
-    if (client->mMigrateMajor || client->mMigratePreviousMajor) {
-        error(requestUID, MakeErrorResponse(ToUTF16("Preference migration is not available in this build")));
-        return;
-    }
+    CollectionCallback next = success;
+    if (!DecideMigration(client, root, success, error, requestUID, next)) return;
     const Guid sent = client->CreateCollectionAsync(
-        boost::bind(&_HandleGetPreferencesRootCreateCollection, client, root, success, error, _1, _2), error, name,
+        boost::bind(&_HandleGetPreferencesRootCreateCollection, client, root, next, error, _1, _2), error, name,
         kCollectionType_Preferences, requestUID);
     if (sent.IsNil()) error(requestUID, MakeErrorResponse(ToUTF16("CreateCollection failed")));
 }

@@ -155,21 +155,6 @@ TEST_F(ClientTest, PreferencesRootOfTheWrongKindOrTwiceIsRefused)
     EXPECT_EQ(mService.Requests().size(), 3u);
 }
 
-TEST(PreferencesRoot, MigrationSwitchFailsInsteadOfMakingAnEmptyRoot)
-{
-    ScriptedService service;
-    ParameterList parameters = Parameters(service.ApiUrl(), "tok", "client-1");
-    parameters.push_back(std::make_pair(tolmonet::kHEADER_CACHECONTROL, UTF8String("migrate-major")));
-    boost::shared_ptr<Tarnvault> client(new Tarnvault(parameters));
-    service.Script(200, "[" + kRoot + "]");
-    service.Script(200, "[]");
-    Outcome outcome;
-    client->GetPreferencesRootAsync(outcome.CollectionDone(), outcome.Error(), Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_EQ(outcome.ErrorText(), "Preference migration is not available in this build");
-    EXPECT_EQ(service.Requests().size(), 2u);
-}
-
 TEST(Ownership, AClientWithARequestInFlightLivesUntilItsCallback)
 {
     std::promise<void> release;
