@@ -339,10 +339,10 @@ private:
 // Collects trace lines while it lives.
 class TraceLines {
 public:
-    explicit TraceLines(const std::string& spec)
+    explicit TraceLines(const std::string& levels)
     {
         tolmocore::debug::SetTraceFile("/dev/null");
-        tolmocore::debug::SetTraceSpec(spec);
+        tolmocore::debug::SetTraceSpec(levels);
         tolmocore::debug::SetTraceListener([this](const std::string& line) {
             std::lock_guard<std::mutex> lock(mMutex);
             mLines.push_back(line);
