@@ -21,12 +21,13 @@ const char kToken[] = "scenario-token";
 
 }  // namespace
 
-LocalScenarioServer::LocalScenarioServer()
+LocalScenarioServer::LocalScenarioServer(const server::AnswerStyle& style)
 {
     server::LocalServiceOptions options;
     options.mDataDirectory = mData.Path().string();
     options.mTokens.push_back({"scenario", kToken});
     mService.reset(new server::LocalService(options));
+    mService->SetAnswerStyle(style);
     mService->Start();
     mOwner = mService->GetAccounts().EnsureUser("scenario");
 }

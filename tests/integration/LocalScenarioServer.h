@@ -10,7 +10,7 @@ namespace synctest {
 
 class LocalScenarioServer final : public ScenarioServer {
 public:
-    LocalScenarioServer();
+    explicit LocalScenarioServer(const tolmonetsync::server::AnswerStyle& style = {});
     ~LocalScenarioServer() override;
 
     boost::shared_ptr<tolmonetsync::SyncServer> Client() override;
