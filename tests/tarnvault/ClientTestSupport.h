@@ -52,6 +52,15 @@ public:
         std::lock_guard<std::mutex> lock(mMutex);
         mAnswers.push_back(answer);
     }
+    // A 200 with a body that the server cuts off half way.
+    void ScriptHangUp(const std::string& body)
+    {
+        HttpAnswer answer;
+        answer.mBody = body;
+        answer.mFault = HttpAnswer::Fault_HangUpMidBody;
+        std::lock_guard<std::mutex> lock(mMutex);
+        mAnswers.push_back(answer);
+    }
     std::vector<HttpRequest> Requests() const
     {
         std::lock_guard<std::mutex> lock(mMutex);

@@ -203,3 +203,17 @@ TEST_F(TransferTest, DownloadIntoAMissingDirectoryFailsWithoutAFile)
     EXPECT_FALSE(outcome.ErrorText().empty());
     EXPECT_FALSE(std::filesystem::exists(mDir / "no" / "f.txt"));
 }
+
+TEST_F(TransferTest, DownloadCutOffMidBodyFailsWithoutTouchingTheFile)
+{
+    WriteFileBytes(mDir / "f.txt", "old");
+    mService.ScriptHangUp(std::string(100000, 'x'));
+    Outcome outcome;
+    mClient->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i1"), FileAt(mDir / "f.txt"), "",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(outcome.Wait());
+    EXPECT_FALSE(outcome.Succeeded());
+    EXPECT_EQ(outcome.Status(), -100);
+    EXPECT_FALSE(outcome.ErrorText().empty());
+    EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "old");
+}
