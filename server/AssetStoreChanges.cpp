@@ -129,6 +129,19 @@ AssetRecord AssetStore::Upload(std::int64_t owner, const std::vector<std::string
     return record;
 }
 
+std::size_t AssetStore::RemoveUnreferencedContent()
+{
+    std::size_t removed = 0;
+    Database::Lease db = mDatabase.Acquire();
+    for (const std::string& id : mContent.Ids()) {
+        Statement find(*db, "SELECT 1 FROM assets WHERE id = ?1 AND collection = 0");
+        if (find.Bind(1, id).Step()) continue;
+        mContent.Remove(id);
+        ++removed;
+    }
+    return removed;
+}
+
 void AssetStore::SetTrashed(std::int64_t owner, const std::string& id, bool trashed)
 {
     std::lock_guard<std::mutex> writer(mDatabase.WriteLock());

@@ -118,6 +118,18 @@ void ContentFiles::Remove(const std::string& id)
     ::unlink(PathOf(id).c_str());
 }
 
+std::vector<std::string> ContentFiles::Ids() const
+{
+    std::vector<std::string> ids;
+    DIR* dir = ::opendir(mDirectory.c_str());
+    if (!dir) Fail("cannot list", mDirectory);
+    while (dirent* entry = ::readdir(dir)) {
+        if (entry->d_name[0] != '.' && !IsTemporary(entry->d_name)) ids.push_back(entry->d_name);
+    }
+    ::closedir(dir);
+    return ids;
+}
+
 std::size_t ContentFiles::TemporaryCount() const
 {
     std::size_t count = 0;

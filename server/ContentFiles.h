@@ -8,6 +8,7 @@
 // system's message; Remove ignores a missing file.
 
 #include <string>
+#include <vector>
 
 namespace tolmonetsync {
 namespace server {
@@ -20,6 +21,8 @@ public:
     void Write(const std::string& id, const std::string& bytes);
     std::string Read(const std::string& id) const;
     void Remove(const std::string& id);
+    // Every item id that has a file, temporaries left out.
+    std::vector<std::string> Ids() const;
     // Leftover temporaries in the directory; for tests.
     std::size_t TemporaryCount() const;
     std::string PathOf(const std::string& id) const;

@@ -38,6 +38,7 @@ LocalService::LocalService(const LocalServiceOptions& options) : mOptions(option
     mAccounts = std::make_unique<Accounts>(*mDatabase);
     mAssets = std::make_unique<AssetStore>(*mDatabase, *mContent);
     mRouter = std::make_unique<Router>(AssetRoutes());
+    mAssets->RemoveUnreferencedContent();
     for (const ServiceUser& user : mOptions.mUsers) mAccounts->SetUser(user.mName, user.mPassword, user.mEmail);
     for (const ServiceToken& token : mOptions.mTokens) mAccounts->GrantToken(token.mUser, token.mToken);
 }

@@ -83,6 +83,19 @@ TEST_F(DurabilityTest, UploadCutShortLeavesNoHalfItem)
     EXPECT_EQ(1u, ContentFileCount());
 }
 
+TEST_F(DurabilityTest, BytesWithoutMetadataAreSweptAtStart)
+{
+    // What a crash after the bytes were synced and before the metadata committed leaves.
+    const std::string folder = CreateCollection(*mAlice, "folder");
+    const std::string kept = Upload(*mAlice, folder, "kept", "k");
+    testsupport::WriteFileBytes(mData.Path() / "data" / "content" / "0123456789abcdef0123456789abcdef", "orphan");
+    testsupport::WriteFileBytes(mData.Path() / "data" / "content" / "incoming.x.ABCDEF", "half");
+    ASSERT_EQ(3u, ContentFileCount());
+    Restart();
+    EXPECT_EQ(1u, ContentFileCount());
+    EXPECT_EQ("k", mAlice->Send("GET", "/assets/" + kept).mBody);
+}
+
 TEST_F(DurabilityTest, DeletedItemsLeaveNoContentBehind)
 {
     const std::string folder = CreateCollection(*mAlice, "folder");

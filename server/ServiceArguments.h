@@ -1,0 +1,21 @@
+#pragma once
+// The service's command-line values: "--user NAME:PASSWORD[:EMAIL]",
+// "--token NAME:TOKEN" and "--listen HOST:PORT". Each throws
+// std::invalid_argument with a one-line reason for a value it cannot take.
+
+#include <string>
+
+#include "server/LocalService.h"
+
+namespace tolmonetsync {
+namespace server {
+
+// The password runs to the last ':' only when what follows it holds an '@',
+// so a password may itself hold ':'.
+ServiceUser ParseUserArgument(const std::string& text);
+ServiceToken ParseTokenArgument(const std::string& text);
+// Only loopback hosts: the service is for one machine.
+void ParseListenArgument(const std::string& text, LocalServiceOptions& options);
+
+}  // namespace server
+}  // namespace tolmonetsync
