@@ -99,7 +99,7 @@ void Accounts::GrantToken(const std::string& name, const std::string& token, std
     Statement(*db, "INSERT OR REPLACE INTO tokens(hash, user_id, expires) VALUES(?1, ?2, ?3)")
         .Bind(1, Sha256Hex(token))
         .Bind(2, user)
-        .Bind(3, ttlSeconds > 0 ? NowSeconds() + ttlSeconds : std::int64_t(0))
+        .Bind(3, ttlSeconds != 0 ? NowSeconds() + ttlSeconds : std::int64_t(0))
         .Run();
 }
 

@@ -26,7 +26,8 @@ public:
     bool CheckPassword(const std::string& name, const std::string& password);
     // The user's number, made with no password if there is none yet.
     std::int64_t EnsureUser(const std::string& name);
-    // A token for that user; ttlSeconds 0 never expires.
+    // A token for that user; ttlSeconds 0 never expires, and one below 0
+    // has expired already (for tests of refusal).
     void GrantToken(const std::string& name, const std::string& token, std::int64_t ttlSeconds = 0);
     // The user a token opens, if it is known and has not expired.
     boost::optional<std::int64_t> UserForToken(const std::string& token);

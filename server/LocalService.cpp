@@ -40,7 +40,9 @@ LocalService::LocalService(const LocalServiceOptions& options) : mOptions(option
     mRouter = std::make_unique<Router>(AssetRoutes());
     mAssets->RemoveUnreferencedContent();
     for (const ServiceUser& user : mOptions.mUsers) mAccounts->SetUser(user.mName, user.mPassword, user.mEmail);
-    for (const ServiceToken& token : mOptions.mTokens) mAccounts->GrantToken(token.mUser, token.mToken);
+    for (const ServiceToken& token : mOptions.mTokens) {
+        mAccounts->GrantToken(token.mUser, token.mToken, mOptions.mTokenTtlSeconds);
+    }
 }
 
 LocalService::~LocalService()

@@ -55,6 +55,7 @@ struct LocalServiceOptions {
     int mPort = 0;  // 0 picks a free port
     std::vector<ServiceUser> mUsers;
     std::vector<ServiceToken> mTokens;
+    std::int64_t mTokenTtlSeconds = 0;  // for mTokens; 0 never expires
     int mWorkers = 32;  // each kept-alive connection holds one while it lasts
 };
 

@@ -63,6 +63,16 @@ TEST_F(AuthorisationTest, AnotherUserCannotChangeOrDelete)
     EXPECT_EQ((std::vector<std::string>{mItem}), Ids(mAlice->Send("GET", "/collections/" + mFolder + "/members")));
 }
 
+TEST_F(AuthorisationTest, ExpiredTokensGet401AndLiveOnesStillWork)
+{
+    mService->GetAccounts().GrantToken("alice", "alice-expired", -1);
+    mService->GetAccounts().GrantToken("alice", "alice-for-an-hour", 3600);
+    ServiceClient expired(mService->AssetServiceUrl(), "alice-expired");
+    EXPECT_EQ(401, expired.Send("GET", "/assets/" + mItem).mStatus);
+    ServiceClient live(mService->AssetServiceUrl(), "alice-for-an-hour");
+    EXPECT_EQ(200, live.Send("GET", "/assets/" + mItem).mStatus);
+}
+
 TEST_F(AuthorisationTest, SameClientIdGivesEachUserTheirOwnRoot)
 {
     EXPECT_NE(ClientRoot(*mAlice, "app"), ClientRoot(*mBob, "app"));
