@@ -5,6 +5,7 @@
 #include <chrono>
 #include <condition_variable>
 #include <filesystem>
+#include <memory>
 #include <mutex>
 
 #include <boost/pointer_cast.hpp>
@@ -22,67 +23,95 @@ namespace {
 using namespace tolmonetsync;
 using tolmonetsync::server::AnswerStyle;
 
-// What one operation's callbacks received; Wait gives up after 60 s.
+// What one operation's callbacks received; Succeeded gives up after 60 s.
+// The callbacks share the state, so one that comes late finds it alive.
 class Call {
 public:
     ErrorCallback Error()
     {
-        return [this](const Guid&, const boost::shared_ptr<tolmonet::Response>& response) {
-            Finish(false, [&] { mStatus = response ? response->status : 0; });
+        auto state = mState;
+        return [state](const Guid&, const boost::shared_ptr<tolmonet::Response>& response) {
+            state->Finish(false, [&](State& s) { s.mStatus = response ? response->status : 0; });
         };
     }
     SuccessCallback Done()
     {
-        return [this](const Guid&) { Finish(true, [] {}); };
+        auto state = mState;
+        return [state](const Guid&) { state->Finish(true, [](State&) {}); };
     }
     CollectionCallback CollectionDone()
     {
-        return [this](const Guid&, const boost::shared_ptr<Collection>& c) { Finish(true, [&] { mAsset = c; }); };
+        auto state = mState;
+        return [state](const Guid&, const boost::shared_ptr<Collection>& c) {
+            state->Finish(true, [&](State& s) { s.mAsset = c; });
+        };
     }
     AssetCallback AssetDone()
     {
-        return [this](const Guid&, const boost::shared_ptr<AssetBase>& a) { Finish(true, [&] { mAsset = a; }); };
+        auto state = mState;
+        return [state](const Guid&, const boost::shared_ptr<AssetBase>& a) {
+            state->Finish(true, [&](State& s) { s.mAsset = a; });
+        };
     }
     ItemCallback ItemDone()
     {
-        return [this](const Guid&, const boost::shared_ptr<Item>& i) { Finish(true, [&] { mAsset = i; }); };
+        auto state = mState;
+        return [state](const Guid&, const boost::shared_ptr<Item>& i) {
+            state->Finish(true, [&](State& s) { s.mAsset = i; });
+        };
     }
     DownloadCallback Downloaded()
     {
-        return [this](const Guid&, const DownloadResult& r) { Finish(true, [&] { mDownload = r; }); };
+        auto state = mState;
+        return [state](const Guid&, const DownloadResult& r) {
+            state->Finish(true, [&](State& s) { s.mDownload = r; });
+        };
     }
     // True once a callback came and it was the success callback.
     bool Succeeded()
     {
-        std::unique_lock<std::mutex> lock(mMutex);
-        mChanged.wait_for(lock, std::chrono::seconds(60), [&] { return mDone; });
-        return mDone && mSuccess;
+        std::unique_lock<std::mutex> lock(mState->mMutex);
+        mState->mChanged.wait_for(lock, std::chrono::seconds(60), [&] { return mState->mDone; });
+        return mState->mDone && mState->mSuccess;
     }
-    int Status()
+    int Status() const
     {
-        std::lock_guard<std::mutex> lock(mMutex);
-        return mStatus;
+        std::lock_guard<std::mutex> lock(mState->mMutex);
+        return mState->mStatus;
     }
-
-    boost::shared_ptr<AssetBase> mAsset;
-    DownloadResult mDownload;
+    boost::shared_ptr<AssetBase> Asset() const
+    {
+        std::lock_guard<std::mutex> lock(mState->mMutex);
+        return mState->mAsset;
+    }
+    DownloadResult Download() const
+    {
+        std::lock_guard<std::mutex> lock(mState->mMutex);
+        return mState->mDownload;
+    }
 
 private:
-    template <typename F>
-    void Finish(bool success, F fill)
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        fill();
-        mSuccess = success;
-        mDone = true;
-        mChanged.notify_all();
-    }
+    struct State {
+        template <typename F>
+        void Finish(bool success, F fill)
+        {
+            std::lock_guard<std::mutex> lock(mMutex);
+            fill(*this);
+            mSuccess = success;
+            mDone = true;
+            mChanged.notify_all();
+        }
 
-    std::mutex mMutex;
-    std::condition_variable mChanged;
-    bool mDone = false;
-    bool mSuccess = false;
-    int mStatus = 0;
+        std::mutex mMutex;
+        std::condition_variable mChanged;
+        bool mDone = false;
+        bool mSuccess = false;
+        int mStatus = 0;
+        boost::shared_ptr<AssetBase> mAsset;
+        DownloadResult mDownload;
+    };
+
+    std::shared_ptr<State> mState = std::make_shared<State>();
 };
 
 class ClientAgreementTest : public ServiceTest, public ::testing::WithParamInterface<AnswerStyle> {
@@ -116,7 +145,7 @@ TEST_P(ClientAgreementTest, RootCollectionUploadDownloadAndDelete)
     Call root;
     ASSERT_FALSE(mClient->GetRootAsync(root.CollectionDone(), root.Error(), Guid::CreateUnique()).IsNil());
     ASSERT_TRUE(root.Succeeded()) << root.Status();
-    auto rootCollection = boost::dynamic_pointer_cast<Collection>(root.mAsset);
+    auto rootCollection = boost::dynamic_pointer_cast<Collection>(root.Asset());
     ASSERT_TRUE(rootCollection && rootCollection->is_root());
     EXPECT_EQ(ClientRoot(*mAlice, "desk app"), rootCollection->mId.ToStdString());
 
@@ -124,7 +153,7 @@ TEST_P(ClientAgreementTest, RootCollectionUploadDownloadAndDelete)
     mClient->CreateCollectionAsync(created.CollectionDone(), created.Error(), rootCollection, u"Group ?%+ \u00e9",
                                    kCollectionType_Collection, Guid::CreateUnique());
     ASSERT_TRUE(created.Succeeded()) << created.Status();
-    auto group = boost::dynamic_pointer_cast<Collection>(created.mAsset);
+    auto group = boost::dynamic_pointer_cast<Collection>(created.Asset());
     ASSERT_TRUE(group);
     EXPECT_EQ(u"Group ?%+ \u00e9", group->mName);
 
@@ -148,16 +177,16 @@ TEST_P(ClientAgreementTest, RootCollectionUploadDownloadAndDelete)
     mClient->DownloadAsync(download.Downloaded(), download.Error(), item, FileNamed("copy"), UTF8String(),
                            Guid::CreateUnique());
     ASSERT_TRUE(download.Succeeded()) << download.Status();
-    EXPECT_TRUE(download.mDownload.mDownloaded);
-    EXPECT_EQ(14u, download.mDownload.mContentSize);
-    EXPECT_EQ("text/plain", download.mDownload.mContentType.ToStdString());
+    EXPECT_TRUE(download.Download().mDownloaded);
+    EXPECT_EQ(14u, download.Download().mContentSize);
+    EXPECT_EQ("text/plain", download.Download().mContentType.ToStdString());
     EXPECT_EQ("second, longer", testsupport::ReadFileBytes(mData.Path() / "copy"));
 
     Call unchanged;
     mClient->DownloadAsync(unchanged.Downloaded(), unchanged.Error(), item, FileNamed("unchanged"),
-                           download.mDownload.mEtag, Guid::CreateUnique());
+                           download.Download().mEtag, Guid::CreateUnique());
     ASSERT_TRUE(unchanged.Succeeded()) << unchanged.Status();
-    EXPECT_FALSE(unchanged.mDownload.mDownloaded);
+    EXPECT_FALSE(unchanged.Download().mDownloaded);
     EXPECT_FALSE(std::filesystem::exists(mData.Path() / "unchanged"));
 
     Call removed;
@@ -176,8 +205,8 @@ TEST_P(ClientAgreementTest, UserRootIsTheOneRootASearchFinds)
     Call root;
     mClient->GetUserFileRootAsync(root.CollectionDone(), root.Error(), Guid::CreateUnique());
     ASSERT_TRUE(root.Succeeded()) << root.Status();
-    ASSERT_TRUE(root.mAsset && root.mAsset->is_root());
-    EXPECT_EQ(u"root", root.mAsset->mName);
+    ASSERT_TRUE(root.Asset() && root.Asset()->is_root());
+    EXPECT_EQ(u"root", root.Asset()->mName);
 }
 
 AnswerStyle Style(server::IdForm form, bool absolute, server::HeaderCase headerCase, bool sizeAsString,
