@@ -6,10 +6,10 @@ namespace tolmonetsync {
 namespace server {
 
 enum IdForm {
-    IdForm_Plain,     // "id": "abc"
-    IdForm_Path,      // "id": "/collections/abc" or "/assets/abc"
-    IdForm_ApiPath,   // "id": "/api/collections/abc" for collections; items as IdForm_Path
-    IdForm_UrlOnly,   // no "id"; "url" as IdForm_ApiPath
+    IdForm_Plain,    // "id": "abc"
+    IdForm_Path,     // "id": "/collections/abc" or "/assets/abc"
+    IdForm_ApiPath,  // "id": "/api/collections/abc" for collections; items as IdForm_Path
+    IdForm_UrlOnly,  // no "id"; "url" as IdForm_ApiPath
 };
 
 enum HeaderCase {

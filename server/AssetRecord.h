@@ -23,7 +23,7 @@ struct AssetRecord {
     std::string mMediaType;  // a collection's kind or an item's content type
     std::string mName;
     std::int64_t mSize = 0;
-    std::string mEtag;        // quoted; items only
+    std::string mEtag;           // quoted; items only
     std::int64_t mCreated = 0;   // microseconds since 1970, UTC
     std::int64_t mModified = 0;  // the same
     bool mTrashed = false;

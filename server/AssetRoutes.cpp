@@ -39,8 +39,8 @@ void ClientRoot(Exchange& exchange)
 
 void CreateCollection(Exchange& exchange)
 {
-    if (exchange.mRequest.get_header_value("Content-Type").compare(0, sizeof(kJsonMediaType) - 1,
-                                                                     kJsonMediaType) != 0) {
+    if (exchange.mRequest.get_header_value("Content-Type").compare(0, sizeof(kJsonMediaType) - 1, kJsonMediaType) !=
+        0) {
         throw StoreFailure(400, "a create takes a JSON body");
     }
     const CreateRequest request = ParseCreateBody(exchange.mRequest.body);
@@ -56,8 +56,8 @@ void Header(Exchange& exchange)
 
 void ListMembers(Exchange& exchange)
 {
-    exchange.Json(200, AssetListText(exchange.mAssets.Members(exchange.mUser, exchange.mParams.at(0)),
-                                     exchange.mStyle));
+    exchange.Json(200,
+                  AssetListText(exchange.mAssets.Members(exchange.mUser, exchange.mParams.at(0)), exchange.mStyle));
 }
 
 void AddMembers(Exchange& exchange)
@@ -80,9 +80,8 @@ void Upload(Exchange& exchange)
     const std::string name = Required(exchange, "name");
     if (name.empty()) throw StoreFailure(400, "an upload needs a name");
     const std::vector<std::string> collections = ParseUploadCollections(Required(exchange, "collections"));
-    const AssetRecord item = exchange.mAssets.Upload(exchange.mUser, collections, name,
-                                                     exchange.mRequest.get_header_value("Content-Type"),
-                                                     exchange.mRequest.body);
+    const AssetRecord item = exchange.mAssets.Upload(
+        exchange.mUser, collections, name, exchange.mRequest.get_header_value("Content-Type"), exchange.mRequest.body);
     exchange.Header("Location", exchange.Location(false, item.mId));
     exchange.Header("ETag", item.mEtag);
     exchange.Json(201, AssetText(item, exchange.mStyle));

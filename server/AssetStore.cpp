@@ -42,9 +42,9 @@ AssetStore::AssetStore(Database& database, ContentFiles& content) : mDatabase(da
 std::int64_t AssetStore::Stamp()
 {
     // Strictly later than the change before, so "modified" always moves.
-    std::int64_t now = std::chrono::duration_cast<std::chrono::microseconds>(
-                           std::chrono::system_clock::now().time_since_epoch())
-                           .count();
+    std::int64_t now =
+        std::chrono::duration_cast<std::chrono::microseconds>(std::chrono::system_clock::now().time_since_epoch())
+            .count();
     if (now <= mLastStamp) now = mLastStamp + 1;
     mLastStamp = now;
     return now;
@@ -90,8 +90,8 @@ AssetRecord AssetStore::UserRoot(std::int64_t owner)
 AssetRecord AssetStore::ClientRoot(std::int64_t owner, const std::string& clientId)
 {
     EnsureUserRoot(owner);
-    const char* const kFind = "SELECT " TOLMONETSYNC_ASSET_COLUMNS
-                              " FROM assets a WHERE a.owner = ?1 AND a.client_id = ?2";
+    const char* const kFind =
+        "SELECT " TOLMONETSYNC_ASSET_COLUMNS " FROM assets a WHERE a.owner = ?1 AND a.client_id = ?2";
     {
         Database::Lease db = mDatabase.Acquire();
         Statement find(*db, kFind);

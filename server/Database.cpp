@@ -97,8 +97,8 @@ bool Statement::IsNull(int column) const
 
 Connection::Connection(const std::string& path)
 {
-    const int rc = sqlite3_open_v2(path.c_str(), &mDb,
-                                   SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE | SQLITE_OPEN_NOMUTEX, nullptr);
+    const int rc =
+        sqlite3_open_v2(path.c_str(), &mDb, SQLITE_OPEN_READWRITE | SQLITE_OPEN_CREATE | SQLITE_OPEN_NOMUTEX, nullptr);
     if (rc != SQLITE_OK) {
         const std::string message = mDb ? sqlite3_errmsg(mDb) : sqlite3_errstr(rc);
         sqlite3_close(mDb);

@@ -22,7 +22,7 @@ struct Exchange {
     std::int64_t mUser = 0;            // the signed-in user
     AnswerStyle mStyle;                // as it was when the request arrived
     AssetStore& mAssets;
-    int mPort = 0;                     // the service's own port, for absolute URLs
+    int mPort = 0;  // the service's own port, for absolute URLs
 
     // The query value, or empty; present tells whether the key was there.
     std::string Query(const char* key, bool* present = nullptr) const;

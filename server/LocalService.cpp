@@ -75,7 +75,8 @@ void LocalService::Start()
     } else if (!server->bind_to_port(mOptions.mHost.c_str(), port)) {
         port = -1;
     }
-    if (port <= 0) throw std::runtime_error("cannot listen on " + mOptions.mHost + ":" + std::to_string(mOptions.mPort));
+    if (port <= 0)
+        throw std::runtime_error("cannot listen on " + mOptions.mHost + ":" + std::to_string(mOptions.mPort));
     mPort = port;
     mServer = std::move(server);
     httplib::Server* raw = mServer.get();

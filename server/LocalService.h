@@ -56,7 +56,7 @@ struct LocalServiceOptions {
     std::vector<ServiceUser> mUsers;
     std::vector<ServiceToken> mTokens;
     std::int64_t mTokenTtlSeconds = 0;  // for mTokens; 0 never expires
-    int mWorkers = 32;  // each kept-alive connection holds one while it lasts
+    int mWorkers = 32;                  // each kept-alive connection holds one while it lasts
 };
 
 class LocalService {

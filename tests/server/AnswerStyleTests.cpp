@@ -44,8 +44,7 @@ TEST_P(AnswerStyleTest, SearchAndMembersReadBackToTheRealIds)
 
 INSTANTIATE_TEST_SUITE_P(IdForms, AnswerStyleTest,
                          ::testing::Values(tolmonetsync::server::IdForm_Plain, tolmonetsync::server::IdForm_Path,
-                                           tolmonetsync::server::IdForm_ApiPath,
-                                           tolmonetsync::server::IdForm_UrlOnly));
+                                           tolmonetsync::server::IdForm_ApiPath, tolmonetsync::server::IdForm_UrlOnly));
 
 class AnswerHeaderTest : public AnswerStyleTest {};
 

@@ -50,8 +50,9 @@ TEST_F(AuthorisationTest, AnotherUserCannotChangeOrDelete)
     const std::string bobs = CreateCollection(*mBob, "bob's");
     const std::vector<std::string> json = {"Content-Type: application/json"};
     EXPECT_EQ(404, mBob->Send("PUT", "/collections/" + bobs + "/members", "[\"/assets/" + mItem + "\"]", json).mStatus);
-    EXPECT_EQ(404, mBob->Send("PUT", "/collections/" + mFolder + "/members", "[\"/collections/" + bobs + "\"]", json)
-                       .mStatus);
+    EXPECT_EQ(
+        404,
+        mBob->Send("PUT", "/collections/" + mFolder + "/members", "[\"/collections/" + bobs + "\"]", json).mStatus);
     EXPECT_EQ(404, mBob->Send("POST", "/assets?name=x&collections=" + Quote("[\"/api/collections/" + mFolder + "\"]"),
                               "intruder")
                        .mStatus);

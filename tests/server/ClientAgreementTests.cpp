@@ -63,9 +63,8 @@ public:
     DownloadCallback Downloaded()
     {
         auto state = mState;
-        return [state](const Guid&, const DownloadResult& r) {
-            state->Finish(true, [&](State& s) { s.mDownload = r; });
-        };
+        return
+            [state](const Guid&, const DownloadResult& r) { state->Finish(true, [&](State& s) { s.mDownload = r; }); };
     }
     // True once a callback came and it was the success callback.
     bool Succeeded()
@@ -160,8 +159,8 @@ TEST_P(ClientAgreementTest, RootCollectionUploadDownloadAndDelete)
     const ImmutableString textType = ImmutableString::CreateStatic("text/plain");
     for (const std::string& bytes : {std::string("first"), std::string("second, longer")}) {
         Call upload;  // the second replaces the first: search, delete, post, metadata
-        mClient->UploadAsync(upload.ItemDone(), upload.Error(), group, Source(bytes), textType,
-                             u"a b?.txt", Guid::CreateUnique());
+        mClient->UploadAsync(upload.ItemDone(), upload.Error(), group, Source(bytes), textType, u"a b?.txt",
+                             Guid::CreateUnique());
         ASSERT_TRUE(upload.Succeeded()) << upload.Status();
     }
     Call children;
@@ -209,8 +208,7 @@ TEST_P(ClientAgreementTest, UserRootIsTheOneRootASearchFinds)
     EXPECT_EQ(u"root", root.Asset()->mName);
 }
 
-AnswerStyle Style(server::IdForm form, bool absolute, server::HeaderCase headerCase, bool sizeAsString,
-                  bool fractions)
+AnswerStyle Style(server::IdForm form, bool absolute, server::HeaderCase headerCase, bool sizeAsString, bool fractions)
 {
     AnswerStyle style;
     style.mIdForm = form;
@@ -221,12 +219,11 @@ AnswerStyle Style(server::IdForm form, bool absolute, server::HeaderCase headerC
     return style;
 }
 
-INSTANTIATE_TEST_SUITE_P(
-    Styles, ClientAgreementTest,
-    ::testing::Values(Style(server::IdForm_Plain, false, server::HeaderCase_Usual, false, true),
-                      Style(server::IdForm_Path, true, server::HeaderCase_Lower, true, false),
-                      Style(server::IdForm_ApiPath, false, server::HeaderCase_Upper, false, false),
-                      Style(server::IdForm_UrlOnly, true, server::HeaderCase_Usual, true, true)));
+INSTANTIATE_TEST_SUITE_P(Styles, ClientAgreementTest,
+                         ::testing::Values(Style(server::IdForm_Plain, false, server::HeaderCase_Usual, false, true),
+                                           Style(server::IdForm_Path, true, server::HeaderCase_Lower, true, false),
+                                           Style(server::IdForm_ApiPath, false, server::HeaderCase_Upper, false, false),
+                                           Style(server::IdForm_UrlOnly, true, server::HeaderCase_Usual, true, true)));
 
 }  // namespace
 }  // namespace servertest

@@ -36,9 +36,9 @@ TEST_F(ConcurrencyTest, SixteenClientsUploadDownloadAndSearchWithoutErrors)
                 }
                 const Reply download = client.Send("GET", "/assets/" + IdFromLocation(upload.Header("Location")));
                 if (download.mStatus != 200 || download.mBody != bytes) ++failures;
-                const Reply search = client.Send("POST", "/search?q=" + Quote("{\"trashed\":{\"$ne\":true}}") +
-                                                             "&metadata=true&scope=" +
-                                                             Quote("[\"/collections/" + folders[i] + "\"]"));
+                const Reply search =
+                    client.Send("POST", "/search?q=" + Quote("{\"trashed\":{\"$ne\":true}}") +
+                                            "&metadata=true&scope=" + Quote("[\"/collections/" + folders[i] + "\"]"));
                 if (search.mStatus != 200) ++failures;
             }
         });

@@ -37,11 +37,10 @@ protected:
         address.sin_port = htons(static_cast<uint16_t>(mService->Port()));
         address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
         ASSERT_EQ(0, ::connect(fd, reinterpret_cast<sockaddr*>(&address), sizeof(address)));
-        const std::string request = "POST /api/assets?name=cut&collections=" +
-                                    Quote("[\"/api/collections/" + folder + "\"]") +
-                                    " HTTP/1.1\r\nHost: 127.0.0.1\r\nAuthorization: Bearer " + kAliceToken +
-                                    "\r\nContent-Type: text/plain\r\nContent-Length: 100000\r\n\r\n" +
-                                    std::string(1000, 'x');
+        const std::string request =
+            "POST /api/assets?name=cut&collections=" + Quote("[\"/api/collections/" + folder + "\"]") +
+            " HTTP/1.1\r\nHost: 127.0.0.1\r\nAuthorization: Bearer " + kAliceToken +
+            "\r\nContent-Type: text/plain\r\nContent-Length: 100000\r\n\r\n" + std::string(1000, 'x');
         ASSERT_EQ(static_cast<ssize_t>(request.size()), ::send(fd, request.data(), request.size(), MSG_NOSIGNAL));
         ::close(fd);
     }

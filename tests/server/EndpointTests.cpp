@@ -43,10 +43,10 @@ TEST_F(EndpointTest, SearchByRootTypeFindsOnlyTheUserRootNamedRoot)
 
 TEST_F(EndpointTest, CreateAnswersLocationAndTheHeaderReadsBack)
 {
-    const Reply created = mAlice->Send("POST", "/collections",
-                                       std::string("{\"header\":{\"name\":\"Prefs ?%+\",\"type\":\"") +
-                                           kPreferencesType + "\"}}",
-                                       {"Content-Type: application/json"});
+    const Reply created =
+        mAlice->Send("POST", "/collections",
+                     std::string("{\"header\":{\"name\":\"Prefs ?%+\",\"type\":\"") + kPreferencesType + "\"}}",
+                     {"Content-Type: application/json"});
     ASSERT_EQ(201, created.mStatus) << created.mBody;
     const std::string location = created.Header("Location");
     EXPECT_EQ(0u, location.find("/api/collections/"));
@@ -65,8 +65,9 @@ TEST_F(EndpointTest, CreateAnswersLocationAndTheHeaderReadsBack)
 TEST_F(EndpointTest, CreateRefusesRootsKindlessCollectionsAndBadBodies)
 {
     const std::vector<std::string> json = {"Content-Type: application/json"};
-    EXPECT_EQ(400, mAlice->Send("POST", "/collections",
-                                std::string("{\"header\":{\"name\":\"r\",\"type\":\"") + kRootType + "\"}}", json)
+    EXPECT_EQ(400, mAlice
+                       ->Send("POST", "/collections",
+                              std::string("{\"header\":{\"name\":\"r\",\"type\":\"") + kRootType + "\"}}", json)
                        .mStatus);
     EXPECT_EQ(400, mAlice->Send("POST", "/collections", "{\"header\":{\"name\":\"n\",\"type\":\"\"}}", json).mStatus);
     EXPECT_EQ(400, mAlice->Send("POST", "/collections", "{\"header\":", json).mStatus);
@@ -95,13 +96,15 @@ TEST_F(EndpointTest, AddRefusesCyclesMissingAssetsAndBadPaths)
     const std::string inner = CreateCollection(*mAlice, "inner");
     AddMember(*mAlice, outer, "/collections/" + inner);
     const std::vector<std::string> json = {"Content-Type: application/json"};
-    EXPECT_EQ(409, mAlice->Send("PUT", "/collections/" + inner + "/members", "[\"/collections/" + outer + "\"]", json)
-                       .mStatus);
-    EXPECT_EQ(409, mAlice->Send("PUT", "/collections/" + outer + "/members", "[\"/collections/" + outer + "\"]", json)
-                       .mStatus);
+    EXPECT_EQ(
+        409,
+        mAlice->Send("PUT", "/collections/" + inner + "/members", "[\"/collections/" + outer + "\"]", json).mStatus);
+    EXPECT_EQ(
+        409,
+        mAlice->Send("PUT", "/collections/" + outer + "/members", "[\"/collections/" + outer + "\"]", json).mStatus);
     EXPECT_EQ(404, mAlice->Send("PUT", "/collections/" + outer + "/members", "[\"/assets/nothing\"]", json).mStatus);
-    EXPECT_EQ(404, mAlice->Send("PUT", "/collections/nothing/members", "[\"/collections/" + inner + "\"]", json)
-                       .mStatus);
+    EXPECT_EQ(404,
+              mAlice->Send("PUT", "/collections/nothing/members", "[\"/collections/" + inner + "\"]", json).mStatus);
     EXPECT_EQ(400, mAlice->Send("PUT", "/collections/" + outer + "/members", "[\"elsewhere/x\"]", json).mStatus);
     EXPECT_EQ(400, mAlice->Send("PUT", "/collections/" + outer + "/members", "{\"a\":1}", json).mStatus);
 }
@@ -142,7 +145,8 @@ TEST_F(EndpointTest, UploadAnswersEtagAndLocationAndTheMetadataReadsBackAsAnItem
 {
     const std::string folder = CreateCollection(*mAlice, "folder");
     const Reply reply = mAlice->Send(
-        "POST", "/assets?name=" + Quote("na me?.txt") + "&collections=" + Quote("[\"/api/collections/" + folder + "\"]"),
+        "POST",
+        "/assets?name=" + Quote("na me?.txt") + "&collections=" + Quote("[\"/api/collections/" + folder + "\"]"),
         "hello", {"Content-Type: text/plain", "X-Persistence-Policy: ethereal"});
     ASSERT_EQ(201, reply.mStatus) << reply.mBody;
     const std::string etag = reply.Header("ETag");
@@ -167,9 +171,10 @@ TEST_F(EndpointTest, UploadRefusesCollectionTypesAndMissingParts)
 {
     const std::string folder = CreateCollection(*mAlice, "folder");
     const std::string collections = "&collections=" + Quote("[\"/api/collections/" + folder + "\"]");
-    EXPECT_EQ(400, mAlice->Send("POST", "/assets?name=x" + collections, "b",
-                                {std::string("Content-Type: ") + kCollectionType})
-                       .mStatus);
+    EXPECT_EQ(
+        400,
+        mAlice->Send("POST", "/assets?name=x" + collections, "b", {std::string("Content-Type: ") + kCollectionType})
+            .mStatus);
     EXPECT_EQ(400, mAlice->Send("POST", "/assets" + std::string("?") + collections.substr(1), "b").mStatus);
     EXPECT_EQ(400, mAlice->Send("POST", "/assets?name=x", "b").mStatus);
     EXPECT_EQ(400, mAlice->Send("POST", "/assets?name=x&collections=" + Quote("[\"/elsewhere/1\"]"), "b").mStatus);

@@ -52,7 +52,8 @@ TEST_F(FaultHookTest, StatusGoesToTheNthMatchingRequestOnly)
 
 TEST_F(FaultHookTest, MethodMustMatchToo)
 {
-    const auto hook = mService->Faults().Install(Rule("POST", "/api/assets/.*", tolmonetsync::server::FaultAction_Status));
+    const auto hook =
+        mService->Faults().Install(Rule("POST", "/api/assets/.*", tolmonetsync::server::FaultAction_Status));
     EXPECT_EQ(200, Download().mStatus);
     EXPECT_FALSE(hook->Fired());
     EXPECT_EQ(0, hook->Seen());
@@ -71,8 +72,8 @@ TEST_F(FaultHookTest, DelayStillAnswers)
 
 TEST_F(FaultHookTest, CloseBeforeAnswerGivesNoReplyAndTheNextRequestWorks)
 {
-    const auto hook = mService->Faults().Install(
-        Rule("GET", "/api/assets/.*", tolmonetsync::server::FaultAction_CloseBeforeAnswer));
+    const auto hook =
+        mService->Faults().Install(Rule("GET", "/api/assets/.*", tolmonetsync::server::FaultAction_CloseBeforeAnswer));
     std::unique_ptr<ServiceClient> fresh = Client(kAliceToken);  // a new connection: nothing to fall back on
     const Reply dropped = fresh->Send("GET", "/assets/" + mItem);
     EXPECT_TRUE(hook->Fired());
@@ -84,8 +85,8 @@ TEST_F(FaultHookTest, CloseBeforeAnswerOnAReusedConnectionIsRetriedByLibcurl)
 {
     // libcurl sends again, on a new connection, a request whose reused
     // connection closed without a byte: the service sees it twice.
-    const auto hook = mService->Faults().Install(
-        Rule("GET", "/api/assets/.*", tolmonetsync::server::FaultAction_CloseBeforeAnswer));
+    const auto hook =
+        mService->Faults().Install(Rule("GET", "/api/assets/.*", tolmonetsync::server::FaultAction_CloseBeforeAnswer));
     const Reply reply = Download();  // mAlice's connection is kept alive from SetUp
     EXPECT_TRUE(hook->Fired());
     EXPECT_EQ(CURLE_OK, reply.mCode);
@@ -95,7 +96,8 @@ TEST_F(FaultHookTest, CloseBeforeAnswerOnAReusedConnectionIsRetriedByLibcurl)
 
 TEST_F(FaultHookTest, CloseMidBodyCutsTheTransfer)
 {
-    const auto hook = mService->Faults().Install(Rule("POST", "/api/search", tolmonetsync::server::FaultAction_CloseMidBody));
+    const auto hook =
+        mService->Faults().Install(Rule("POST", "/api/search", tolmonetsync::server::FaultAction_CloseMidBody));
     const Reply cut = Search(*mAlice, "{}");
     EXPECT_TRUE(hook->Fired());
     EXPECT_EQ(CURLE_PARTIAL_FILE, cut.mCode) << curl_easy_strerror(cut.mCode);
@@ -104,14 +106,15 @@ TEST_F(FaultHookTest, CloseMidBodyCutsTheTransfer)
 
 TEST_F(FaultHookTest, BrokenBodiesAreNotReadableAssets)
 {
-    const auto notJson = mService->Faults().Install(Rule("POST", "/api/search", tolmonetsync::server::FaultAction_NotJson));
+    const auto notJson =
+        mService->Faults().Install(Rule("POST", "/api/search", tolmonetsync::server::FaultAction_NotJson));
     const Reply first = Search(*mAlice, "{}");
     EXPECT_TRUE(notJson->Fired());
     EXPECT_EQ(200, first.mStatus);
     EXPECT_ANY_THROW(Assets(first));
 
-    const auto wrongShape =
-        mService->Faults().Install(Rule("GET", "/api/assets/[^/]+/metadata", tolmonetsync::server::FaultAction_WrongShapeJson));
+    const auto wrongShape = mService->Faults().Install(
+        Rule("GET", "/api/assets/[^/]+/metadata", tolmonetsync::server::FaultAction_WrongShapeJson));
     const Reply header = mAlice->Send("GET", "/assets/" + mItem + "/metadata");
     EXPECT_TRUE(wrongShape->Fired());
     EXPECT_EQ(200, header.mStatus);

@@ -83,8 +83,8 @@ std::string ServiceTest::Upload(ServiceClient& client, const std::string& collec
 {
     const std::string query =
         "?name=" + Quote(name) + "&collections=" + Quote("[\"/api/collections/" + collectionId + "\"]");
-    const Reply reply = client.Send("POST", "/assets" + query, bytes,
-                                    {"Content-Type: " + type, "X-Persistence-Policy: ethereal"});
+    const Reply reply =
+        client.Send("POST", "/assets" + query, bytes, {"Content-Type: " + type, "X-Persistence-Policy: ethereal"});
     EXPECT_EQ(201, reply.mStatus) << reply.mBody;
     EXPECT_FALSE(reply.Header("ETag").empty());
     return IdFromLocation(reply.Header("Location"));

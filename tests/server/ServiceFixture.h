@@ -6,8 +6,8 @@
 #include <string>
 #include <vector>
 
-#include <boost/shared_ptr.hpp>
 #include <gtest/gtest.h>
+#include <boost/shared_ptr.hpp>
 
 #include "ServiceClient.h"
 #include "assets/Asset.h"
