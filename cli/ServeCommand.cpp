@@ -8,27 +8,19 @@
 #include <pthread.h>
 
 #include "server/LocalService.h"
+#include "server/ServiceArguments.h"
 
 namespace tolmonetsync {
 namespace cli {
 namespace {
 
-struct UsageError : std::runtime_error {
-    using std::runtime_error::runtime_error;
+struct UsageError : std::invalid_argument {
+    using std::invalid_argument::invalid_argument;
 };
 
 const char kServeUsage[] =
     "usage: tolmonetsync serve --data DIR [--listen HOST:PORT] [--user NAME:PASSWORD[:EMAIL]]... "
     "[--token NAME:TOKEN]...";
-
-// "NAME:REST": the first colon splits.
-std::pair<std::string, std::string> SplitOnce(const std::string& text, const char* what)
-{
-    const size_t colon = text.find(':');
-    if (colon == std::string::npos || colon == 0 || colon + 1 == text.size())
-        throw UsageError(std::string("expected ") + what + ", got '" + text + "'");
-    return {text.substr(0, colon), text.substr(colon + 1)};
-}
 
 server::LocalServiceOptions ParseServe(const std::vector<std::string>& arguments)
 {
@@ -42,28 +34,11 @@ server::LocalServiceOptions ParseServe(const std::vector<std::string>& arguments
         if (option == "--data") {
             options.mDataDirectory = value();
         } else if (option == "--listen") {
-            const std::string listen = value();
-            const size_t colon = listen.rfind(':');
-            if (colon == std::string::npos) throw UsageError("--listen takes HOST:PORT");
-            options.mHost = listen.substr(0, colon);
-            try {
-                size_t used = 0;
-                options.mPort = std::stoi(listen.substr(colon + 1), &used);
-                if (used != listen.size() - colon - 1 || options.mPort < 0 || options.mPort > 65535) throw 0;
-            } catch (...) {
-                throw UsageError("--listen has no valid port: '" + listen + "'");
-            }
+            server::ParseListenArgument(value(), options);
         } else if (option == "--user") {
-            const auto user = SplitOnce(value(), "NAME:PASSWORD[:EMAIL]");
-            const size_t colon = user.second.find(':');
-            server::ServiceUser entry;
-            entry.mName = user.first;
-            entry.mPassword = user.second.substr(0, colon);
-            if (colon != std::string::npos) entry.mEmail = user.second.substr(colon + 1);
-            options.mUsers.push_back(entry);
+            options.mUsers.push_back(server::ParseUserArgument(value()));
         } else if (option == "--token") {
-            const auto token = SplitOnce(value(), "NAME:TOKEN");
-            options.mTokens.push_back({token.first, token.second});
+            options.mTokens.push_back(server::ParseTokenArgument(value()));
         } else {
             throw UsageError("unknown option '" + option + "'");
         }
@@ -79,7 +54,7 @@ int RunServe(const std::vector<std::string>& arguments)
     server::LocalServiceOptions options;
     try {
         options = ParseServe(arguments);
-    } catch (const UsageError& e) {
+    } catch (const std::invalid_argument& e) {
         std::cerr << "tolmonetsync serve: " << e.what() << "\n" << kServeUsage << std::endl;
         return 2;
     }

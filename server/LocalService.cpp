@@ -57,6 +57,10 @@ void LocalService::Start()
     const int workers = mOptions.mWorkers;
     server->new_task_queue = [workers] { return new httplib::ThreadPool(static_cast<size_t>(workers)); };
     server->set_keep_alive_max_count(100000);
+    // An idle kept-alive connection holds a worker; let it go after a second
+    // (a client reconnects on loopback at once), so that many idle clients
+    // never starve busy ones and a stop never waits long for one.
+    server->set_keep_alive_timeout(1);
     // Faults apply once the body is read, so an answer never leaves unread
     // bytes on a kept-alive connection.
     const auto handler = [this](const httplib::Request& request, httplib::Response& response) {
