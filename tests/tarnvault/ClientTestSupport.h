@@ -23,6 +23,7 @@
 #include "foundation/net/HeaderConstants.h"
 #include "support/LoopbackHttpServer.h"
 #include "support/TempDir.h"
+#include "support/TestScopes.h"
 #include "tarnvault/Tarnvault.h"
 
 namespace tvtest {
@@ -328,52 +329,9 @@ private:
     UTF16String mCompany, mClient, mVersion;
 };
 
-// Points the preference directory (last-user file, keychain store) at a
-// fresh temporary directory for one test.
-class PrefDirScope {
-public:
-    PrefDirScope() : mPrevious(tolmocore::filesupport::Dir::PrefDir())
-    {
-        tolmocore::filesupport::Dir::SetPrefDir(
-            tolmocore::filesupport::Dir(tolmocore::utility::ToUTF16(mDir.Path().string())));
-    }
-    ~PrefDirScope() { tolmocore::filesupport::Dir::SetPrefDir(mPrevious); }
-    const std::filesystem::path& Path() const { return mDir.Path(); }
-
-private:
-    testsupport::TempDir mDir;
-    tolmocore::filesupport::Dir mPrevious;
-};
-
-// Collects trace lines while it lives.
-class TraceLines {
-public:
-    explicit TraceLines(const std::string& levels)
-    {
-        tolmocore::debug::SetTraceFile("/dev/null");
-        tolmocore::debug::SetTraceSpec(levels);
-        tolmocore::debug::SetTraceListener([this](const std::string& line) {
-            std::lock_guard<std::mutex> lock(mMutex);
-            mLines.push_back(line);
-        });
-    }
-    ~TraceLines()
-    {
-        tolmocore::debug::SetTraceListener(tolmocore::debug::TraceListener());
-        tolmocore::debug::SetTraceSpec("");
-        tolmocore::debug::SetTraceFile("");
-    }
-    bool Contains(const std::string& text)
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        for (const std::string& line : mLines)
-            if (line.find(text) != std::string::npos) return true;
-        return false;
-    }
-
-private:
-    std::mutex mMutex;
-    std::vector<std::string> mLines;
-};
+// A preference directory of its own (last-user file, keychain store) and
+// trace capture, shared with the other tests.
+using PrefDirScope = testsupport::PrefDirScope;
+using TraceLines = testsupport::TraceCapture;
 
 }  // namespace tvtest
