@@ -80,6 +80,13 @@ inline boost::any ParseAnswer(const UTF8String& body)
     return tolmocore::serialization::JSONParse(body);
 }
 
+// An answer that is a JSON array of assets, read whole or not at all.
+inline std::vector<boost::shared_ptr<AssetBase> > ParseAssetList(const UTF8String& body)
+{
+    return tolmocore::serialization::JSONConvert<std::vector<boost::shared_ptr<AssetBase> > >::FromJSON(
+        ParseAnswer(body));
+}
+
 // The error a handler reports for an exception out of its parsing: the
 // handler's own text, or a plain refusal of an oversized answer or of an
 // asset of the wrong class.

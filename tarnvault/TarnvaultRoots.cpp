@@ -99,7 +99,7 @@ void Tarnvault::_HandleGetRoot(const boost::weak_ptr<Tarnvault>& self, const Col
     }
     try {
         const std::vector<boost::shared_ptr<AssetBase> > assets =
-            json::JSONConvert<std::vector<boost::shared_ptr<AssetBase> > >::FromJSON(ParseAnswer(body));
+            ParseAssetList(body);
         boost::shared_ptr<Collection> root;
         for (const auto& asset : assets) {
             if (asset->is_collection() && asset->is_root()) {

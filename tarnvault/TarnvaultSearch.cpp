@@ -25,7 +25,7 @@ void _HandleSearch(const AssetsCallback& success, const ErrorCallback& error, co
     }
     try {
         const std::vector<boost::shared_ptr<AssetBase> > assets =
-            json::JSONConvert<std::vector<boost::shared_ptr<AssetBase> > >::FromJSON(ParseAnswer(body));
+            ParseAssetList(body);
         success(requestUID, assets);
     } catch (const std::exception& e) {
         ReportParseFailure("_HandleSearch", error, requestUID, e);
