@@ -14,23 +14,25 @@ namespace tolmonetsync {
 namespace cli {
 namespace {
 
-struct UsageError : std::invalid_argument {
-    using std::invalid_argument::invalid_argument;
-};
-
 const char kServeUsage[] =
-    "usage: tolmonetsync serve --data DIR [--listen HOST:PORT] [--user NAME:PASSWORD[:EMAIL]]... "
-    "[--token NAME:TOKEN]...";
+    "usage: tolmonetsync serve --data DIR [--listen HOST:PORT] [--user NAME:PASSWORD[:EMAIL]]...\n"
+    "         [--token NAME:TOKEN]...\n";
+const char kServeHelp[] =
+    "\n"
+    "Runs the local asset service (under /api) in the foreground until SIGINT or SIGTERM.\n"
+    "  --data DIR          where users, tokens and content are kept (made if missing)\n"
+    "  --listen HOST:PORT  the address to listen on (default 127.0.0.1:0; port 0 picks a free one)\n"
+    "  --user NAME:PASSWORD[:EMAIL]   creates or updates a user\n"
+    "  --token NAME:TOKEN  grants the user a fixed access token\n"
+    "The first line on stdout is \"listening on http://HOST:PORT\".\n";
 
-server::LocalServiceOptions ParseServe(const std::vector<std::string>& arguments)
+server::LocalServiceOptions ParseServe(GlobalOptions& globals, const std::vector<std::string>& arguments)
 {
     server::LocalServiceOptions options;
     for (size_t i = 0; i < arguments.size(); ++i) {
         const std::string& option = arguments[i];
-        auto value = [&]() -> const std::string& {
-            if (i + 1 >= arguments.size()) throw UsageError(option + " needs a value");
-            return arguments[++i];
-        };
+        if (ReadGlobalOption(arguments, i, globals)) continue;
+        auto value = [&]() -> const std::string& { return OptionValue(arguments, i); };
         if (option == "--data") {
             options.mDataDirectory = value();
         } else if (option == "--listen") {
@@ -43,21 +45,26 @@ server::LocalServiceOptions ParseServe(const std::vector<std::string>& arguments
             throw UsageError("unknown option '" + option + "'");
         }
     }
-    if (options.mDataDirectory.empty()) throw UsageError("--data is required");
+    if (options.mDataDirectory.empty() && !globals.mHelp) throw UsageError("--data is required");
     return options;
 }
 
 }  // namespace
 
-int RunServe(const std::vector<std::string>& arguments)
+int RunServe(GlobalOptions globals, const std::vector<std::string>& arguments)
 {
     server::LocalServiceOptions options;
     try {
-        options = ParseServe(arguments);
+        options = ParseServe(globals, arguments);
     } catch (const std::invalid_argument& e) {
-        std::cerr << "tolmonetsync serve: " << e.what() << "\n" << kServeUsage << std::endl;
+        std::cerr << "tolmonetsync serve: " << e.what() << "\n" << kServeUsage << std::flush;
         return 2;
     }
+    if (globals.mHelp) {
+        std::cout << kServeUsage << kServeHelp;
+        return 0;
+    }
+    ApplyGlobalOptions(globals);
 
     // Block the stop signals in every thread the service starts; this one
     // waits for them below.

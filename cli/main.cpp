@@ -1,30 +1,55 @@
-// The tolmonetsync command: parses the command word and hands the rest on.
+// The tolmonetsync command: global options, then a command word and its
+// own options.
 
 #include <iostream>
 #include <string>
 #include <vector>
 
+#include "cli/CommandLine.h"
+#include "cli/DemoCommand.h"
 #include "cli/ServeCommand.h"
+#include "cli/SyncCommand.h"
 
 namespace {
 
+using namespace tolmonetsync::cli;
+
 const char kUsage[] =
-    "usage: tolmonetsync COMMAND [options]\n"
-    "  serve    run the local asset service (see 'tolmonetsync serve --help')\n";
+    "usage: tolmonetsync [global options] COMMAND [options]\n"
+    "commands:\n"
+    "  serve    run the local asset service\n"
+    "  sync     keep directories and files in step with the asset service\n"
+    "  demo     the main job end to end on a local service with temporary data\n"
+    "'tolmonetsync COMMAND --help' tells more.\n";
 
 }  // namespace
 
 int main(int argc, char** argv)
 {
-    if (argc < 2) {
-        std::cerr << kUsage;
+    const std::vector<std::string> arguments(argv + 1, argv + argc);
+    GlobalOptions globals;
+    std::size_t index = 0;
+    try {
+        while (index < arguments.size() && ReadGlobalOption(arguments, index, globals)) ++index;
+    } catch (const UsageError& e) {
+        std::cerr << "tolmonetsync: " << e.what() << "\n" << kUsage;
         return 2;
     }
-    const std::string command = argv[1];
-    const std::vector<std::string> arguments(argv + 2, argv + argc);
-    if (command == "serve") return tolmonetsync::cli::RunServe(arguments);
-    if (command == "--help" || command == "-h" || command == "help") {
-        std::cout << kUsage;
+    if (index >= arguments.size()) {
+        if (globals.mHelp) {
+            std::cout << kUsage << "\n" << kGlobalOptionsHelp;
+            return 0;
+        }
+        std::cerr << "tolmonetsync: no command given\n" << kUsage;
+        return 2;
+    }
+    const std::string& command = arguments[index];
+    const std::vector<std::string> rest(arguments.begin() + static_cast<long>(index) + 1, arguments.end());
+    if (command == "serve") return RunServe(globals, rest);
+    if (command == "sync") return RunSync(globals, rest);
+    if (command == "demo") return RunDemo(globals, rest);
+    if (command == "help") {
+        std::cout << kUsage << "\n" << kGlobalOptionsHelp;
         return 0;
     }
     std::cerr << "tolmonetsync: unknown command '" << command << "'\n" << kUsage;

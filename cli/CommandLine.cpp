@@ -1,0 +1,89 @@
+#include "cli/CommandLine.h"
+
+#include <cstdlib>
+
+#include "foundation/core/Dir.h"
+#include "foundation/core/HostConfig.h"
+#include "foundation/core/Trace.h"
+
+namespace tolmonetsync {
+namespace cli {
+
+using tolmocore::utility::ToUTF16;
+
+const char kGlobalOptionsHelp[] =
+    "global options (before or after the command):\n"
+    "  --server URL             asset service base URL (for instance http://127.0.0.1:8080/api)\n"
+    "  --identity-server URL    identity service base URL (for instance http://127.0.0.1:8080/ovra)\n"
+    "  --client-id ID           client identifier: the name of this client's root collection\n"
+    "                           (default tolmonetsync)\n"
+    "  --token TOKEN            use this access token as given (also TOLMONETSYNC_TOKEN)\n"
+    "  --auto-login             sign in from TOLMONETSYNC_USERNAME and TOLMONETSYNC_PASSWORD\n"
+    "  --pref-dir DIR           host preference directory: cache file, last-user file, backups,\n"
+    "                           keychain store\n"
+    "  --company NAME --app NAME --app-version X.Y\n"
+    "                           host identity (default Tolmonet, tolmonetsync, 1.0)\n"
+    "  --trace SPEC             as TOLMONETSYNC_TRACE; lines go to stderr\n"
+    "  --json                   machine-readable results on stdout\n"
+    "  -q, --quiet              print nothing but errors\n";
+
+const std::string& OptionValue(const std::vector<std::string>& arguments, std::size_t& index)
+{
+    if (index + 1 >= arguments.size()) throw UsageError(arguments[index] + " needs a value");
+    return arguments[++index];
+}
+
+bool ReadGlobalOption(const std::vector<std::string>& arguments, std::size_t& index, GlobalOptions& options)
+{
+    const std::string& option = arguments[index];
+    if (option == "--server") {
+        options.mServer = OptionValue(arguments, index);
+    } else if (option == "--identity-server") {
+        options.mIdentityServer = OptionValue(arguments, index);
+    } else if (option == "--client-id") {
+        options.mClientId = OptionValue(arguments, index);
+        if (options.mClientId.empty()) throw UsageError("--client-id must not be empty");
+    } else if (option == "--token") {
+        options.mToken = OptionValue(arguments, index);
+        if (options.mToken.empty()) throw UsageError("--token must not be empty");
+    } else if (option == "--auto-login") {
+        options.mAutoLogin = true;
+    } else if (option == "--pref-dir") {
+        options.mPrefDir = OptionValue(arguments, index);
+    } else if (option == "--company") {
+        options.mCompany = OptionValue(arguments, index);
+    } else if (option == "--app") {
+        options.mApp = OptionValue(arguments, index);
+    } else if (option == "--app-version") {
+        options.mAppVersion = OptionValue(arguments, index);
+    } else if (option == "--trace") {
+        options.mTrace = OptionValue(arguments, index);
+    } else if (option == "--json") {
+        options.mJson = true;
+    } else if (option == "-q" || option == "--quiet") {
+        options.mQuiet = true;
+    } else if (option == "-h" || option == "--help") {
+        options.mHelp = true;
+    } else {
+        return false;
+    }
+    return true;
+}
+
+void ApplyGlobalOptions(GlobalOptions& options)
+{
+    using namespace tolmocore::config;
+    SetCompanyName(ToUTF16(options.mCompany));
+    SetClientName(ToUTF16(options.mApp));
+    SetClientInternalVersion(ToUTF16(options.mAppVersion));
+    if (!options.mPrefDir.empty())
+        tolmocore::filesupport::Dir::SetPrefDir(tolmocore::filesupport::Dir(ToUTF16(options.mPrefDir)));
+    if (!options.mTrace.empty()) tolmocore::debug::SetTraceSpec(options.mTrace);
+    if (options.mToken.empty()) {
+        const char* token = std::getenv("TOLMONETSYNC_TOKEN");
+        if (token != nullptr) options.mToken = token;
+    }
+}
+
+}  // namespace cli
+}  // namespace tolmonetsync

@@ -1,0 +1,49 @@
+#pragma once
+// What every command shares: the global options, how a person's mistake in
+// the arguments is reported, and the host identity the options set.
+
+#include <stdexcept>
+#include <string>
+#include <vector>
+
+namespace tolmonetsync {
+namespace cli {
+
+// Bad usage: the command prints the message and its usage line, and exits 2.
+struct UsageError : std::invalid_argument {
+    using std::invalid_argument::invalid_argument;
+};
+
+struct GlobalOptions {
+    std::string mServer;          // asset service base URL; empty: the built-in one
+    std::string mIdentityServer;  // identity service base URL; empty: the built-in one
+    std::string mClientId = "tolmonetsync";
+    std::string mToken;  // --token, else TOLMONETSYNC_TOKEN
+    bool mAutoLogin = false;
+    std::string mPrefDir;
+    std::string mCompany = "Tolmonet";
+    std::string mApp = "tolmonetsync";
+    std::string mAppVersion = "1.0";
+    std::string mTrace;
+    bool mJson = false;
+    bool mQuiet = false;
+    bool mHelp = false;
+};
+
+// Reads the global option at arguments[index], if it is one, advancing index
+// past its value. False if arguments[index] is not a global option. Throws
+// UsageError for a global option without its value.
+bool ReadGlobalOption(const std::vector<std::string>& arguments, std::size_t& index, GlobalOptions& options);
+
+// The value of the option at arguments[index], advancing past it; UsageError
+// if there is none.
+const std::string& OptionValue(const std::vector<std::string>& arguments, std::size_t& index);
+
+// Sets the host identity, the preference directory and tracing from the
+// options, and the token from TOLMONETSYNC_TOKEN when --token was not given.
+void ApplyGlobalOptions(GlobalOptions& options);
+
+extern const char kGlobalOptionsHelp[];
+
+}  // namespace cli
+}  // namespace tolmonetsync

@@ -1,0 +1,97 @@
+#include "cli/SyncCommand.h"
+
+#include <iostream>
+
+#include "cli/SyncJob.h"
+#include "cli/SyncSpec.h"
+
+namespace tolmonetsync {
+namespace cli {
+
+namespace {
+
+const char kSyncUsage[] =
+    "usage: tolmonetsync [global options] sync [--mode two-way|server-wins|local-wins] [--dry-run]\n"
+    "         [--prune-groups] [--migrate major|previous-major]...\n"
+    "         --dir path=DIR,group=NAME,ext=.EXT[,max-size=BYTES][,checksum]...\n"
+    "         --file path=FILE,group=NAME[,name=NAME][,type=MIME][,max-size=BYTES][,checksum]...\n";
+
+const char kSyncHelp[] =
+    "\n"
+    "Prints the plan (what happens to each file and why), carries it out and prints a summary.\n"
+    "  --mode MODE        two-way (default): local changes go up, everything else comes down;\n"
+    "                     server-wins: the server's state replaces the local one;\n"
+    "                     local-wins: the local state replaces the server's\n"
+    "  --dry-run          print the plan and stop: nothing changes on the server or on disk\n"
+    "  --prune-groups     allow deleting server groups that no --dir or --file names\n"
+    "  --migrate FORM     let a new host version copy an earlier version's preferences\n"
+    "  --dir SPEC         every file of one extension in a directory (the directory must exist)\n"
+    "  --file SPEC        one file (it may be missing: the sync brings it back)\n"
+    "Defaults: size limit 16 MiB (files at or above it are not uploaded), media type\n"
+    "application/octet-stream, a change is seen by the modification date (checksum: by content).\n"
+    "Replaced and removed local files are copied into a backup directory under the preference\n"
+    "directory first. Exit status: 0 done, 1 the sync failed (reason on stderr), 2 bad usage.\n";
+
+SyncJob ParseSync(GlobalOptions& globals, const std::vector<std::string>& arguments)
+{
+    SyncJob job;
+    for (std::size_t i = 0; i < arguments.size(); ++i) {
+        const std::string& option = arguments[i];
+        if (ReadGlobalOption(arguments, i, globals)) continue;
+        if (option == "--mode") {
+            const std::string& mode = OptionValue(arguments, i);
+            if (!ParseModeName(mode, job.mMode))
+                throw UsageError("--mode " + mode + ": give two-way, server-wins or local-wins");
+        } else if (option == "--dry-run") {
+            job.mDryRun = true;
+        } else if (option == "--prune-groups") {
+            job.mPruneGroups = true;
+        } else if (option == "--migrate") {
+            const std::string& form = OptionValue(arguments, i);
+            if (form != "major" && form != "previous-major")
+                throw UsageError("--migrate " + form + ": give major or previous-major");
+            job.mMigrate.push_back(form);
+        } else if (option == "--dir") {
+            job.mDirs.push_back(ParseDirSpec(OptionValue(arguments, i)));
+        } else if (option == "--file") {
+            job.mFiles.push_back(ParseFileSpec(OptionValue(arguments, i)));
+        } else {
+            throw UsageError("unknown option '" + option + "'");
+        }
+    }
+    if (!globals.mHelp && job.mDirs.empty() && job.mFiles.empty())
+        throw UsageError("nothing to sync: give at least one --dir or --file");
+    return job;
+}
+
+}  // namespace
+
+int RunSync(GlobalOptions globals, const std::vector<std::string>& arguments)
+{
+    SyncJob job;
+    try {
+        job = ParseSync(globals, arguments);
+    } catch (const UsageError& e) {
+        std::cerr << "tolmonetsync sync: " << e.what() << "\n" << kSyncUsage;
+        return 2;
+    }
+    if (globals.mHelp) {
+        std::cout << kSyncUsage << kSyncHelp << "\n" << kGlobalOptionsHelp;
+        return 0;
+    }
+    ApplyGlobalOptions(globals);
+    if (globals.mToken.empty() && !globals.mAutoLogin) {
+        std::cerr << "tolmonetsync sync: no access token: give --token, set TOLMONETSYNC_TOKEN or use --auto-login"
+                  << std::endl;
+        return 1;
+    }
+    job.mServer = globals.mServer;
+    job.mClientId = globals.mClientId;
+    job.mToken = globals.mToken;
+    job.mAutoLogin = globals.mAutoLogin;
+    const Output output = globals.mJson ? Output::Json : globals.mQuiet ? Output::Quiet : Output::Text;
+    return RunSyncJob(job, output, std::cout, std::cerr);
+}
+
+}  // namespace cli
+}  // namespace tolmonetsync

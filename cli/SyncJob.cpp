@@ -1,0 +1,211 @@
+#include "cli/SyncJob.h"
+
+#include <filesystem>
+
+#include <unistd.h>
+#include <boost/json/serialize.hpp>
+
+#include "cli/SyncReport.h"
+#include "cli/SyncRun.h"
+#include "foundation/net/HeaderConstants.h"
+#include "sync/SyncDecision.h"
+#include "sync/SyncFilesService.h"
+
+namespace tolmonetsync {
+namespace cli {
+
+namespace {
+
+using tolmocore::utility::ToNarrow;
+
+ParameterList MakeParameters(const SyncJob& job)
+{
+    ParameterList parameters;
+    auto add = [&](const ImmutableString& key, const std::string& value) {
+        parameters.emplace_back(key, UTF8String(value.begin(), value.end()));
+    };
+    if (!job.mServer.empty()) add(tolmonet::kHEADER_LOCATION, job.mServer);
+    add(tolmonet::kHEADER_USER_AGENT, job.mClientId);
+    if (!job.mToken.empty()) add(tolmonet::kHEADER_COOKIE, job.mToken);
+    if (job.mAutoLogin) add(tolmonet::kHEADER_SET_COOKIE, "auto");
+    for (const std::string& form : job.mMigrate) add(tolmonet::kHEADER_CACHECONTROL, "migrate-" + form);
+    return parameters;
+}
+
+std::size_t CountFiles(const Dir& dir)
+{
+    std::error_code error;
+    std::size_t count = 0;
+    for (std::filesystem::directory_iterator it(ToNarrow(dir.FullPath()), error), end; !error && it != end;
+         it.increment(error))
+        if (it->is_regular_file(error)) ++count;
+    return count;
+}
+
+// A bar on one terminal line, redrawn in place.
+class ProgressBar {
+public:
+    ProgressBar(std::ostream& out, bool shown) : mOut(out), mShown(shown) {}
+    ~ProgressBar() { Clear(); }
+    void Draw(const char* label, float fraction)
+    {
+        if (!mShown) return;
+        const int width = 30;
+        const int filled = static_cast<int>(std::min(1.0f, std::max(0.0f, fraction)) * width);
+        mOut << "\r" << label << " [" << std::string(filled, '#') << std::string(width - filled, '.') << "] "
+             << static_cast<int>(fraction * 100) << "% " << std::flush;
+        mDrawn = true;
+    }
+    void Clear()
+    {
+        if (!mDrawn) return;
+        mOut << "\r" << std::string(60, ' ') << "\r" << std::flush;
+        mDrawn = false;
+    }
+
+private:
+    std::ostream& mOut;
+    bool mShown;
+    bool mDrawn = false;
+};
+
+// Prints the end of a job in the chosen form and gives its exit status.
+class JobReport {
+public:
+    JobReport(const SyncJob& job, Output output, std::ostream& out, std::ostream& err)
+        : mOutput(output), mOut(out), mErr(err)
+    {
+        mJson["mode"] = ModeName(job.mMode);
+        mJson["dryRun"] = job.mDryRun;
+    }
+    void Plan(const SyncPreview& preview)
+    {
+        if (mOutput == Output::Text) PrintPlan(mOut, preview);
+        if (mOutput == Output::Json) mJson["plan"] = PlanToJson(preview);
+    }
+    int Done(const SyncSummary* summary)
+    {
+        if (summary != nullptr && mOutput == Output::Text) PrintSummary(mOut, *summary);
+        if (summary != nullptr) mJson["result"] = SummaryToJson(*summary);
+        mJson["ok"] = true;
+        Flush();
+        return 0;
+    }
+    int Fail(const std::string& why)
+    {
+        mErr << "tolmonetsync sync: " << why << std::endl;
+        mJson["ok"] = false;
+        mJson["error"] = why;
+        Flush();
+        return 1;
+    }
+
+private:
+    void Flush()
+    {
+        if (mOutput == Output::Json) mOut << boost::json::serialize(mJson) << std::endl;
+        mOut.flush();
+    }
+
+    Output mOutput;
+    std::ostream& mOut;
+    std::ostream& mErr;
+    boost::json::object mJson;
+};
+
+SyncSummary Summarise(const SyncCache& cache, const std::vector<SyncDecision>& plan, std::size_t removedLocally)
+{
+    SyncSummary summary;
+    summary.mUploaded = cache.mUploadCount;
+    summary.mDownloaded = cache.mDownloadCount;
+    for (const SyncDecision& decision : plan)
+        if (decision.mAction == SyncAction_DeleteRemote) ++summary.mDeletedOnServer;
+    summary.mRemovedLocally = removedLocally;
+    const std::size_t moved = summary.mUploaded + summary.mDownloaded + summary.mDeletedOnServer;
+    summary.mLeftAlone = cache.mFiles.size() > moved ? cache.mFiles.size() - moved : 0;
+    summary.mBackupDir = ToNarrow(cache.mBackupDir.FullPath());
+    summary.mBackedUp = CountFiles(cache.mBackupDir);
+    return summary;
+}
+
+}  // namespace
+
+const char* ModeName(SyncMode mode)
+{
+    switch (mode) {
+        case SyncMode_ServerWins:
+            return "server-wins";
+        case SyncMode_LocalWins:
+            return "local-wins";
+        case SyncMode_TwoWay:
+            break;
+    }
+    return "two-way";
+}
+
+bool ParseModeName(const std::string& text, SyncMode& mode)
+{
+    for (SyncMode candidate : {SyncMode_TwoWay, SyncMode_ServerWins, SyncMode_LocalWins}) {
+        if (text == ModeName(candidate)) {
+            mode = candidate;
+            return true;
+        }
+    }
+    return false;
+}
+
+int RunSyncJob(const SyncJob& job, Output output, std::ostream& out, std::ostream& err)
+{
+    JobReport report(job, output, out, err);
+    boost::shared_ptr<SyncFilesService> service;
+    try {
+        service = CreateSyncFilesService(SyncServiceType_Tarnvault, MakeParameters(job));
+    } catch (const std::exception& e) {
+        return report.Fail(e.what());
+    }
+    for (const SyncDir& dir : job.mDirs) {
+        if (!service->RegisterSyncDirectory(dir)) {
+            err << "tolmonetsync sync: --dir " << ToNarrow(dir.mDir.FullPath()) << " is given twice" << std::endl;
+            return 2;
+        }
+    }
+    for (const SyncFile& file : job.mFiles) {
+        if (!service->RegisterSyncFile(file)) {
+            err << "tolmonetsync sync: --file " << ToNarrow(file.mFile.FullPath()) << " is given twice" << std::endl;
+            return 2;
+        }
+    }
+
+    ProgressBar bar(out, output == Output::Text && isatty(STDOUT_FILENO) == 1);
+    const RunOutcome preview = RunPreview(*service, job.mMode);
+    if (!preview.mStarted) return report.Fail("could not send the first request");
+    if (!preview.Ok()) return report.Fail(preview.mError);
+    report.Plan(*preview.mPreview);
+    if (job.mDryRun) return report.Done(nullptr);
+
+    // Deleting a group deletes everything in it: only on request.
+    if (!preview.mPreview->mGroupsToDelete.empty() && !job.mPruneGroups)
+        return report.Fail("refusing to delete server groups that no --dir or --file names: " +
+                           JoinGroupNames(preview.mPreview->mGroupsToDelete) + " (give --prune-groups to delete them)");
+
+    const RunOutcome prepared =
+        RunPrepare(*service, ProgressCallback(), [&] { bar.Draw("preparing", service->Progress()); });
+    if (!prepared.mStarted)
+        return report.Fail(prepared.mError.empty() ? "could not send the first request" : prepared.mError);
+    if (!prepared.Ok()) return report.Fail(prepared.mError);
+
+    // The plan the pass carries out, for the summary's counts.
+    const boost::shared_ptr<SyncCache>& cache = prepared.mCache;
+    std::vector<SyncDecision> plan;
+    for (const CachedSyncFile& record : cache->mFiles) plan.push_back(DecideRecord(*cache, record, job.mMode));
+    const std::size_t removals = job.mMode == SyncMode_ServerWins ? ServerWinsRemovals(*cache, job.mDirs).size() : 0;
+
+    const RunOutcome passed = RunPass(*service, cache, job.mMode, [&] { bar.Draw("syncing  ", service->Progress()); });
+    bar.Clear();
+    if (!passed.Ok()) return report.Fail(passed.mError.empty() ? "the sync did not finish" : passed.mError);
+    const SyncSummary summary = Summarise(*cache, plan, removals);
+    return report.Done(&summary);
+}
+
+}  // namespace cli
+}  // namespace tolmonetsync
