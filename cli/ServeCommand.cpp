@@ -31,7 +31,6 @@ server::LocalServiceOptions ParseServe(GlobalOptions& globals, const std::vector
     server::LocalServiceOptions options;
     for (size_t i = 0; i < arguments.size(); ++i) {
         const std::string& option = arguments[i];
-        if (ReadGlobalOption(arguments, i, globals)) continue;
         auto value = [&]() -> const std::string& { return OptionValue(arguments, i); };
         if (option == "--data") {
             options.mDataDirectory = value();
@@ -40,8 +39,9 @@ server::LocalServiceOptions ParseServe(GlobalOptions& globals, const std::vector
         } else if (option == "--user") {
             options.mUsers.push_back(server::ParseUserArgument(value()));
         } else if (option == "--token") {
+            // serve's own --token (NAME:TOKEN) comes before the global one.
             options.mTokens.push_back(server::ParseTokenArgument(value()));
-        } else {
+        } else if (!ReadGlobalOption(arguments, i, globals)) {
             throw UsageError("unknown option '" + option + "'");
         }
     }

@@ -1,0 +1,111 @@
+#include "CliProcess.h"
+
+#include <csignal>
+#include <stdexcept>
+
+#include <fcntl.h>
+#include <spawn.h>
+#include <sys/wait.h>
+#include <unistd.h>
+
+#include "support/TempDir.h"
+
+extern char** environ;
+
+namespace clitest {
+
+namespace {
+
+std::vector<char*> Pointers(std::vector<std::string>& texts)
+{
+    std::vector<char*> pointers;
+    for (std::string& text : texts) pointers.push_back(text.data());
+    pointers.push_back(nullptr);
+    return pointers;
+}
+
+pid_t Spawn(std::vector<std::string> arguments, std::vector<std::string> environment,
+            posix_spawn_file_actions_t& actions)
+{
+    arguments.insert(arguments.begin(), TOLMONETSYNC_CLI);
+    for (char** entry = environ; *entry != nullptr; ++entry) environment.insert(environment.begin(), *entry);
+    std::vector<char*> argv = Pointers(arguments);
+    std::vector<char*> envp = Pointers(environment);
+    pid_t pid = -1;
+    if (posix_spawn(&pid, TOLMONETSYNC_CLI, &actions, nullptr, argv.data(), envp.data()) != 0)
+        throw std::runtime_error("cannot start " TOLMONETSYNC_CLI);
+    return pid;
+}
+
+int WaitExit(pid_t pid)
+{
+    int status = 0;
+    while (waitpid(pid, &status, 0) < 0) {
+    }
+    return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
+}
+
+}  // namespace
+
+Finished RunCli(const std::vector<std::string>& arguments, const std::vector<std::string>& environment)
+{
+    testsupport::TempDir outputs;
+    const std::string out = (outputs / "out").string();
+    const std::string err = (outputs / "err").string();
+    posix_spawn_file_actions_t actions;
+    posix_spawn_file_actions_init(&actions);
+    posix_spawn_file_actions_addopen(&actions, 1, out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
+    posix_spawn_file_actions_addopen(&actions, 2, err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
+    posix_spawn_file_actions_addopen(&actions, 0, "/dev/null", O_RDONLY, 0);
+    const pid_t pid = Spawn(arguments, environment, actions);
+    posix_spawn_file_actions_destroy(&actions);
+    Finished finished;
+    finished.mStatus = WaitExit(pid);
+    finished.mOut = testsupport::ReadFileBytes(out);
+    finished.mErr = testsupport::ReadFileBytes(err);
+    return finished;
+}
+
+ServedService::ServedService(const std::filesystem::path& data, const std::string& token)
+{
+    int pipeFds[2];
+    if (pipe(pipeFds) != 0) throw std::runtime_error("pipe");
+    posix_spawn_file_actions_t actions;
+    posix_spawn_file_actions_init(&actions);
+    posix_spawn_file_actions_adddup2(&actions, pipeFds[1], 1);
+    posix_spawn_file_actions_addclose(&actions, pipeFds[0]);
+    mPid = Spawn({"serve", "--data", data.string(), "--listen", "127.0.0.1:0", "--user", "ann:secret", "--token",
+                  "ann:" + token},
+                 {}, actions);
+    posix_spawn_file_actions_destroy(&actions);
+    close(pipeFds[1]);
+    mOutput = fdopen(pipeFds[0], "r");
+    char line[256] = {};
+    const std::string prefix = "listening on ";
+    if (fgets(line, sizeof line, mOutput) == nullptr || std::string(line).rfind(prefix, 0) != 0) {
+        Stop();
+        throw std::runtime_error("serve did not say where it listens");
+    }
+    mBase = std::string(line).substr(prefix.size());
+    while (!mBase.empty() && (mBase.back() == '\n' || mBase.back() == '\r')) mBase.pop_back();
+}
+
+ServedService::~ServedService()
+{
+    Stop();
+}
+
+int ServedService::Stop()
+{
+    int status = -1;
+    if (mPid > 0) {
+        kill(mPid, SIGTERM);
+        status = WaitExit(mPid);
+        mPid = -1;
+    }
+    if (mOutput != nullptr) fclose(mOutput);
+    mOutput = nullptr;
+    return status;
+}
+
+}  // namespace clitest

@@ -1,0 +1,45 @@
+#pragma once
+// The tolmonetsync command run as a person runs it: a process of its own,
+// its output gathered, its exit status read.
+
+#include <cstdio>
+#include <filesystem>
+#include <string>
+#include <vector>
+
+#include <sys/types.h>
+
+namespace clitest {
+
+struct Finished {
+    int mStatus = -1;  // exit status; -1 if killed by a signal
+    std::string mOut;
+    std::string mErr;
+};
+
+// Runs `tolmonetsync ARGUMENTS...` to the end, with `environment` entries
+// ("NAME=VALUE") added to this process's environment.
+Finished RunCli(const std::vector<std::string>& arguments, const std::vector<std::string>& environment = {});
+
+// `tolmonetsync serve` in the background on a free port, with one user and
+// one fixed token; stopped with SIGTERM on destruction.
+class ServedService {
+public:
+    ServedService(const std::filesystem::path& data, const std::string& token);
+    ~ServedService();
+    ServedService(const ServedService&) = delete;
+    ServedService& operator=(const ServedService&) = delete;
+
+    // "http://127.0.0.1:PORT"
+    const std::string& Base() const { return mBase; }
+    std::string ApiUrl() const { return mBase + "/api"; }
+    // Sends SIGTERM and gives the exit status.
+    int Stop();
+
+private:
+    pid_t mPid = -1;
+    FILE* mOutput = nullptr;
+    std::string mBase;
+};
+
+}  // namespace clitest

@@ -1,0 +1,306 @@
+// `tolmonetsync sync` run as a process against `tolmonetsync serve`: what it
+// does to the disk, the cache file, the backups and the service, what it
+// prints, and how it refuses.
+
+#include <gtest/gtest.h>
+
+#include <map>
+
+#include <boost/json/parse.hpp>
+
+#include "CliProcess.h"
+#include "support/TempDir.h"
+
+namespace {
+
+namespace fs = std::filesystem;
+using clitest::Finished;
+using clitest::RunCli;
+using testsupport::ReadFileBytes;
+using testsupport::WriteFileBytes;
+
+const char kToken[] = "cli-test-token";
+
+// Every regular file under `root` with its bytes, by path relative to root.
+std::map<std::string, std::string> Snapshot(const fs::path& root)
+{
+    std::map<std::string, std::string> files;
+    if (!fs::exists(root)) return files;
+    for (const fs::directory_entry& entry : fs::recursive_directory_iterator(root))
+        if (entry.is_regular_file()) files[fs::relative(entry.path(), root).string()] = ReadFileBytes(entry.path());
+    return files;
+}
+
+bool Contains(const std::string& text, const std::string& part)
+{
+    return text.find(part) != std::string::npos;
+}
+
+// One computer of the test user: a folder of ".txt" files and a preference
+// directory, synced through the command.
+class Computer {
+public:
+    Computer(const fs::path& root, const std::string& name)
+        : mFolder(root / name / "folder"), mPref(root / name / "pref")
+    {
+        fs::create_directories(mFolder);
+        fs::create_directories(mPref);
+    }
+
+    Finished Sync(const clitest::ServedService& service, std::vector<std::string> options = {},
+                  const std::string& group = "Notes") const
+    {
+        std::vector<std::string> arguments = {"--server",   service.ApiUrl(), "--token", kToken,
+                                              "--pref-dir", mPref.string(),   "sync"};
+        arguments.insert(arguments.end(), options.begin(), options.end());
+        arguments.push_back("--dir");
+        arguments.push_back("path=" + mFolder.string() + ",group=" + group + ",ext=.txt");
+        return RunCli(arguments);
+    }
+    void Write(const std::string& name, const std::string& bytes) const { WriteFileBytes(mFolder / name, bytes); }
+    std::string Read(const std::string& name) const { return ReadFileBytes(mFolder / name); }
+    std::map<std::string, std::string> Folder() const { return Snapshot(mFolder); }
+    std::map<std::string, std::string> Backups() const { return Snapshot(mPref / "SyncBackup"); }
+    fs::path CacheFile() const { return mPref / "tolmonetsynccache.json"; }
+
+    fs::path mFolder;
+    fs::path mPref;
+};
+
+class SyncCommand : public ::testing::Test {
+protected:
+    SyncCommand()
+        : mService(mRoot / "service", kToken), mLaptop(mRoot.Path(), "laptop"), mDesktop(mRoot.Path(), "desktop")
+    {
+    }
+
+    // The laptop's two files on the server and on the desktop.
+    void SyncBothComputers()
+    {
+        mLaptop.Write("a.txt", "a1");
+        mLaptop.Write("b.txt", "b1");
+        ASSERT_EQ(mLaptop.Sync(mService).mStatus, 0);
+        ASSERT_EQ(mDesktop.Sync(mService).mStatus, 0);
+    }
+
+    testsupport::TempDir mRoot;
+    clitest::ServedService mService;
+    Computer mLaptop;
+    Computer mDesktop;
+};
+
+TEST_F(SyncCommand, ChangesOnBothSidesMeetAndTheReplacedFileIsBackedUp)
+{
+    mLaptop.Write("a.txt", "a1");
+    mLaptop.Write("b.txt", "b1");
+    const Finished first = mLaptop.Sync(mService);
+    ASSERT_EQ(first.mStatus, 0) << first.mErr;
+    EXPECT_TRUE(Contains(first.mOut, "upload    Notes/a.txt: not on the server")) << first.mOut;
+    EXPECT_TRUE(Contains(first.mOut, "uploaded 2, downloaded 0")) << first.mOut;
+    EXPECT_TRUE(first.mErr.empty()) << first.mErr;
+    EXPECT_TRUE(fs::exists(mLaptop.CacheFile()));
+
+    const Finished download = mDesktop.Sync(mService);
+    ASSERT_EQ(download.mStatus, 0) << download.mErr;
+    EXPECT_EQ(mDesktop.Folder(), mLaptop.Folder());
+
+    mDesktop.Write("b.txt", "b2 from the desktop");
+    ASSERT_EQ(mDesktop.Sync(mService).mStatus, 0);
+    mLaptop.Write("a.txt", "a2 from the laptop");
+    const std::string cacheBefore = ReadFileBytes(mLaptop.CacheFile());
+    const Finished both = mLaptop.Sync(mService);
+    ASSERT_EQ(both.mStatus, 0) << both.mErr;
+    EXPECT_TRUE(Contains(both.mOut, "upload    Notes/a.txt: changed locally")) << both.mOut;
+    EXPECT_TRUE(Contains(both.mOut, "uploaded 1, downloaded 1")) << both.mOut;
+    EXPECT_EQ(mLaptop.Read("b.txt"), "b2 from the desktop");
+    EXPECT_NE(ReadFileBytes(mLaptop.CacheFile()), cacheBefore);
+
+    // The laptop's old b.txt is in this run's backup directory.
+    bool backedUp = false;
+    for (const auto& backup : mLaptop.Backups()) backedUp |= backup.second == "b1";
+    EXPECT_TRUE(backedUp);
+
+    // The service holds both changes: a third computer gets them.
+    Computer fresh(mRoot.Path(), "fresh");
+    ASSERT_EQ(fresh.Sync(mService).mStatus, 0);
+    EXPECT_EQ(fresh.Folder(), mLaptop.Folder());
+}
+
+TEST_F(SyncCommand, DryRunChangesNothingAnywhere)
+{
+    SyncBothComputers();
+    mDesktop.Write("a.txt", "a2");
+    ASSERT_EQ(mDesktop.Sync(mService).mStatus, 0);  // a change on the server
+    mLaptop.Write("b.txt", "b2");                   // and one here
+    // A group the laptop does not name, from a computer that names both.
+    Computer other(mRoot.Path(), "other");
+    fs::create_directories(mRoot / "stale");
+    WriteFileBytes(mRoot / "stale" / "x.txt", "x");
+    const std::string stale = "path=" + (mRoot / "stale").string() + ",group=Stale,ext=.txt";
+    ASSERT_EQ(other.Sync(mService, {"--dir", stale}).mStatus, 0);
+
+    const auto folderBefore = mLaptop.Folder();
+    const auto prefBefore = Snapshot(mLaptop.mPref);
+    const Finished planned = mLaptop.Sync(mService, {"--dry-run"});
+    ASSERT_EQ(planned.mStatus, 0) << planned.mErr;
+    EXPECT_TRUE(Contains(planned.mOut, "delete    server group Stale")) << planned.mOut;
+    EXPECT_TRUE(Contains(planned.mOut, "upload    Notes/b.txt: changed locally")) << planned.mOut;
+    EXPECT_FALSE(Contains(planned.mOut, "uploaded"));
+    EXPECT_EQ(mLaptop.Folder(), folderBefore);
+    EXPECT_EQ(Snapshot(mLaptop.mPref), prefBefore);  // no backup directory, same cache file
+
+    // The server too: the stale group and the desktop's change are still there.
+    const Finished again = mLaptop.Sync(mService, {"--dry-run", "--json"});
+    EXPECT_EQ(boost::json::parse(again.mOut).at("plan").at("groupsToDelete").as_array().size(), 1u);
+    Computer fresh(mRoot.Path(), "fresh");
+    fs::create_directories(mRoot / "stale2");
+    ASSERT_EQ(fresh.Sync(mService, {"--dir", "path=" + (mRoot / "stale2").string() + ",group=Stale,ext=.txt"}).mStatus,
+              0);
+    EXPECT_EQ(fresh.Read("a.txt"), "a2");
+    EXPECT_EQ(ReadFileBytes(mRoot / "stale2" / "x.txt"), "x");
+}
+
+TEST_F(SyncCommand, GroupGuardRefusesUnlessPruneIsGiven)
+{
+    SyncBothComputers();
+    mLaptop.Write("c.txt", "c");
+    const Finished refused = mLaptop.Sync(mService, {}, "Other");
+    EXPECT_EQ(refused.mStatus, 1);
+    EXPECT_TRUE(Contains(refused.mErr, "refusing to delete server groups that no --dir or --file names: Notes"))
+        << refused.mErr;
+    EXPECT_EQ(std::count(refused.mErr.begin(), refused.mErr.end(), '\n'), 1);
+    Computer fresh(mRoot.Path(), "fresh");
+    ASSERT_EQ(fresh.Sync(mService).mStatus, 0);
+    EXPECT_EQ(fresh.Folder().size(), 2u);  // Notes is untouched
+
+    const Finished pruned = mLaptop.Sync(mService, {"--prune-groups"}, "Other");
+    EXPECT_EQ(pruned.mStatus, 0) << pruned.mErr;
+    Computer later(mRoot.Path(), "later");
+    const Finished gone = later.Sync(mService, {"--dry-run"}, "Notes");
+    EXPECT_TRUE(Contains(gone.mOut, "create    server group Notes")) << gone.mOut;
+}
+
+TEST_F(SyncCommand, EachModeDecidesWhoWins)
+{
+    SyncBothComputers();
+    mDesktop.Write("a.txt", "a from the desktop");
+    ASSERT_EQ(mDesktop.Sync(mService).mStatus, 0);
+    mLaptop.Write("b.txt", "b from the laptop");
+    mLaptop.Write("extra.txt", "only here");
+
+    // Server wins: the server's a.txt comes down, the laptop's b.txt change is
+    // replaced and extra.txt (not on the server) removed, each backed up.
+    const Finished serverWins = mLaptop.Sync(mService, {"--mode", "server-wins"});
+    ASSERT_EQ(serverWins.mStatus, 0) << serverWins.mErr;
+    EXPECT_TRUE(Contains(serverWins.mOut, "remove    ")) << serverWins.mOut;
+    EXPECT_EQ(mLaptop.Read("a.txt"), "a from the desktop");
+    EXPECT_EQ(mLaptop.Read("b.txt"), "b1");
+    EXPECT_FALSE(fs::exists(mLaptop.mFolder / "extra.txt"));
+    std::map<std::string, int> backedUp;
+    for (const auto& backup : mLaptop.Backups()) ++backedUp[backup.second];
+    EXPECT_EQ(backedUp["b from the laptop"], 1);
+    EXPECT_EQ(backedUp["only here"], 1);
+
+    // Local wins: the laptop's state goes up over the desktop's change.
+    mDesktop.Write("a.txt", "a again from the desktop");
+    ASSERT_EQ(mDesktop.Sync(mService).mStatus, 0);
+    mLaptop.Write("b.txt", "b local wins");
+    const Finished localWins = mLaptop.Sync(mService, {"--mode", "local-wins"});
+    ASSERT_EQ(localWins.mStatus, 0) << localWins.mErr;
+    EXPECT_EQ(mLaptop.Read("a.txt"), "a from the desktop");
+    ASSERT_EQ(mDesktop.Sync(mService, {"--mode", "server-wins"}).mStatus, 0);
+    EXPECT_EQ(mDesktop.Read("b.txt"), "b local wins");
+    EXPECT_EQ(mDesktop.Read("a.txt"), "a from the desktop");
+}
+
+TEST_F(SyncCommand, JsonOutputParsesAndCountsWhatMoved)
+{
+    mLaptop.Write("a.txt", "a1");
+    const Finished result = mLaptop.Sync(mService, {"--json"});
+    ASSERT_EQ(result.mStatus, 0) << result.mErr;
+    const boost::json::value json = boost::json::parse(result.mOut);
+    EXPECT_TRUE(json.at("ok").as_bool());
+    EXPECT_EQ(json.at("mode").as_string(), "two-way");
+    EXPECT_EQ(json.at("plan").at("records").at(0).at("action").as_string(), "upload");
+    EXPECT_EQ(json.at("result").at("uploaded").to_number<int>(), 1);
+
+    const Finished quiet = mLaptop.Sync(mService, {"-q"});
+    EXPECT_EQ(quiet.mStatus, 0);
+    EXPECT_TRUE(quiet.mOut.empty()) << quiet.mOut;
+}
+
+TEST_F(SyncCommand, FailuresExitOneWithOneLine)
+{
+    mLaptop.Write("a.txt", "a1");
+    const std::string dir = "path=" + mLaptop.mFolder.string() + ",group=Notes,ext=.txt";
+    const std::vector<std::string> common = {"--pref-dir", mLaptop.mPref.string()};
+
+    const Finished wrongToken = RunCli({"--server", mService.ApiUrl(), "--token", "not-a-token", "--pref-dir",
+                                        mLaptop.mPref.string(), "sync", "--dir", dir});
+    EXPECT_EQ(wrongToken.mStatus, 1);
+    EXPECT_TRUE(Contains(wrongToken.mErr, "access token")) << wrongToken.mErr;  // the service's 401 text
+    EXPECT_EQ(std::count(wrongToken.mErr.begin(), wrongToken.mErr.end(), '\n'), 1) << wrongToken.mErr;
+
+    const Finished refused = RunCli({"--server", "http://127.0.0.1:9/api", "--token", kToken, "--pref-dir",
+                                     mLaptop.mPref.string(), "sync", "--dir", dir});
+    EXPECT_EQ(refused.mStatus, 1);
+    EXPECT_TRUE(Contains(refused.mErr, "127.0.0.1")) << refused.mErr;
+    EXPECT_EQ(std::count(refused.mErr.begin(), refused.mErr.end(), '\n'), 1) << refused.mErr;
+
+    const Finished noToken = RunCli({"--server", mService.ApiUrl(), "sync", "--dir", dir});
+    EXPECT_EQ(noToken.mStatus, 1);
+    EXPECT_TRUE(Contains(noToken.mErr, "no access token")) << noToken.mErr;
+    EXPECT_FALSE(fs::exists(mLaptop.CacheFile()));
+}
+
+TEST(SyncCommandUsage, BadOptionsAndSpecsExitTwoNamingTheMistake)
+{
+    testsupport::TempDir root;
+    fs::create_directories(root / "dir");
+    const std::string dir = (root / "dir").string();
+    const struct {
+        std::vector<std::string> mArguments;
+        std::string mMessage;
+    } cases[] = {
+        {{"sync"}, "nothing to sync"},
+        {{"sync", "--mode", "both"}, "--mode both"},
+        {{"sync", "--bogus"}, "unknown option '--bogus'"},
+        {{"sync", "--dir"}, "--dir needs a value"},
+        {{"sync", "--dir", "path=" + dir + ",ext=.txt"}, "missing key 'group'"},
+        {{"sync", "--dir", "path=" + dir + ",group=G,ext=.txt,colour=red"}, "unknown key 'colour'"},
+        {{"sync", "--dir", "path=" + dir + "/missing,group=G,ext=.txt"}, "does not exist"},
+        {{"sync", "--dir", "path=" + dir + ",group=G,ext=txt"}, "ext=txt"},
+        {{"sync", "--dir", "path=" + dir + ",group=G,ext=.txt,max-size=12kb"}, "max-size=12kb is not a size"},
+        {{"sync", "--dir", "path=" + dir + ",group=G,ext=.txt,group=H"}, "'group' given twice"},
+        {{"sync", "--file", "path=" + dir + "/a.txt,group=G,type=application/vnd.halvane.tarnvault.collection"},
+         "is a collection media type"},
+        {{"sync", "--file", "path=" + dir + "/a.txt,group=G,type=text"}, "not a media type"},
+        {{"sync", "--file", "path=" + dir + "/nowhere/a.txt,group=G"}, "does not exist"},
+        {{"sync", "--migrate", "minor", "--file", "path=" + dir + "/a.txt,group=G"}, "--migrate minor"},
+        {{"frobnicate"}, "unknown command 'frobnicate'"},
+    };
+    for (const auto& bad : cases) {
+        const Finished finished = RunCli(bad.mArguments);
+        EXPECT_EQ(finished.mStatus, 2) << bad.mMessage;
+        EXPECT_TRUE(Contains(finished.mErr, bad.mMessage)) << finished.mErr;
+        EXPECT_TRUE(Contains(finished.mErr, "usage: tolmonetsync")) << finished.mErr;
+    }
+    // A missing file is not bad usage: the sync brings it back.
+    const Finished missingFile = RunCli({"--server", "http://127.0.0.1:9/api", "--token", "t", "--pref-dir",
+                                         (root / "pref").string(), "sync", "--file", "path=" + dir + "/a.txt,group=G"});
+    EXPECT_EQ(missingFile.mStatus, 1) << missingFile.mErr;
+    for (const char* command : {"sync", "serve", "demo"}) EXPECT_EQ(RunCli({command, "--help"}).mStatus, 0) << command;
+}
+
+TEST(DemoCommand, RunsTheMainJobAndRemovesWhatItMade)
+{
+    testsupport::TempDir temp;
+    const Finished demo = RunCli({"demo"}, {"TMPDIR=" + temp.Path().string()});
+    ASSERT_EQ(demo.mStatus, 0) << demo.mOut << demo.mErr;
+    EXPECT_TRUE(Contains(demo.mOut, "uploaded 3, downloaded 0")) << demo.mOut;
+    EXPECT_TRUE(Contains(demo.mOut, "uploaded 1, downloaded 1")) << demo.mOut;
+    EXPECT_TRUE(Contains(demo.mOut, "layout.json")) << demo.mOut;
+    EXPECT_TRUE(fs::is_empty(temp.Path()));
+}
+
+}  // namespace
