@@ -22,3 +22,25 @@ c++ -std=c++17 $flags "$source/tests/install/consumer/main.cpp" -o "$prefix/cons
 out=$(LD_LIBRARY_PATH="$prefix/lib" "$prefix/consumer-pc")
 [ "$out" = "installed package works same-id" ] || { echo "pkg-config consumer printed: $out"; exit 1; }
 echo "installed package usable through CMake and pkg-config"
+
+# The host example, built against the installed package, syncs a folder with
+# the installed service and a second folder gets the file back.
+cmake -S "$source/examples/host" -B "$prefix/example-build" -G Ninja \
+  -DCMAKE_PREFIX_PATH="$prefix" -DCMAKE_CXX_FLAGS="$flags" >/dev/null
+cmake --build "$prefix/example-build" >/dev/null
+export LD_LIBRARY_PATH="$prefix/lib"
+mkdir -p "$prefix/data" "$prefix/first" "$prefix/second" "$prefix/pref1" "$prefix/pref2"
+"$prefix/bin/tolmonetsync" serve --data "$prefix/data" --listen 127.0.0.1:0 --token host:example-token \
+  >"$prefix/serve.out" &
+serve_pid=$!
+trap 'kill $serve_pid 2>/dev/null; wait $serve_pid 2>/dev/null; rm -rf "$prefix"' EXIT
+for _ in $(seq 100); do grep -q '^listening on ' "$prefix/serve.out" && break; sleep 0.1; done
+base=$(sed -n 's/^listening on //p' "$prefix/serve.out")
+[ -n "$base" ] || { echo "serve did not start"; exit 1; }
+echo '{"zoom": 2}' >"$prefix/first/view.json"
+out=$("$prefix/example-build/host_example" "$base/api" example-token "$prefix/first" "$prefix/pref1")
+[ "$out" = "synced: 1 file(s) moved (1 up, 0 down)" ] || { echo "example printed: $out"; exit 1; }
+out=$("$prefix/example-build/host_example" "$base/api" example-token "$prefix/second" "$prefix/pref2")
+[ "$out" = "synced: 1 file(s) moved (0 up, 1 down)" ] || { echo "example printed: $out"; exit 1; }
+cmp "$prefix/first/view.json" "$prefix/second/view.json"
+echo "host example synced a folder through the installed service"
