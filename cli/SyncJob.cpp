@@ -1,10 +1,12 @@
 #include "cli/SyncJob.h"
 
 #include <filesystem>
+#include <memory>
 
 #include <unistd.h>
 #include <boost/json/serialize.hpp>
 
+#include "cli/MigrationNotice.h"
 #include "cli/SyncReport.h"
 #include "cli/SyncRun.h"
 #include "foundation/net/HeaderConstants.h"
@@ -73,7 +75,7 @@ private:
 class JobReport {
 public:
     JobReport(const SyncJob& job, Output output, std::ostream& out, std::ostream& err)
-        : mOutput(output), mOut(out), mErr(err)
+        : mOutput(output), mMode(job.mMode), mOut(out), mErr(err)
     {
         mJson["mode"] = ModeName(job.mMode);
         mJson["dryRun"] = job.mDryRun;
@@ -82,6 +84,22 @@ public:
     {
         if (mOutput == Output::Text) PrintPlan(mOut, preview);
         if (mOutput == Output::Json) mJson["plan"] = PlanToJson(preview);
+    }
+    void Migrated(const std::string& oldRootName, const boost::shared_ptr<SyncCache>& cache,
+                  const std::vector<SyncDecision>& plan)
+    {
+        const std::string version = VersionOfRootName(oldRootName);
+        SyncPreview after;
+        after.mMode = mMode;
+        after.mCache = cache;
+        after.mDecisions = plan;
+        if (mOutput == Output::Text) {
+            mOut << "migration: this host version had no preferences on the server; version " << version << "'s ("
+                 << oldRootName << ") were copied into its new root. The plan now:\n";
+            PrintPlan(mOut, after);
+        }
+        mJson["migratedFrom"] = version;
+        if (mOutput == Output::Json) mJson["planAfterMigration"] = PlanToJson(after);
     }
     int Done(const SyncSummary* summary)
     {
@@ -108,6 +126,7 @@ private:
     }
 
     Output mOutput;
+    SyncMode mMode;
     std::ostream& mOut;
     std::ostream& mErr;
     boost::json::object mJson;
@@ -188,16 +207,21 @@ int RunSyncJob(const SyncJob& job, Output output, std::ostream& out, std::ostrea
         return report.Fail("refusing to delete server groups that no --dir or --file names: " +
                            JoinGroupNames(preview.mPreview->mGroupsToDelete) + " (give --prune-groups to delete them)");
 
+    // Preparing may make the preferences root and copy an earlier version's into it.
+    std::unique_ptr<MigrationNotice> notice;
+    if (!job.mMigrate.empty()) notice.reset(new MigrationNotice(job.mTraceSpec));
     const RunOutcome prepared =
         RunPrepare(*service, ProgressCallback(), [&] { bar.Draw("preparing", service->Progress()); });
     if (!prepared.mStarted)
         return report.Fail(prepared.mError.empty() ? "could not send the first request" : prepared.mError);
     if (!prepared.Ok()) return report.Fail(prepared.mError);
-
     // The plan the pass carries out, for the summary's counts.
     const boost::shared_ptr<SyncCache>& cache = prepared.mCache;
     std::vector<SyncDecision> plan;
     for (const CachedSyncFile& record : cache->mFiles) plan.push_back(DecideRecord(*cache, record, job.mMode));
+    // A migration filled the new root after the preview: show the plan again.
+    if (notice && !notice->From().empty()) report.Migrated(notice->From(), cache, plan);
+    notice.reset();
     const std::size_t removals = job.mMode == SyncMode_ServerWins ? ServerWinsRemovals(*cache, job.mDirs).size() : 0;
 
     const RunOutcome passed = RunPass(*service, cache, job.mMode, [&] { bar.Draw("syncing  ", service->Progress()); });

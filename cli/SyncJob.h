@@ -17,6 +17,7 @@ struct SyncJob {
     std::string mToken;
     bool mAutoLogin = false;
     std::vector<std::string> mMigrate;  // "major", "previous-major"
+    std::string mTraceSpec;             // what the person asked to trace
     std::vector<SyncDir> mDirs;
     std::vector<SyncFile> mFiles;
     SyncMode mMode = SyncMode_TwoWay;

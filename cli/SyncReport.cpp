@@ -35,7 +35,9 @@ std::string JoinGroupNames(const GroupNameSet& groups)
 void PrintPlan(std::ostream& out, const SyncPreview& preview)
 {
     const std::vector<CachedSyncFile>& records = preview.mCache->mFiles;
-    if (preview.mRootMissing) out << "create    the preferences root (first sync of this host version)\n";
+    if (preview.mRootMissing)
+        out << "create    the preferences root (first sync of this host version; with --migrate an earlier\n"
+               "          version's preferences are copied into it first)\n";
     for (const UTF16String& group : preview.mGroupsToDelete)
         out << "delete    server group " << ToNarrow(group) << ", with everything in it: no registration names it\n";
     for (const UTF16String& group : preview.mGroupsToAdd) out << "create    server group " << ToNarrow(group) << "\n";
