@@ -45,13 +45,9 @@ int WaitExit(pid_t pid)
     return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
 }
 
-}  // namespace
-
-Finished RunCli(const std::vector<std::string>& arguments, const std::vector<std::string>& environment)
+pid_t StartWithOutputs(const std::vector<std::string>& arguments, const std::vector<std::string>& environment,
+                       const std::string& out, const std::string& err)
 {
-    testsupport::TempDir outputs;
-    const std::string out = (outputs / "out").string();
-    const std::string err = (outputs / "err").string();
     posix_spawn_file_actions_t actions;
     posix_spawn_file_actions_init(&actions);
     posix_spawn_file_actions_addopen(&actions, 1, out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
@@ -59,8 +55,28 @@ Finished RunCli(const std::vector<std::string>& arguments, const std::vector<std
     posix_spawn_file_actions_addopen(&actions, 0, "/dev/null", O_RDONLY, 0);
     const pid_t pid = Spawn(arguments, environment, actions);
     posix_spawn_file_actions_destroy(&actions);
+    return pid;
+}
+
+}  // namespace
+
+pid_t StartCli(const std::vector<std::string>& arguments, const std::string& outPath, const std::string& errPath)
+{
+    return StartWithOutputs(arguments, {}, outPath, errPath);
+}
+
+int WaitCli(pid_t pid)
+{
+    return WaitExit(pid);
+}
+
+Finished RunCli(const std::vector<std::string>& arguments, const std::vector<std::string>& environment)
+{
+    testsupport::TempDir outputs;
+    const std::string out = (outputs / "out").string();
+    const std::string err = (outputs / "err").string();
     Finished finished;
-    finished.mStatus = WaitExit(pid);
+    finished.mStatus = WaitExit(StartWithOutputs(arguments, environment, out, err));
     finished.mOut = testsupport::ReadFileBytes(out);
     finished.mErr = testsupport::ReadFileBytes(err);
     return finished;

@@ -21,6 +21,11 @@ struct Finished {
 // ("NAME=VALUE") added to this process's environment.
 Finished RunCli(const std::vector<std::string>& arguments, const std::vector<std::string>& environment = {});
 
+// Starts `tolmonetsync ARGUMENTS...` with its output in the files named,
+// and returns at once; WaitCli gives its exit status (-1 after a signal).
+pid_t StartCli(const std::vector<std::string>& arguments, const std::string& outPath, const std::string& errPath);
+int WaitCli(pid_t pid);
+
 // `tolmonetsync serve` in the background on a free port, with one user and
 // one fixed token; stopped with SIGTERM on destruction.
 class ServedService {
