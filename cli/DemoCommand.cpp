@@ -5,8 +5,8 @@
 #include <fstream>
 #include <iostream>
 
+#include "cli/Registrations.h"
 #include "cli/SyncJob.h"
-#include "cli/SyncSpec.h"
 #include "foundation/core/Dir.h"
 #include "server/LocalService.h"
 #include "server/Random.h"
@@ -67,7 +67,7 @@ bool SyncAs(const Computer& computer, const std::string& serverUrl, const std::s
     job.mServer = serverUrl;
     job.mClientId = "tolmonetsync-demo";
     job.mToken = token;
-    job.mDirs.push_back(ParseDirSpec("path=" + computer.mFolder.string() + ",group=Preferences,ext=.json"));
+    job.mDirs.push_back(ParseDirRegistration("path=" + computer.mFolder.string() + ",group=Preferences,ext=.json"));
     return RunSyncJob(job, Output::Text, std::cout, std::cerr) == 0;
 }
 

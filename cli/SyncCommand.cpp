@@ -2,8 +2,8 @@
 
 #include <iostream>
 
+#include "cli/Registrations.h"
 #include "cli/SyncJob.h"
-#include "cli/SyncSpec.h"
 
 namespace tolmonetsync {
 namespace cli {
@@ -52,9 +52,9 @@ SyncJob ParseSync(GlobalOptions& globals, const std::vector<std::string>& argume
                 throw UsageError("--migrate " + form + ": give major or previous-major");
             job.mMigrate.push_back(form);
         } else if (option == "--dir") {
-            job.mDirs.push_back(ParseDirSpec(OptionValue(arguments, i)));
+            job.mDirs.push_back(ParseDirRegistration(OptionValue(arguments, i)));
         } else if (option == "--file") {
-            job.mFiles.push_back(ParseFileSpec(OptionValue(arguments, i)));
+            job.mFiles.push_back(ParseFileRegistration(OptionValue(arguments, i)));
         } else {
             throw UsageError("unknown option '" + option + "'");
         }

@@ -1,4 +1,4 @@
-#include "cli/SyncSpec.h"
+#include "cli/Registrations.h"
 
 #include <filesystem>
 #include <map>
@@ -86,7 +86,7 @@ UTF16String PathText(const std::filesystem::path& path)
 
 }  // namespace
 
-SyncDir ParseDirSpec(const std::string& spec)
+SyncDir ParseDirRegistration(const std::string& spec)
 {
     static const std::set<std::string> kKeys = {"path", "group", "ext", "max-size", "checksum"};
     const std::string option = "--dir";
@@ -103,7 +103,7 @@ SyncDir ParseDirSpec(const std::string& spec)
                    ImmutableString::CreateStatic(kDefaultMediaType), ParseOptions(keys), ParseMaxSize(option, keys));
 }
 
-SyncFile ParseFileSpec(const std::string& spec)
+SyncFile ParseFileRegistration(const std::string& spec)
 {
     static const std::set<std::string> kKeys = {"path", "group", "name", "type", "max-size", "checksum"};
     const std::string option = "--file";

@@ -7,7 +7,7 @@
 #include <string>
 
 #include "cli/CommandLine.h"
-#include "cli/SyncSpec.h"
+#include "cli/Registrations.h"
 
 using namespace tolmonetsync::cli;
 
@@ -15,13 +15,13 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
 {
     const std::string spec(reinterpret_cast<const char*>(data), size);
     try {
-        const tolmonetsync::SyncDir dir = ParseDirSpec(spec);
+        const tolmonetsync::SyncDir dir = ParseDirRegistration(spec);
         if (dir.mCollectionName.empty() || dir.mExtension.size() < 2) std::abort();
     } catch (const UsageError& e) {
         if (std::string(e.what()).empty()) std::abort();
     }
     try {
-        const tolmonetsync::SyncFile file = ParseFileSpec(spec);
+        const tolmonetsync::SyncFile file = ParseFileRegistration(spec);
         if (file.mCollectionName.empty() || file.mName.empty()) std::abort();
     } catch (const UsageError& e) {
         if (std::string(e.what()).empty()) std::abort();

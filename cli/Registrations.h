@@ -15,8 +15,8 @@ namespace tolmonetsync {
 namespace cli {
 
 // Both throw UsageError naming the option, the key and what is wrong.
-SyncDir ParseDirSpec(const std::string& spec);
-SyncFile ParseFileSpec(const std::string& spec);
+SyncDir ParseDirRegistration(const std::string& spec);
+SyncFile ParseFileRegistration(const std::string& spec);
 
 }  // namespace cli
 }  // namespace tolmonetsync
