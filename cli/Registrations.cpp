@@ -16,12 +16,12 @@ using tolmocore::utility::ToUTF16;
 
 const char kDefaultMediaType[] = "application/octet-stream";
 
-using SpecKeys = std::map<std::string, std::string>;
+using RegistrationKeys = std::map<std::string, std::string>;
 
 // Splits "k=v,k=v,flag" into keys; a flag maps to a value-less entry.
-SpecKeys SplitSpec(const std::string& option, const std::string& spec, const std::set<std::string>& known)
+RegistrationKeys SplitKeys(const std::string& option, const std::string& spec, const std::set<std::string>& known)
 {
-    SpecKeys keys;
+    RegistrationKeys keys;
     std::size_t start = 0;
     while (start <= spec.size()) {
         std::size_t end = spec.find(',', start);
@@ -45,14 +45,15 @@ SpecKeys SplitSpec(const std::string& option, const std::string& spec, const std
     return keys;
 }
 
-const std::string& Required(const std::string& option, const std::string& spec, const SpecKeys& keys, const char* key)
+const std::string& Required(const std::string& option, const std::string& spec, const RegistrationKeys& keys,
+                            const char* key)
 {
     const auto found = keys.find(key);
     if (found == keys.end()) throw UsageError(option + " " + spec + ": missing key '" + key + "'");
     return found->second;
 }
 
-std::uint64_t ParseMaxSize(const std::string& option, const SpecKeys& keys)
+std::uint64_t ParseMaxSize(const std::string& option, const RegistrationKeys& keys)
 {
     const auto found = keys.find("max-size");
     if (found == keys.end()) return kServerRecordMaxSize;
@@ -67,7 +68,7 @@ std::uint64_t ParseMaxSize(const std::string& option, const SpecKeys& keys)
     return value;
 }
 
-SyncMetadata_Options ParseOptions(const SpecKeys& keys)
+SyncMetadata_Options ParseOptions(const RegistrationKeys& keys)
 {
     return keys.count("checksum") != 0 ? SyncMetadata_Checksum : SyncMetadata_ModDate;
 }
@@ -90,7 +91,7 @@ SyncDir ParseDirRegistration(const std::string& spec)
 {
     static const std::set<std::string> kKeys = {"path", "group", "ext", "max-size", "checksum"};
     const std::string option = "--dir";
-    const SpecKeys keys = SplitSpec(option, spec, kKeys);
+    const RegistrationKeys keys = SplitKeys(option, spec, kKeys);
     const std::filesystem::path path = AbsolutePath(Required(option, spec, keys, "path"));
     const std::string& group = Required(option, spec, keys, "group");
     const std::string& extension = Required(option, spec, keys, "ext");
@@ -107,7 +108,7 @@ SyncFile ParseFileRegistration(const std::string& spec)
 {
     static const std::set<std::string> kKeys = {"path", "group", "name", "type", "max-size", "checksum"};
     const std::string option = "--file";
-    const SpecKeys keys = SplitSpec(option, spec, kKeys);
+    const RegistrationKeys keys = SplitKeys(option, spec, kKeys);
     const std::filesystem::path path = AbsolutePath(Required(option, spec, keys, "path"));
     const std::string& group = Required(option, spec, keys, "group");
     std::error_code error;
