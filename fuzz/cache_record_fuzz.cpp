@@ -21,8 +21,6 @@ extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size
             JSONConvert<CachedSyncFile>::FromJSON(JSONParse(UTF8String(reinterpret_cast<const char*>(data), size)));
     } catch (const std::exception&) {
         return 0;
-    } catch (const boost::bad_any_cast&) {
-        return 0;
     }
     const CachedSyncFile again = JSONConvert<CachedSyncFile>::FromJSON(JSONConvert<CachedSyncFile>::ToJSON(record));
     if (again.mName != record.mName || again.mCollectionName != record.mCollectionName ||
