@@ -57,6 +57,9 @@ void LocalService::Start()
     const int workers = mOptions.mWorkers;
     server->new_task_queue = [workers] { return new httplib::ThreadPool(static_cast<size_t>(workers)); };
     server->set_keep_alive_max_count(100000);
+    // Answers go out in several writes (headers, then body): without this the
+    // second write waits for the client's delayed acknowledgement, 40 ms a request.
+    server->set_tcp_nodelay(true);
     // An idle kept-alive connection holds a worker; let it go after a second
     // (a client reconnects on loopback at once), so that many idle clients
     // never starve busy ones and a stop never waits long for one.

@@ -1,0 +1,23 @@
+#pragma once
+// The floor: how fast a plain libcurl multi loop, with the library's limit of
+// parallel connections and kept-alive connections, gets one kind of request
+// answered by the service.
+
+#include <string>
+#include <vector>
+
+namespace wholebench {
+
+struct FloorRequest {
+    std::string mMethod;  // "GET" or "POST"
+    std::string mUrl;
+    std::vector<std::string> mHeaders;
+    const std::string* mBody = nullptr;  // POST only
+    long mExpectStatus = 200;
+};
+
+// Runs every request with at most `parallel` in flight; gives the seconds the
+// whole took. Throws if an answer has another status than expected.
+double RunFloor(const std::vector<FloorRequest>& requests, long parallel);
+
+}  // namespace wholebench
