@@ -1,6 +1,7 @@
 #include "bench/whole/FloorLoop.h"
 
 #include <chrono>
+#include <cstdio>
 #include <stdexcept>
 
 #include <curl/curl.h>
@@ -9,16 +10,19 @@ namespace wholebench {
 
 namespace {
 
-size_t Discard(char*, size_t size, size_t count, void*)
-{
-    return size * count;
-}
-
 struct Transfer {
     CURL* mEasy = nullptr;
     curl_slist* mHeaders = nullptr;
     const FloorRequest* mRequest = nullptr;
+    FILE* mFile = nullptr;
 };
+
+size_t Receive(char* data, size_t size, size_t count, void* context)
+{
+    Transfer* transfer = static_cast<Transfer*>(context);
+    if (transfer->mFile == nullptr) return size * count;
+    return fwrite(data, size, count, transfer->mFile) * size;
+}
 
 void Start(CURLM* multi, Transfer& transfer, const FloorRequest& request)
 {
@@ -31,7 +35,9 @@ void Start(CURLM* multi, Transfer& transfer, const FloorRequest& request)
     CURL* easy = transfer.mEasy;
     curl_easy_setopt(easy, CURLOPT_URL, request.mUrl.c_str());
     curl_easy_setopt(easy, CURLOPT_HTTPHEADER, transfer.mHeaders);
-    curl_easy_setopt(easy, CURLOPT_WRITEFUNCTION, Discard);
+    curl_easy_setopt(easy, CURLOPT_WRITEFUNCTION, Receive);
+    curl_easy_setopt(easy, CURLOPT_WRITEDATA, &transfer);
+    if (!request.mSaveAs.empty()) transfer.mFile = fopen(request.mSaveAs.c_str(), "wb");
     curl_easy_setopt(easy, CURLOPT_PRIVATE, &transfer);
     if (request.mMethod == "POST") {
         curl_easy_setopt(easy, CURLOPT_POST, 1L);
@@ -69,6 +75,9 @@ double RunFloor(const std::vector<FloorRequest>& requests, long parallel)
                 failure = transfer->mRequest->mMethod + " " + transfer->mRequest->mUrl + " gave " +
                           std::to_string(status) + " (" + curl_easy_strerror(message->data.result) + ")";
             curl_multi_remove_handle(multi, message->easy_handle);
+            if (transfer->mFile != nullptr && fclose(transfer->mFile) != 0 && failure.empty())
+                failure = "cannot write " + transfer->mRequest->mSaveAs;
+            transfer->mFile = nullptr;
             if (next < requests.size()) {
                 Start(multi, *transfer, requests[next++]);
                 ++running;

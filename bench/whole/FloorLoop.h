@@ -14,6 +14,7 @@ struct FloorRequest {
     std::vector<std::string> mHeaders;
     const std::string* mBody = nullptr;  // POST only
     long mExpectStatus = 200;
+    std::string mSaveAs;  // when set, the answer's body is written to this file, as a download must
 };
 
 // Runs every request with at most `parallel` in flight; gives the seconds the

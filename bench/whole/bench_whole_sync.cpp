@@ -258,14 +258,18 @@ std::string Bearer()
     return std::string("Authorization: Bearer ") + kToken;
 }
 
-double FloorGets(const std::string& api, const ItemList& list, bool conditional)
+// Downloads write each body to a file of its own in `saveIn`, as the library must.
+double FloorGets(const std::string& api, const ItemList& list, bool conditional, const fs::path& saveIn)
 {
+    fs::create_directories(saveIn);
     std::vector<wholebench::FloorRequest> requests;
     for (const auto& item : list.mItems) {
-        wholebench::FloorRequest request{"GET", api + "/assets/" + item.first, {Bearer()}, nullptr, 200};
+        wholebench::FloorRequest request{"GET", api + "/assets/" + item.first, {Bearer()}, nullptr,
+                                         200,   (saveIn / item.first).string()};
         if (conditional) {
             request.mHeaders.push_back("If-None-Match: " + item.second);
             request.mExpectStatus = 304;
+            request.mSaveAs.clear();
         }
         requests.push_back(request);
     }
@@ -390,12 +394,13 @@ int main(int argc, char** argv)
         const ItemList smallItems = ReadItems(work / "small-items.txt");
         const ItemList largeItems = ReadItems(work / "large-items.txt");
         const double n = static_cast<double>(smallItems.mItems.size());
-        const double conditionalRate = n / FloorGets(api, smallItems, true);
-        const double downloadRate = n / FloorGets(api, smallItems, false);
+        const double conditionalRate = n / FloorGets(api, smallItems, true, work / "floor-conditional");
+        const double downloadRate = n / FloorGets(api, smallItems, false, work / "floor-small");
         const double smallRate = n / FloorSmall(api, smallItems);
         const std::string smallBody(kSmallSize, 'f');
         const double uploadRate = kSmallFiles / FloorUploads(api, smallItems.mGroupId, smallBody, kSmallFiles, "s");
-        const double largeDownRate = static_cast<double>(largeItems.mItems.size()) / FloorGets(api, largeItems, false);
+        const double largeDownRate =
+            static_cast<double>(largeItems.mItems.size()) / FloorGets(api, largeItems, false, work / "floor-large");
         const std::string largeBody(kLargeSize, 'F');
         const double largeUpRate = kLargeFiles / FloorUploads(api, largeItems.mGroupId, largeBody, kLargeFiles, "l");
 
