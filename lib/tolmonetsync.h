@@ -13,6 +13,8 @@
 #include "foundation/net/HeaderConstants.h"
 #include "foundation/net/RequestProcessor.h"
 #include "foundation/net/Response.h"
+#include "identity/OvraAuth.h"
+#include "identity/OvraResponse.h"
 #include "sync/SyncDecision.h"
 #include "sync/SyncFilesService.h"
 #include "sync/SyncPreview.h"

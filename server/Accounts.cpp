@@ -114,5 +114,13 @@ boost::optional<std::int64_t> Accounts::UserForToken(const std::string& token)
     return find.Int(0);
 }
 
+boost::optional<UserInfo> Accounts::User(std::int64_t user)
+{
+    Database::Lease db = mDatabase.Acquire();
+    Statement find(*db, "SELECT name, email FROM users WHERE id = ?1");
+    if (!find.Bind(1, user).Step()) return boost::none;
+    return UserInfo{find.Text(0), find.Text(1)};
+}
+
 }  // namespace server
 }  // namespace tolmonetsync

@@ -16,6 +16,11 @@
 namespace tolmonetsync {
 namespace server {
 
+struct UserInfo {
+    std::string mName;
+    std::string mEmail;
+};
+
 class Accounts {
 public:
     explicit Accounts(Database& database);
@@ -31,6 +36,7 @@ public:
     void GrantToken(const std::string& name, const std::string& token, std::int64_t ttlSeconds = 0);
     // The user a token opens, if it is known and has not expired.
     boost::optional<std::int64_t> UserForToken(const std::string& token);
+    boost::optional<UserInfo> User(std::int64_t user);
 
 private:
     Database& mDatabase;

@@ -10,7 +10,9 @@
 #include "server/AssetStore.h"
 #include "server/ContentFiles.h"
 #include "server/Database.h"
+#include "server/IdentityRoutes.h"
 #include "server/Router.h"
+#include "server/Sessions.h"
 
 namespace tolmonetsync {
 namespace server {
@@ -38,6 +40,8 @@ LocalService::LocalService(const LocalServiceOptions& options) : mOptions(option
     mAccounts = std::make_unique<Accounts>(*mDatabase);
     mAssets = std::make_unique<AssetStore>(*mDatabase, *mContent);
     mRouter = std::make_unique<Router>(AssetRoutes());
+    mSessions = std::make_unique<Sessions>(*mDatabase, *mAccounts, mOptions.mTokenTtlSeconds);
+    mIdentityRouter = std::make_unique<Router>(IdentityRoutes(*mSessions, *mAccounts, mOptions.mDeniedUsers));
     mAssets->RemoveUnreferencedContent();
     for (const ServiceUser& user : mOptions.mUsers) mAccounts->SetUser(user.mName, user.mPassword, user.mEmail);
     for (const ServiceToken& token : mOptions.mTokens) {
@@ -114,6 +118,11 @@ std::string LocalService::AssetServiceUrl() const
     return "http://" + mOptions.mHost + ":" + std::to_string(mPort) + "/api";
 }
 
+std::string LocalService::IdentityServiceUrl() const
+{
+    return "http://" + mOptions.mHost + ":" + std::to_string(mPort) + "/ovra";
+}
+
 void LocalService::SetAnswerStyle(const AnswerStyle& style)
 {
     std::lock_guard<std::mutex> lock(mStyleMutex);
@@ -129,6 +138,14 @@ AnswerStyle LocalService::GetAnswerStyle() const
 void LocalService::Serve(const httplib::Request& request, httplib::Response& response)
 {
     Exchange exchange{request, response, {}, 0, GetAnswerStyle(), *mAssets, mPort};
+    if (request.path.compare(0, 6, "/ovra/") == 0) {
+        try {
+            mIdentityRouter->Dispatch(exchange);
+        } catch (const std::exception& failure) {
+            exchange.Text(500, std::string("internal error: ") + failure.what());
+        }
+        return;
+    }
     if (request.path.compare(0, 5, "/api/") != 0 && request.path != "/api") {
         exchange.Text(404, "no such resource " + request.path);
         return;

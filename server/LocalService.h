@@ -37,6 +37,7 @@ class AssetStore;
 class ContentFiles;
 class Database;
 class Router;
+class Sessions;
 
 struct ServiceUser {
     std::string mName;
@@ -57,6 +58,8 @@ struct LocalServiceOptions {
     std::vector<ServiceToken> mTokens;
     std::int64_t mTokenTtlSeconds = 0;  // for mTokens; 0 never expires
     int mWorkers = 32;                  // each kept-alive connection holds one while it lasts
+    // Users whose sign-in is refused with "access_denied_non_t1".
+    std::vector<std::string> mDeniedUsers;
 };
 
 class LocalService {
@@ -75,6 +78,8 @@ public:
     int Port() const;
     // "http://127.0.0.1:PORT/api", the client's base URL.
     std::string AssetServiceUrl() const;
+    // "http://127.0.0.1:PORT/ovra", the identity service's base URL.
+    std::string IdentityServiceUrl() const;
 
     FaultHooks& Faults() { return mFaults; }
     void SetAnswerStyle(const AnswerStyle& style);
@@ -94,6 +99,8 @@ private:
     std::unique_ptr<Accounts> mAccounts;
     std::unique_ptr<AssetStore> mAssets;
     std::unique_ptr<Router> mRouter;
+    std::unique_ptr<Sessions> mSessions;
+    std::unique_ptr<Router> mIdentityRouter;
     std::unique_ptr<httplib::Server> mServer;
     std::thread mThread;
     int mPort = 0;

@@ -1,0 +1,50 @@
+#pragma once
+// Sign-in sessions of the identity service: a sign-in on a device makes a
+// session with a device token and a refresh token, and grants access tokens
+// that the asset service accepts. A refresh rotates the refresh token (the
+// old one stops working) and grants a new access token; invalidating the
+// device token ends the session and withdraws its access tokens at once.
+// Every token is random URL-safe text, stored only as its SHA-256.
+//
+// Threads: any. Errors: DatabaseError from the storage.
+
+#include <cstdint>
+#include <string>
+
+#include <boost/optional.hpp>
+
+#include "server/Accounts.h"
+#include "server/Database.h"
+
+namespace tolmonetsync {
+namespace server {
+
+struct IssuedTokens {
+    std::int64_t mUser = 0;
+    std::string mAccess;
+    std::string mRefresh;
+    std::string mDevice;  // empty after a refresh: the device token stays as it was
+};
+
+class Sessions {
+public:
+    // Access tokens live `accessTtlSeconds` (0: an hour).
+    Sessions(Database& database, Accounts& accounts, std::int64_t accessTtlSeconds);
+
+    // None for an unknown user or a wrong password.
+    boost::optional<IssuedTokens> SignIn(const std::string& name, const std::string& password);
+    // None for a refresh token that is unknown or was rotated away.
+    boost::optional<IssuedTokens> Refresh(const std::string& refreshToken);
+    // Ends the session of that device token; false if there was none.
+    bool Invalidate(const std::string& deviceToken);
+
+private:
+    std::string GrantAccess(Connection& db, std::int64_t user, const std::string& deviceHash);
+
+    Database& mDatabase;
+    Accounts& mAccounts;
+    std::int64_t mAccessTtlSeconds;
+};
+
+}  // namespace server
+}  // namespace tolmonetsync
