@@ -16,15 +16,19 @@ namespace {
 
 const char kServeUsage[] =
     "usage: tolmonetsync serve --data DIR [--listen HOST:PORT] [--user NAME:PASSWORD[:EMAIL]]...\n"
-    "         [--token NAME:TOKEN]...\n";
+    "         [--token NAME:TOKEN]... [--token-ttl SECONDS] [--denied-user NAME]...\n";
 const char kServeHelp[] =
     "\n"
-    "Runs the local asset service (under /api) in the foreground until SIGINT or SIGTERM.\n"
+    "Runs the local asset service (under /api) and identity service (under /ovra) in the foreground until SIGINT or "
+    "SIGTERM.\n"
     "  --data DIR          where users, tokens and content are kept (made if missing)\n"
     "  --listen HOST:PORT  the address to listen on (default 127.0.0.1:0; port 0 picks a free one)\n"
     "  --user NAME:PASSWORD[:EMAIL]   creates or updates a user\n"
     "  --token NAME:TOKEN  grants the user a fixed access token\n"
-    "The first line on stdout is \"listening on http://HOST:PORT\".\n";
+    "  --token-ttl SECONDS access tokens expire after this long (the fixed ones too; signed-in\n"
+    "                      ones after an hour without it)\n"
+    "  --denied-user NAME  the user's sign-in is refused (access denied) even with the right password\n"
+    "The identity service is under /ovra. The first line on stdout is \"listening on http://HOST:PORT\".\n";
 
 server::LocalServiceOptions ParseServe(GlobalOptions& globals, const std::vector<std::string>& arguments)
 {
@@ -38,6 +42,10 @@ server::LocalServiceOptions ParseServe(GlobalOptions& globals, const std::vector
             server::ParseListenArgument(value(), options);
         } else if (option == "--user") {
             options.mUsers.push_back(server::ParseUserArgument(value()));
+        } else if (option == "--token-ttl") {
+            options.mTokenTtlSeconds = server::ParseSecondsArgument(value());
+        } else if (option == "--denied-user") {
+            options.mDeniedUsers.push_back(value());
         } else if (option == "--token") {
             // serve's own --token (NAME:TOKEN) comes before the global one.
             options.mTokens.push_back(server::ParseTokenArgument(value()));

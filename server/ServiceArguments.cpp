@@ -57,5 +57,16 @@ void ParseListenArgument(const std::string& text, LocalServiceOptions& options)
     options.mPort = static_cast<int>(number);
 }
 
+std::int64_t ParseSecondsArgument(const std::string& text)
+{
+    std::int64_t seconds = 0;
+    for (char c : text) {
+        if (c < '0' || c > '9' || seconds > 100000000) throw std::invalid_argument("expected a number of seconds");
+        seconds = seconds * 10 + (c - '0');
+    }
+    if (seconds < 1) throw std::invalid_argument("expected a number of seconds, at least 1");
+    return seconds;
+}
+
 }  // namespace server
 }  // namespace tolmonetsync

@@ -3,6 +3,7 @@
 // "--token NAME:TOKEN" and "--listen HOST:PORT". Each throws
 // std::invalid_argument with a one-line reason for a value it cannot take.
 
+#include <cstdint>
 #include <string>
 
 #include "server/LocalService.h"
@@ -16,6 +17,8 @@ ServiceUser ParseUserArgument(const std::string& text);
 ServiceToken ParseTokenArgument(const std::string& text);
 // Only loopback hosts: the service is for one machine.
 void ParseListenArgument(const std::string& text, LocalServiceOptions& options);
+// A whole number of seconds, at least 1.
+std::int64_t ParseSecondsArgument(const std::string& text);
 
 }  // namespace server
 }  // namespace tolmonetsync

@@ -60,14 +60,14 @@ public:
     bool PUT(const Guid& requestUID, const tolmonet::http::ResponseHandler& handler, const ImmutableString& url,
              const Body& body, const tolmonet::HeaderList& headers,
              const tolmonet::Configuration& configuration) override;
-    bool PUTForm(const Guid& requestUID, const tolmonet::http::ResponseHandler& handler,
-                 const ImmutableString& url, const tolmonet::FormList& form, const tolmonet::HeaderList& headers,
+    bool PUTForm(const Guid& requestUID, const tolmonet::http::ResponseHandler& handler, const ImmutableString& url,
+                 const tolmonet::FormList& form, const tolmonet::HeaderList& headers,
                  const tolmonet::Configuration& configuration) override;
     bool POST(const Guid& requestUID, const tolmonet::http::ResponseHandler& handler, const ImmutableString& url,
               const Body& body, const tolmonet::HeaderList& headers,
               const tolmonet::Configuration& configuration) override;
-    bool POSTForm(const Guid& requestUID, const tolmonet::http::ResponseHandler& handler,
-                  const ImmutableString& url, const tolmonet::FormList& form, const tolmonet::HeaderList& headers,
+    bool POSTForm(const Guid& requestUID, const tolmonet::http::ResponseHandler& handler, const ImmutableString& url,
+                  const tolmonet::FormList& form, const tolmonet::HeaderList& headers,
                   const tolmonet::Configuration& configuration) override;
     bool DEL(const Guid& requestUID, const tolmonet::http::ResponseHandler& handler, const ImmutableString& url,
              const tolmonet::HeaderList& headers, const tolmonet::Configuration& configuration) override;
@@ -89,8 +89,7 @@ public:
     bool CheckConnection(const ConnectionStateCallback& stateCallback) override;
     bool Logout(const ConnectionStateCallback& stateCallback) override;
 
-    Guid GetRootAsync(const CollectionCallback& success, const ErrorCallback& error,
-                      const Guid& requestUID) override;
+    Guid GetRootAsync(const CollectionCallback& success, const ErrorCallback& error, const Guid& requestUID) override;
     Guid GetPreferencesRootAsync(const CollectionCallback& success, const ErrorCallback& error,
                                  const Guid& requestUID) override;
     UTF16String GetPreferencesRootName() const override;
@@ -100,8 +99,8 @@ public:
     Guid CreateCollectionAsync(const CollectionCallback& success, const ErrorCallback& error,
                                const boost::shared_ptr<Collection>& parent, const UTF16String& name,
                                CollectionType type, const Guid& requestUID) override;
-    Guid CreateCollectionAsync(const CollectionCallback& success, const ErrorCallback& error,
-                               const UTF16String& name, CollectionType type, const Guid& requestUID) override;
+    Guid CreateCollectionAsync(const CollectionCallback& success, const ErrorCallback& error, const UTF16String& name,
+                               CollectionType type, const Guid& requestUID) override;
     Guid DeleteAsync(const SuccessCallback& success, const ErrorCallback& error,
                      const boost::shared_ptr<AssetBase>& asset, bool recursive, const Guid& requestUID) override;
     Guid DeleteAsync(const SuccessCallback& success, const ErrorCallback& error,
@@ -113,15 +112,15 @@ public:
     Guid UploadAsync(const ItemCallback& success, const ErrorCallback& error,
                      const boost::shared_ptr<Collection>& collection, const tolmocore::filesupport::File& file,
                      const ImmutableString& contentType, const UTF16String& name, const Guid& requestUID) override;
-    Guid DownloadAsync(const DownloadCallback& success, const ErrorCallback& error,
-                       const boost::shared_ptr<Item>& item, const tolmocore::filesupport::File& file,
-                       const UTF8String& etag, const Guid& requestUID) override;
+    Guid DownloadAsync(const DownloadCallback& success, const ErrorCallback& error, const boost::shared_ptr<Item>& item,
+                       const tolmocore::filesupport::File& file, const UTF8String& etag,
+                       const Guid& requestUID) override;
     Guid SearchAsync(const AssetsCallback& success, const ErrorCallback& error, const SearchQuery& query,
                      const Guid& requestUID) override;
     Guid SearchOneAsync(const AssetCallback& success, const ErrorCallback& error, const SearchQuery& query,
                         const Guid& requestUID) override;
-    Guid HeaderAsync(const AssetCallback& success, const ErrorCallback& error, const UTF8String& uid,
-                     bool isCollection, const Guid& requestUID) override;
+    Guid HeaderAsync(const AssetCallback& success, const ErrorCallback& error, const UTF8String& uid, bool isCollection,
+                     const Guid& requestUID) override;
     Guid FetchChildrenAsync(const SuccessCallback& success, const ErrorCallback& error,
                             const boost::shared_ptr<Collection>& collection, const Guid& requestUID) override;
 
@@ -149,6 +148,11 @@ public:
     bool AutoLoginRequested() const { return mAutoLogin; }
 
 private:
+    // Signs in from TOLMONETSYNC_USERNAME and TOLMONETSYNC_PASSWORD, or reuses
+    // the process's earlier environment sign-in once the service accepts it.
+    // Blocks the calling thread; never call it on the completion thread.
+    void EnvironmentLogin();
+
     // The probe of CheckConnection: a client of its own, with our address,
     // client identifier and the candidate token.
     boost::shared_ptr<Tarnvault> MakeProbe(const OvraCredentials& credentials) const;

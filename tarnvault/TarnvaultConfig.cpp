@@ -17,7 +17,10 @@ namespace tarnvault {
 
 namespace {
 
-bool IsForm(const UTF8String& value, const char* form) { return value == form; }
+bool IsForm(const UTF8String& value, const char* form)
+{
+    return value == form;
+}
 
 }  // namespace
 
@@ -45,9 +48,8 @@ Tarnvault::Tarnvault(const ParameterList& parameters)
     }
     if (mServerURL.empty()) mServerURL = kProduction.ToUTF8String();
     mAutoLogin = autoLogin;
-    if (autoLogin && mAccessToken.empty())
-        throw std::runtime_error("Environment login is not available in this build");
     mProcessor.reset(new TarnvaultProcessor(GetGlobalSyncProcessor(), &mAccessToken));
+    if (autoLogin && mAccessToken.empty()) EnvironmentLogin();
 }
 
 Tarnvault::~Tarnvault()
@@ -84,9 +86,15 @@ boost::shared_ptr<SyncFilesService> SyncTarnvault::CreateTarnvaultHelper(const P
     return boost::shared_ptr<SyncFilesService>(new SyncTarnvault(parameters));
 }
 
-const boost::shared_ptr<SyncServer>& SyncTarnvault::GetApi() const { return mApi; }
+const boost::shared_ptr<SyncServer>& SyncTarnvault::GetApi() const
+{
+    return mApi;
+}
 
-SyncServiceType SyncTarnvault::GetType() const { return SyncServiceType_Tarnvault; }
+SyncServiceType SyncTarnvault::GetType() const
+{
+    return SyncServiceType_Tarnvault;
+}
 
 boost::shared_ptr<SyncCache> SyncTarnvault::CreateCache(const std::vector<SyncFile>& files,
                                                         const std::vector<SyncDir>& dirs,
@@ -105,7 +113,10 @@ TarnvaultCache::TarnvaultCache(const std::vector<SyncFile>& files, const std::ve
 
 TarnvaultCache::~TarnvaultCache() = default;
 
-const boost::shared_ptr<SyncServer>& TarnvaultCache::GetApi() const { return mApi; }
+const boost::shared_ptr<SyncServer>& TarnvaultCache::GetApi() const
+{
+    return mApi;
+}
 
 }  // namespace tarnvault
 

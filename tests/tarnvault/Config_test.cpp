@@ -95,13 +95,15 @@ TEST(Configuration, AnotherSetCookieValueTurnsAutoLoginOffAgain)
     EXPECT_FALSE(client.AutoLoginRequested());
 }
 
-TEST(Configuration, AutoLoginWithoutATokenIsRefusedPlainly)
+TEST(Configuration, AutoLoginWithoutATokenNeedsTheEnvironmentsNameAndPassword)
 {
+    unsetenv("TOLMONETSYNC_USERNAME");
+    unsetenv("TOLMONETSYNC_PASSWORD");
     try {
         Tarnvault client(One(tolmonet::kHEADER_SET_COOKIE, "auto"));
         FAIL() << "no exception";
     } catch (const std::runtime_error& e) {
-        EXPECT_STREQ(e.what(), "Environment login is not available in this build");
+        EXPECT_STREQ(e.what(), "Missing env. variable TOLMONETSYNC_USERNAME and TOLMONETSYNC_PASSWORD");
     }
 }
 
