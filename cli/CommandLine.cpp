@@ -1,10 +1,12 @@
 #include "cli/CommandLine.h"
 
 #include <cstdlib>
+#include <filesystem>
 
 #include "foundation/core/Dir.h"
 #include "foundation/core/HostConfig.h"
 #include "foundation/core/Trace.h"
+#include "identity/OvraAuth.h"
 
 namespace tolmonetsync {
 namespace cli {
@@ -40,6 +42,7 @@ bool ReadGlobalOption(const std::vector<std::string>& arguments, std::size_t& in
         options.mServer = OptionValue(arguments, index);
     } else if (option == "--identity-server") {
         options.mIdentityServer = OptionValue(arguments, index);
+        if (options.mIdentityServer.empty()) throw UsageError("--identity-server must not be empty");
     } else if (option == "--client-id") {
         options.mClientId = OptionValue(arguments, index);
         if (options.mClientId.empty()) throw UsageError("--client-id must not be empty");
@@ -76,9 +79,15 @@ void ApplyGlobalOptions(GlobalOptions& options)
     SetCompanyName(ToUTF16(options.mCompany));
     SetClientName(ToUTF16(options.mApp));
     SetClientInternalVersion(ToUTF16(options.mAppVersion));
+    using tolmocore::filesupport::Dir;
     if (!options.mPrefDir.empty())
-        tolmocore::filesupport::Dir::SetPrefDir(tolmocore::filesupport::Dir(ToUTF16(options.mPrefDir)));
+        Dir::SetPrefDir(Dir(ToUTF16(std::filesystem::absolute(options.mPrefDir).lexically_normal().string())));
+    // The library keeps its files there and expects it to exist, as a host's does.
+    std::error_code ignored;
+    std::filesystem::create_directories(tolmocore::utility::ToNarrow(Dir::PrefDir().FullPath()), ignored);
     if (!options.mTrace.empty()) tolmocore::debug::SetTraceSpec(options.mTrace);
+    if (!options.mIdentityServer.empty())
+        SetOvraServiceURL(UTF8String(options.mIdentityServer.begin(), options.mIdentityServer.end()));
     if (options.mToken.empty()) {
         const char* token = std::getenv("TOLMONETSYNC_TOKEN");
         if (token != nullptr) options.mToken = token;

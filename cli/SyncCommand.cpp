@@ -80,11 +80,6 @@ int RunSync(GlobalOptions globals, const std::vector<std::string>& arguments)
         return 0;
     }
     ApplyGlobalOptions(globals);
-    if (globals.mToken.empty() && !globals.mAutoLogin) {
-        std::cerr << "tolmonetsync sync: no access token: give --token, set TOLMONETSYNC_TOKEN or use --auto-login"
-                  << std::endl;
-        return 1;
-    }
     job.mServer = globals.mServer;
     job.mClientId = globals.mClientId;
     job.mToken = globals.mToken;

@@ -20,7 +20,9 @@ namespace {
 
 using tolmocore::utility::ToNarrow;
 
-ParameterList MakeParameters(const SyncJob& job)
+}  // namespace
+
+ParameterList MakeJobParameters(const SyncJob& job)
 {
     ParameterList parameters;
     auto add = [&](const ImmutableString& key, const std::string& value) {
@@ -33,6 +35,8 @@ ParameterList MakeParameters(const SyncJob& job)
     for (const std::string& form : job.mMigrate) add(tolmonet::kHEADER_CACHECONTROL, "migrate-" + form);
     return parameters;
 }
+
+namespace {
 
 std::size_t CountFiles(const Dir& dir)
 {
@@ -178,9 +182,20 @@ int RunSyncJob(const SyncJob& job, Output output, std::ostream& out, std::ostrea
     JobReport report(job, output, out, err);
     boost::shared_ptr<SyncFilesService> service;
     try {
-        service = CreateSyncFilesService(SyncServiceType_Tarnvault, MakeParameters(job));
+        service = CreateSyncFilesService(SyncServiceType_Tarnvault, MakeJobParameters(job));
     } catch (const std::exception& e) {
         return report.Fail(e.what());
+    }
+    if (job.mToken.empty() && !job.mAutoLogin) {
+        // The stored sign-in, proved before anything else is asked.
+        const SyncServer_ConnectionState state = WaitForConnectionState(
+            [&](const ConnectionStateCallback& report) { return service->GetApi()->CheckConnection(report); });
+        if (state == SyncServer_NotLoggedIn)
+            return report.Fail("not signed in: run 'tolmonetsync login', give --token or set TOLMONETSYNC_TOKEN");
+        if (state != SyncServer_Connected)
+            return report.Fail(
+                "the stored sign-in was refused or the service could not be reached "
+                "(connection-failed): sign in again or check --server");
     }
     for (const SyncDir& dir : job.mDirs) {
         if (!service->RegisterSyncDirectory(dir)) {

@@ -6,6 +6,7 @@
 #include <string>
 #include <vector>
 
+#include "sync/SyncFilesService.h"
 #include "sync/SyncRecords.h"
 
 namespace tolmonetsync {
@@ -14,7 +15,7 @@ namespace cli {
 struct SyncJob {
     std::string mServer;  // empty: the client's built-in base URL
     std::string mClientId;
-    std::string mToken;
+    std::string mToken;  // empty without mAutoLogin: the stored sign-in, proved first
     bool mAutoLogin = false;
     std::vector<std::string> mMigrate;  // "major", "previous-major"
     std::string mTraceSpec;             // what the person asked to trace
@@ -35,6 +36,10 @@ enum class Output {
 // sync failed or was refused (one line on `err`), 2 a registration given
 // twice. Returns only when no request of the sync is in flight.
 int RunSyncJob(const SyncJob& job, Output output, std::ostream& out, std::ostream& err);
+
+// The client's parameters: address, client identifier, token or auto
+// sign-in, migration forms.
+ParameterList MakeJobParameters(const SyncJob& job);
 
 // "two-way", "server-wins", "local-wins".
 const char* ModeName(SyncMode mode);

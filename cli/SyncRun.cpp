@@ -123,5 +123,26 @@ RunOutcome RunPass(SyncFilesService& service, const boost::shared_ptr<SyncCache>
     return outcome;
 }
 
+SyncServer_ConnectionState WaitForConnectionState(const ConnectionCall& call)
+{
+    struct Reported {
+        std::mutex mMutex;
+        std::condition_variable mCame;
+        bool mDone = false;
+        SyncServer_ConnectionState mState = SyncServer_Unknown;
+    };
+    const auto reported = std::make_shared<Reported>();
+    const bool started = call([reported](SyncServer_ConnectionState state) {
+        std::lock_guard<std::mutex> lock(reported->mMutex);
+        reported->mState = state;
+        reported->mDone = true;
+        reported->mCame.notify_all();
+    });
+    if (!started) return SyncServer_Unknown;
+    std::unique_lock<std::mutex> lock(reported->mMutex);
+    reported->mCame.wait(lock, [&] { return reported->mDone; });
+    return reported->mState;
+}
+
 }  // namespace cli
 }  // namespace tolmonetsync

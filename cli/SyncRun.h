@@ -35,6 +35,11 @@ using WhileWaiting = std::function<void()>;
 
 RunOutcome RunPreview(SyncFilesService& service, SyncMode mode, const WhileWaiting& tick = {});
 RunOutcome RunPrepare(SyncFilesService& service, const ProgressCallback& progress, const WhileWaiting& tick = {});
+// Waits for the state a connection call (SetCredentials, CheckConnection,
+// Logout) reports; SyncServer_Unknown if the call could not start.
+using ConnectionCall = std::function<bool(const ConnectionStateCallback&)>;
+SyncServer_ConnectionState WaitForConnectionState(const ConnectionCall& call);
+
 RunOutcome RunPass(SyncFilesService& service, const boost::shared_ptr<SyncCache>& cache, SyncMode mode,
                    const WhileWaiting& tick = {});
 

@@ -8,6 +8,7 @@
 #include "cli/CommandLine.h"
 #include "cli/DemoCommand.h"
 #include "cli/ServeCommand.h"
+#include "cli/SignInCommands.h"
 #include "cli/SyncCommand.h"
 
 namespace {
@@ -18,6 +19,9 @@ const char kUsage[] =
     "usage: tolmonetsync [global options] COMMAND [options]\n"
     "commands:\n"
     "  serve    run the local asset service\n"
+    "  login    sign in and store the sign-in\n"
+    "  logout   forget the stored sign-in\n"
+    "  status   connected, not-logged-in or connection-failed\n"
     "  sync     keep directories and files in step with the asset service\n"
     "  demo     the main job end to end on a local service with temporary data\n"
     "'tolmonetsync COMMAND --help' tells more.\n";
@@ -48,6 +52,9 @@ int main(int argc, char** argv)
     if (command == "serve") return RunServe(globals, rest);
     if (command == "sync") return RunSync(globals, rest);
     if (command == "demo") return RunDemo(globals, rest);
+    if (command == "login") return RunLogin(globals, rest);
+    if (command == "logout") return RunLogout(globals, rest);
+    if (command == "status") return RunStatus(globals, rest);
     if (command == "help") {
         std::cout << kUsage << "\n" << kGlobalOptionsHelp;
         return 0;
