@@ -1,9 +1,10 @@
 // Copying a collection's subtree on the service: collections are made anew,
 // items go down to a temporary file and up again. One batch per level.
 
+#include <unistd.h>
 #include <cstdio>
 #include <cstdlib>
-#include <unistd.h>
+#include <set>
 
 #include <boost/bind/bind.hpp>
 #include <boost/thread/lock_guard.hpp>
@@ -15,24 +16,36 @@
 namespace tolmonetsync {
 namespace tarnvault {
 
+using boost::placeholders::_1;
+using boost::placeholders::_2;
 using tolmocore::filesupport::File;
 using tolmocore::utility::ToUTF16;
 using utility::DeferredList;
-using boost::placeholders::_1;
-using boost::placeholders::_2;
 
 namespace {
 
 using List = boost::shared_ptr<DeferredList>;
 using WeakClient = boost::weak_ptr<Tarnvault>;
+// The source collections on the path from the copy's root down to a level.
+// A collection may be a member of itself, directly or deeper: one that is
+// already on the path is skipped, so such a cycle is copied once round and
+// the copy ends.
+using Ancestors = boost::shared_ptr<const std::set<UTF8String> >;
+
+Guid CopySubtree(const boost::shared_ptr<Tarnvault>& client, const SuccessCallback& completion,
+                 const ErrorCallback& error, const boost::shared_ptr<Collection>& source,
+                 const boost::shared_ptr<Collection>& destination, const Guid& requestUID,
+                 const Tarnvault::NameMap& nameMap, const Ancestors& ancestors);
 
 // One level of a copy. Holds the client only weakly, so that a long copy
 // does not keep it alive; its temporary files go with it.
 class BatchCopy : public DeferredList {
 public:
     BatchCopy(unsigned long long count, const Completion& completion, const TextCallback& error,
-              const Tarnvault::NameMap& nameMap)
-        : DeferredList(count, completion, error, ProgressCallback(), TextCallback()), mNameMap(nameMap)
+              const Tarnvault::NameMap& nameMap, const Ancestors& ancestors)
+        : DeferredList(count, completion, error, ProgressCallback(), TextCallback()),
+          mNameMap(nameMap),
+          mAncestors(ancestors)
     {
     }
     ~BatchCopy() override
@@ -62,9 +75,13 @@ public:
 
     std::vector<File> mTempFiles;
     Tarnvault::NameMap mNameMap;
+    Ancestors mAncestors;  // this level's source and the collections above it
 };
 
-BatchCopy& Batch(const List& list) { return static_cast<BatchCopy&>(*list); }
+BatchCopy& Batch(const List& list)
+{
+    return static_cast<BatchCopy&>(*list);
+}
 
 File MakeTempFile()
 {
@@ -110,9 +127,9 @@ void BatchCopy::OnCreateCollection(const List& list, unsigned long long index, c
         DeferredList::Errback(list, slot, guid, MakeErrorResponse(ToUTF16("Tarnvault closed prematurely")));
         return;
     }
-    const Guid sent = strong->CopyAsync(boost::bind(&DeferredList::Callback, list, slot, _1),
-                                        boost::bind(&DeferredList::Errback, list, slot, _1, _2), sourceCollection,
-                                        newCollection, guid, Batch(list).mNameMap);
+    const Guid sent = CopySubtree(strong, boost::bind(&DeferredList::Callback, list, slot, _1),
+                                  boost::bind(&DeferredList::Errback, list, slot, _1, _2), sourceCollection,
+                                  newCollection, guid, Batch(list).mNameMap, Batch(list).mAncestors);
     if (sent.IsNil()) DeferredList::Errback(list, slot, guid, MakeErrorResponse(ToUTF16("CopyAsync failed")));
 }
 
@@ -127,14 +144,16 @@ void BatchCopy::OnDownloadItem(const List& list, unsigned long long index, const
         DeferredList::Errback(list, slot, guid, MakeErrorResponse(ToUTF16("Tarnvault closed prematurely")));
         return;
     }
-    const Guid sent = strong->UploadAsync(boost::bind(&DeferredList::Callback, list, slot, _1),
-                                          boost::bind(&DeferredList::Errback, list, slot, _1, _2), destination, file,
-                                          ImmutableString::CreateDynamic(result.mContentType),
-                                          Batch(list).NameOf(item), guid);
+    const Guid sent = strong->UploadAsync(
+        boost::bind(&DeferredList::Callback, list, slot, _1), boost::bind(&DeferredList::Errback, list, slot, _1, _2),
+        destination, file, ImmutableString::CreateDynamic(result.mContentType), Batch(list).NameOf(item), guid);
     if (sent.IsNil()) DeferredList::Errback(list, slot, guid, MakeErrorResponse(ToUTF16("UploadAsync failed")));
 }
 
-void _CopyAsync_FetchFromSource_Result(const SuccessCallback& completion, const Guid& guid) { completion(guid); }
+void _CopyAsync_FetchFromSource_Result(const SuccessCallback& completion, const Guid& guid)
+{
+    completion(guid);
+}
 
 void _CopyAsync_FetchFromSource_Error(const ErrorCallback& error, const Guid& guid, const UTF16String& text)
 {
@@ -143,15 +162,22 @@ void _CopyAsync_FetchFromSource_Error(const ErrorCallback& error, const Guid& gu
 
 void _CopyAsync_FetchFromSource(const boost::weak_ptr<Tarnvault>& self, const boost::shared_ptr<Collection>& source,
                                 const boost::shared_ptr<Collection>& destination, const Tarnvault::NameMap& nameMap,
-                                const SuccessCallback& completion, const ErrorCallback& error, const Guid& guid)
+                                const Ancestors& ancestors, const SuccessCallback& completion,
+                                const ErrorCallback& error, const Guid& guid)
 {
     const boost::shared_ptr<Tarnvault> client = self.lock();
     if (!client) return;
     // Nothing else writes the children while this callback of their fetch runs.
     const std::vector<boost::shared_ptr<AssetBase> > children = source->mChildren;
     List list(new BatchCopy(children.size(), boost::bind(&_CopyAsync_FetchFromSource_Result, completion, guid),
-                            boost::bind(&_CopyAsync_FetchFromSource_Error, error, guid, _1), nameMap));
+                            boost::bind(&_CopyAsync_FetchFromSource_Error, error, guid, _1), nameMap, ancestors));
     for (std::size_t index = 0; index < children.size(); ++index) {
+        if (children[index]->is_collection() && ancestors->count(children[index]->mId) != 0) {
+            TOLMO_TRACE("Tarnvault", 1,
+                        "CopyAsync: skipping " << children[index] << ", which contains the collection it is in");
+            list->Skip(index);
+            continue;
+        }
         if (BatchCopy::QueueCopy(list, index, WeakClient(client), children[index], destination).IsNil()) {
             error(guid, MakeErrorResponse(ToUTF16("QueueAdd failed")));
             break;
@@ -159,16 +185,26 @@ void _CopyAsync_FetchFromSource(const boost::weak_ptr<Tarnvault>& self, const bo
     }
 }
 
+Guid CopySubtree(const boost::shared_ptr<Tarnvault>& client, const SuccessCallback& completion,
+                 const ErrorCallback& error, const boost::shared_ptr<Collection>& source,
+                 const boost::shared_ptr<Collection>& destination, const Guid& requestUID,
+                 const Tarnvault::NameMap& nameMap, const Ancestors& ancestors)
+{
+    boost::shared_ptr<std::set<UTF8String> > path(new std::set<UTF8String>(*ancestors));
+    path->insert(source->mId);
+    return client->FetchChildrenAsync(boost::bind(&_CopyAsync_FetchFromSource, client, source, destination, nameMap,
+                                                  Ancestors(path), completion, error, _1),
+                                      error, source, requestUID);
+}
+
 }  // namespace
 
 Guid Tarnvault::CopyAsync(const SuccessCallback& completion, const ErrorCallback& error,
-                          const boost::shared_ptr<Collection>& source,
-                          const boost::shared_ptr<Collection>& destination, const Guid& requestUID,
-                          const NameMap& nameMap)
+                          const boost::shared_ptr<Collection>& source, const boost::shared_ptr<Collection>& destination,
+                          const Guid& requestUID, const NameMap& nameMap)
 {
-    return FetchChildrenAsync(boost::bind(&_CopyAsync_FetchFromSource, shared_from_this(), source, destination,
-                                          nameMap, completion, error, _1),
-                              error, source, requestUID);
+    return CopySubtree(shared_from_this(), completion, error, source, destination, requestUID, nameMap,
+                       Ancestors(new std::set<UTF8String>()));
 }
 
 }  // namespace tarnvault

@@ -34,6 +34,7 @@ public:
 
     std::string mFailUploadOf;  // an upload whose target holds this fails with 500
     bool mEmptySource = false;
+    bool mCycle = false;  // c1 holds S too, and itself: a tree no copy may follow round
 
 private:
     HttpAnswer Answer(const HttpRequest& request)
@@ -43,9 +44,12 @@ private:
         HttpAnswer answer;
         if (request.mMethod == "POST" && target.rfind("/api/search?", 0) == 0) {
             if (target.find(R"(scope=["/collections/S"])") != std::string::npos)
-                answer.mBody = mEmptySource ? "[]" : "[" + ItemJSON("i1", "a.txt") + "," + CollectionJSON("c1", "sub") + "]";
+                answer.mBody =
+                    mEmptySource ? "[]" : "[" + ItemJSON("i1", "a.txt") + "," + CollectionJSON("c1", "sub") + "]";
             else if (target.find(R"(scope=["/collections/c1"])") != std::string::npos)
-                answer.mBody = "[" + ItemJSON("i2", "b.txt") + "]";
+                answer.mBody = "[" + ItemJSON("i2", "b.txt") +
+                               (mCycle ? "," + CollectionJSON("S", "again") + "," + CollectionJSON("c1", "self") : "") +
+                               "]";
             else
                 answer.mBody = "[]";
         } else if (request.mMethod == "GET" && (target == "/api/assets/i1" || target == "/api/assets/i2")) {
@@ -139,15 +143,15 @@ TEST(Copy, TheWholeSubtreeArrivesUnderMappedNamesWithTheDownloadedTypes)
     boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(service.ApiUrl(), "tok", "c")));
     Outcome outcome;
     const Guid id = Guid::CreateUnique();
-    EXPECT_EQ(client->CopyAsync(outcome.Success(), outcome.Error(), MakeCollection("S"), MakeCollection("D"), id,
-                                &Upper),
-              id);
+    EXPECT_EQ(
+        client->CopyAsync(outcome.Success(), outcome.Error(), MakeCollection("S"), MakeCollection("D"), id, &Upper),
+        id);
     ASSERT_TRUE(outcome.Wait());
     ASSERT_TRUE(outcome.Succeeded()) << outcome.ErrorText();
     EXPECT_EQ(outcome.Id(), id);
 
-    EXPECT_EQ(service.Creates(), std::vector<std::string>{R"({"header":{"name":"SUB","type":")" +
-                                                          std::string(kCollectionMedia) + "\"}}"});
+    EXPECT_EQ(service.Creates(),
+              std::vector<std::string>{R"({"header":{"name":"SUB","type":")" + std::string(kCollectionMedia) + "\"}}"});
     std::map<std::string, TreeService::Upload> byBody;
     for (const auto& upload : service.Uploads()) byBody[upload.mBody] = upload;
     ASSERT_EQ(byBody.size(), 2u);
@@ -176,6 +180,21 @@ TEST(Copy, WithoutANameMapNamesStay)
     for (const auto& upload : service.Uploads())
         EXPECT_TRUE(upload.mTarget.find("name=a.txt") != std::string::npos ||
                     upload.mTarget.find("name=b.txt") != std::string::npos);
+}
+
+TEST(Copy, ACollectionInsideItselfIsCopiedOnceRoundAndTheCopyEnds)
+{
+    TempDirEnvironment temp;
+    TreeService service;
+    service.mCycle = true;
+    boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(service.ApiUrl(), "tok", "c")));
+    Outcome outcome;
+    client->CopyAsync(outcome.Success(), outcome.Error(), MakeCollection("S"), MakeCollection("D"),
+                      Guid::CreateUnique(), Tarnvault::NameMap());
+    ASSERT_TRUE(outcome.Wait());
+    ASSERT_TRUE(outcome.Succeeded()) << outcome.ErrorText();
+    EXPECT_EQ(service.Creates().size(), 1u);  // sub only: S and c1 again are skipped
+    EXPECT_EQ(service.Uploads().size(), 2u);
 }
 
 TEST(Copy, AnEmptySourceCompletesAfterTheFetchAlone)
