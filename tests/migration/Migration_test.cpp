@@ -1,0 +1,298 @@
+// Migration of an earlier host version's preferences into a new version's
+// root, and the recursive copy under it, against the local service with
+// seeded trees.
+
+#include <gtest/gtest.h>
+
+#include <chrono>
+#include <condition_variable>
+#include <cstdlib>
+#include <filesystem>
+#include <mutex>
+#include <thread>
+
+#include <boost/make_shared.hpp>
+
+#include "assets/RestException.h"
+#include "foundation/core/HostConfig.h"
+#include "foundation/net/HeaderConstants.h"
+#include "server/FaultHooks.h"
+#include "server/LocalService.h"
+#include "server/TreeSeeder.h"
+#include "support/TempDir.h"
+#include "tarnvault/Tarnvault.h"
+
+namespace {
+
+using namespace tolmonetsync;
+using server::TreeSeeder;
+using tolmocore::utility::ToNarrow;
+using tolmocore::utility::ToUTF16;
+
+const char kClient[] = "desk";
+const char kCinderalOldClient[] = "5d26c4f8-0ae1-47b3-9c15-c3e7b0926d41";
+
+// What a request of the client ended with.
+struct Ended {
+    bool mDone = false;
+    std::string mError;
+    boost::shared_ptr<Collection> mRoot;
+};
+
+class Waiter {
+public:
+    CollectionCallback OnRoot()
+    {
+        return [this](const Guid&, const boost::shared_ptr<Collection>& root) { Finish(root, std::string()); };
+    }
+    SuccessCallback OnSuccess()
+    {
+        return [this](const Guid&) { Finish(nullptr, std::string()); };
+    }
+    ErrorCallback OnError()
+    {
+        return [this](const Guid& id, const boost::shared_ptr<tolmonet::Response>& response) {
+            std::string text = "no response";
+            try {
+                ThrowResponse(id, response);
+            } catch (const std::exception& e) {
+                text = e.what();
+            }
+            Finish(nullptr, text);
+        };
+    }
+    Ended Wait()
+    {
+        std::unique_lock<std::mutex> lock(mMutex);
+        mCame.wait_for(lock, std::chrono::seconds(30), [this] { return mEnded.mDone; });
+        return mEnded;
+    }
+
+private:
+    void Finish(const boost::shared_ptr<Collection>& root, const std::string& error)
+    {
+        std::lock_guard<std::mutex> lock(mMutex);
+        mEnded.mDone = true;
+        mEnded.mRoot = root;
+        mEnded.mError = error;
+        mCame.notify_all();
+    }
+    std::mutex mMutex;
+    std::condition_variable mCame;
+    Ended mEnded;
+};
+
+// A described tree with `from` replaced by `to` in every name (not in contents).
+std::string RenamedTree(const std::string& tree, const std::string& from, const std::string& to)
+{
+    std::string renamed;
+    std::size_t start = 0;
+    while (start < tree.size()) {
+        const std::size_t end = tree.find('\n', start);
+        std::string line = tree.substr(start, end - start);
+        start = end + 1;
+        const std::size_t contents = line.find(" (");
+        std::string name = line.substr(0, contents);
+        for (std::size_t at; (at = name.find(from)) != std::string::npos;) name.replace(at, from.size(), to);
+        renamed += name + (contents == std::string::npos ? "" : line.substr(contents)) + "\n";
+    }
+    return renamed;
+}
+
+class Migration : public ::testing::Test {
+protected:
+    Migration()
+    {
+        server::LocalServiceOptions options;
+        options.mDataDirectory = mData.Path().string();
+        options.mTokens.push_back({"ann", "tok"});
+        mService.reset(new server::LocalService(options));
+        mService->Start();
+        mSeed.reset(new TreeSeeder(*mService, "ann"));
+        setenv("TMPDIR", mTemp.Path().c_str(), 1);
+    }
+    ~Migration() override
+    {
+        unsetenv("TMPDIR");
+        mService->Stop();
+    }
+
+    void Host(const char16_t* app, const char16_t* version)
+    {
+        tolmocore::config::SetCompanyName(u"Co");
+        tolmocore::config::SetClientName(app);
+        tolmocore::config::SetClientInternalVersion(version);
+    }
+    boost::shared_ptr<tarnvault::Tarnvault> Client(bool major, bool previousMajor)
+    {
+        ParameterList parameters;
+        const std::string url = mService->AssetServiceUrl();
+        parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(url.begin(), url.end()));
+        parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, Text(kClient));
+        parameters.emplace_back(tolmonet::kHEADER_COOKIE, Text("tok"));
+        if (major) parameters.emplace_back(tolmonet::kHEADER_CACHECONTROL, Text("migrate-major"));
+        if (previousMajor) parameters.emplace_back(tolmonet::kHEADER_CACHECONTROL, Text("migrate-previous-major"));
+        return boost::shared_ptr<tarnvault::Tarnvault>(new tarnvault::Tarnvault(parameters));
+    }
+    Ended PreferencesRoot(const boost::shared_ptr<tarnvault::Tarnvault>& client)
+    {
+        Waiter waiter;
+        client->GetPreferencesRootAsync(waiter.OnRoot(), waiter.OnError(), Guid::CreateUnique());
+        return waiter.Wait();
+    }
+    // An earlier version's preferences root: an item named for it at the top
+    // and a nested group whose names carry the version too.
+    std::string SeedVersion(const std::string& clientRoot, const std::string& app, const std::string& version)
+    {
+        const std::string root = mSeed->Collection(clientRoot, "Co_" + app + "_" + version, server::kMediaPreferences);
+        mSeed->Item(root, "from-" + version + ".txt", "settings of " + version, "text/plain");
+        const std::string group = mSeed->Collection(root, "Group " + version);
+        mSeed->Item(group, "a.json", "{\"v\":\"" + version + "\"}", "application/json");
+        const std::string deeper = mSeed->Collection(group, "Deeper");
+        mSeed->Item(deeper, "b-" + version + ".bin", "b", "application/octet-stream");
+        return root;
+    }
+    std::string NewRootTree(const std::string& app, const std::string& version)
+    {
+        const std::string root = mSeed->Find(mSeed->ClientRoot(kClient), "Co_" + app + "_" + version);
+        return root.empty() ? "<no root>" : mSeed->Describe(root);
+    }
+    std::size_t TempFiles() const
+    {
+        std::size_t count = 0;
+        for (const auto& entry : std::filesystem::directory_iterator(mTemp.Path())) count += entry.is_regular_file();
+        return count;
+    }
+    static UTF8String Text(const char* text) { return UTF8String(reinterpret_cast<const unsigned char*>(text)); }
+
+    testsupport::TempDir mData;
+    testsupport::TempDir mTemp;
+    std::unique_ptr<server::LocalService> mService;
+    std::unique_ptr<TreeSeeder> mSeed;
+};
+
+TEST_F(Migration, EachFormAndVersionCopiesTheRightEarlierTree)
+{
+    const std::string clientRoot = mSeed->ClientRoot(kClient);
+    std::map<std::string, std::string> oldTrees;
+    for (const char* version : {"9.1", "8.5", "8.0"})
+        oldTrees[version] = mSeed->Describe(SeedVersion(clientRoot, "App", version));
+
+    const struct {
+        const char16_t* mVersion;
+        bool mMajor, mPrevious;
+        const char* mFrom;  // empty: no migration; "error": the version cannot be migrated from
+    } cases[] = {
+        {u"9.2", true, false, "9.1"},     {u"9.2", true, true, "9.1"},     {u"9.2", false, true, "8.0"},
+        {u"9.0", true, false, "error"},   {u"9.0", true, true, "8.5"},     {u"9.0", false, true, "8.0"},
+        {u"0.0", true, false, "error"},   {u"0.0", true, true, "error"},   {u"0.0", false, true, "error"},
+        {u"9.0.1", true, false, "error"}, {u"9.0.1", true, true, "error"}, {u"9.0.1", false, true, "error"},
+        {u"9.2", false, false, ""},
+    };
+    int appNumber = 0;
+    for (const auto& entry : cases) {
+        // Each case a host of its own name, so that every case starts without a new root.
+        const std::string app = "App" + std::to_string(++appNumber);
+        const std::string version = ToNarrow(entry.mVersion);
+        for (const char* old : {"9.1", "8.5", "8.0"}) SeedVersion(clientRoot, app, old);
+        Host(ToUTF16(app).c_str(), entry.mVersion);
+        const std::string label = version + (entry.mMajor ? " major" : "") + (entry.mPrevious ? " previous-major" : "");
+        const Ended ended = PreferencesRoot(Client(entry.mMajor, entry.mPrevious));
+        ASSERT_TRUE(ended.mDone) << label;
+        const std::string from = entry.mFrom;
+        if (from == "error") {
+            EXPECT_EQ(ended.mError, "Could not migrate preferences, problem with client version") << label;
+            EXPECT_EQ(NewRootTree(app, version), "<no root>") << label;
+            continue;
+        }
+        ASSERT_TRUE(ended.mError.empty()) << label << ": " << ended.mError;
+        ASSERT_TRUE(ended.mRoot) << label;
+        const std::string expected = from.empty() ? std::string() : RenamedTree(oldTrees[from], from, version);
+        EXPECT_EQ(NewRootTree(app, version), expected) << label;
+    }
+    // The earlier trees were only read.
+    for (const auto& old : oldTrees)
+        EXPECT_EQ(mSeed->Describe(mSeed->Find(clientRoot, "Co_App_" + old.first)), old.second);
+    EXPECT_EQ(TempFiles(), 0u);
+}
+
+TEST_F(Migration, CinderalUpToEightTakesTheOldClientIdentifiersTree)
+{
+    const std::string oldClientRoot = mSeed->ClientRoot(kCinderalOldClient);
+    SeedVersion(oldClientRoot, "Cinderal", "8.0");
+    SeedVersion(mSeed->ClientRoot(kClient), "Cinderal", "9.1");
+    Host(u"Cinderal", u"9.0");
+    ASSERT_TRUE(PreferencesRoot(Client(false, true)).mRoot);
+    EXPECT_NE(NewRootTree("Cinderal", "9.0").find("from-9.0.txt"), std::string::npos) << NewRootTree("Cinderal", "9.0");
+
+    // Above 8.0 the current identifier's tree is the source.
+    Host(u"Cinderal", u"9.2");
+    ASSERT_TRUE(PreferencesRoot(Client(true, false)).mRoot);
+    EXPECT_NE(NewRootTree("Cinderal", "9.2").find("from-9.2.txt"), std::string::npos);
+    EXPECT_EQ(mSeed->Describe(mSeed->Find(oldClientRoot, "Co_Cinderal_8.0")).find("9.0"), std::string::npos);
+}
+
+TEST_F(Migration, AnEmptyEarlierRootGivesAnEmptyNewOne)
+{
+    mSeed->Collection(mSeed->ClientRoot(kClient), "Co_App_9.1", server::kMediaPreferences);
+    Host(u"App", u"9.2");
+    const Ended ended = PreferencesRoot(Client(true, false));
+    ASSERT_TRUE(ended.mRoot) << ended.mError;
+    EXPECT_EQ(NewRootTree("App", "9.2"), "");
+}
+
+TEST_F(Migration, AFailedUploadLeavesTheNewRootPartlyFilledAndIsNotRetried)
+{
+    const std::string old = SeedVersion(mSeed->ClientRoot(kClient), "App", "9.1");
+    const std::string before = mSeed->Describe(old);
+    server::FaultRule refuse;
+    refuse.mMethod = "POST";
+    refuse.mPathPattern = "/api/assets";
+    refuse.mNth = 2;
+    const auto fault = mService->Faults().Install(refuse);
+    Host(u"App", u"9.2");
+    const Ended ended = PreferencesRoot(Client(true, false));
+    ASSERT_TRUE(ended.mRoot) << "a failed copy still gives the new root: " << ended.mError;
+    EXPECT_TRUE(fault->Fired());
+    EXPECT_EQ(fault->Seen(), 3);  // three items, each sent once
+    const std::string copied = NewRootTree("App", "9.2");
+    std::size_t items = 0;
+    for (std::size_t at = 0; (at = copied.find("): ", at)) != std::string::npos; ++at) ++items;
+    EXPECT_EQ(items, 2u) << copied;
+    EXPECT_EQ(mSeed->Describe(old), before);
+    for (int i = 0; i < 300 && TempFiles() != 0; ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    EXPECT_EQ(TempFiles(), 0u);
+}
+
+TEST_F(Migration, ACopyWhoseClientGoesMidwayEndsOnceAndLeavesNoTemporaryFile)
+{
+    const std::string clientRoot = mSeed->ClientRoot(kClient);
+    const std::string source = SeedVersion(clientRoot, "App", "9.1");
+    const std::string target = mSeed->Collection(clientRoot, "Target");
+    server::FaultRule slow;
+    slow.mMethod = "GET";
+    slow.mPathPattern = "/api/assets/[^/]+";
+    slow.mAction = server::FaultAction_Delay;
+    slow.mDelay = std::chrono::milliseconds(300);
+    const auto fault = mService->Faults().Install(slow);
+    Host(u"App", u"9.1");
+
+    Waiter waiter;
+    {
+        auto client = Client(false, false);
+        const auto sourceCollection = boost::make_shared<Collection>();
+        sourceCollection->mId = UTF8String(source.begin(), source.end());
+        const auto targetCollection = boost::make_shared<Collection>();
+        targetCollection->mId = UTF8String(target.begin(), target.end());
+        client->CopyAsync(waiter.OnSuccess(), waiter.OnError(), sourceCollection, targetCollection,
+                          Guid::CreateUnique(), tarnvault::Tarnvault::NameMap());
+        while (!fault->Fired()) std::this_thread::sleep_for(std::chrono::milliseconds(5));
+    }  // the client goes while the first download is held
+    const Ended ended = waiter.Wait();
+    ASSERT_TRUE(ended.mDone);
+    EXPECT_EQ(ended.mError, "Tarnvault closed prematurely");
+    for (int i = 0; i < 300 && TempFiles() != 0; ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    EXPECT_EQ(TempFiles(), 0u);
+}
+
+}  // namespace
