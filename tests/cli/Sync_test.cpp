@@ -264,15 +264,23 @@ TEST_F(SyncCommand, MigrateCopiesTheEarlierVersionsPreferencesAndSaysFromWhich)
     mLaptop.Write("a.txt", "a1");
     ASSERT_EQ(mLaptop.Sync(mService, {"--app-version", "1.0"}).mStatus, 0);
 
-    const Finished without = mDesktop.Sync(mService, {"--app-version", "2.0", "--dry-run"});
-    EXPECT_FALSE(Contains(without.mOut, "download")) << without.mOut;  // 2.0 has a root of its own to make
+    const Finished without = mDesktop.Sync(mService, {"--app-version", "1.1", "--dry-run"});
+    EXPECT_FALSE(Contains(without.mOut, "download")) << without.mOut;  // 1.1 has a root of its own to make
 
-    const Finished migrated = mDesktop.Sync(mService, {"--app-version", "2.0", "--migrate", "previous-major"});
+    const Finished migrated =
+        mDesktop.Sync(mService, {"--app-version", "1.1", "--migrate", "major", "--migrate", "previous-major"});
     ASSERT_EQ(migrated.mStatus, 0) << migrated.mErr;
     EXPECT_TRUE(Contains(migrated.mOut, "version 1.0's (Tolmonet_tolmonetsync_1.0) were copied")) << migrated.mOut;
     EXPECT_TRUE(Contains(migrated.mOut, "download  Notes/a.txt: missing locally")) << migrated.mOut;
     EXPECT_EQ(mDesktop.Read("a.txt"), "a1");
     EXPECT_TRUE(migrated.mErr.empty()) << migrated.mErr;  // the trace it listens to stays silent
+
+    // A later version crossing a major number looks for the last minor one (1.5) and finds none.
+    Computer next(mRoot.Path(), "next");
+    const Finished crossed =
+        next.Sync(mService, {"--app-version", "2.0", "--migrate", "major", "--migrate", "previous-major"});
+    ASSERT_EQ(crossed.mStatus, 0) << crossed.mErr;
+    EXPECT_FALSE(Contains(crossed.mOut, "migration")) << crossed.mOut;
 
     // The earlier version's tree is only read.
     const Finished earlier = mLaptop.Sync(mService, {"--app-version", "1.0", "--json"});
