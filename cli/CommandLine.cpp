@@ -82,9 +82,6 @@ void ApplyGlobalOptions(GlobalOptions& options)
     using tolmocore::filesupport::Dir;
     if (!options.mPrefDir.empty())
         Dir::SetPrefDir(Dir(ToUTF16(std::filesystem::absolute(options.mPrefDir).lexically_normal().string())));
-    // The library keeps its files there and expects it to exist, as a host's does.
-    std::error_code ignored;
-    std::filesystem::create_directories(tolmocore::utility::ToNarrow(Dir::PrefDir().FullPath()), ignored);
     if (!options.mTrace.empty()) tolmocore::debug::SetTraceSpec(options.mTrace);
     if (!options.mIdentityServer.empty())
         SetOvraServiceURL(UTF8String(options.mIdentityServer.begin(), options.mIdentityServer.end()));
@@ -92,6 +89,13 @@ void ApplyGlobalOptions(GlobalOptions& options)
         const char* token = std::getenv("TOLMONETSYNC_TOKEN");
         if (token != nullptr) options.mToken = token;
     }
+}
+
+void EnsurePrefDir()
+{
+    std::error_code ignored;
+    std::filesystem::create_directories(tolmocore::utility::ToNarrow(tolmocore::filesupport::Dir::PrefDir().FullPath()),
+                                        ignored);
 }
 
 }  // namespace cli

@@ -43,6 +43,11 @@ const std::string& OptionValue(const std::vector<std::string>& arguments, std::s
 // options, and the token from TOLMONETSYNC_TOKEN when --token was not given.
 void ApplyGlobalOptions(GlobalOptions& options);
 
+// Makes the preference directory if it is missing: the library keeps the
+// cache file, backups and stored sign-in there and expects it to exist, as a
+// host's does.
+void EnsurePrefDir();
+
 extern const char kGlobalOptionsHelp[];
 
 }  // namespace cli

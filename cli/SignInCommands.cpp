@@ -127,6 +127,7 @@ int RunLogin(GlobalOptions globals, const std::vector<std::string>& arguments)
         return Usage("login", kLoginUsage, e.what());
     }
     ApplyGlobalOptions(globals);
+    EnsurePrefDir();
     std::string password;
     if (passwordStdin) {
         std::getline(std::cin, password);
@@ -186,6 +187,7 @@ int RunLogout(GlobalOptions globals, const std::vector<std::string>& arguments)
         return Usage("logout", kLogoutUsage, e.what());
     }
     ApplyGlobalOptions(globals);
+    EnsurePrefDir();
     // The service forgets the device; the answer changes nothing here.
     const std::string device =
         ToNarrow(tolmocore::security::Keychain::GetPassword(DeviceTokenDomain(), kDeviceTokenAccount));
@@ -222,6 +224,7 @@ int RunStatus(GlobalOptions globals, const std::vector<std::string>& arguments)
         return Usage("status", kStatusUsage, e.what());
     }
     ApplyGlobalOptions(globals);
+    EnsurePrefDir();
     const boost::shared_ptr<SyncServer> client = MakeClient(globals);
     const SyncServer_ConnectionState state =
         WaitForConnectionState([&](const ConnectionStateCallback& report) { return client->CheckConnection(report); });

@@ -80,6 +80,7 @@ int RunSync(GlobalOptions globals, const std::vector<std::string>& arguments)
         return 0;
     }
     ApplyGlobalOptions(globals);
+    EnsurePrefDir();
     job.mServer = globals.mServer;
     job.mClientId = globals.mClientId;
     job.mToken = globals.mToken;
