@@ -1,6 +1,8 @@
-// login, status, a sync on the stored sign-in, and logout, as processes.
+// login, status, a sync on the stored sign-in, a restart, and logout, as processes.
 
 #include <gtest/gtest.h>
+
+#include <memory>
 
 #include "CliProcess.h"
 #include "support/TempDir.h"
@@ -10,16 +12,16 @@ namespace {
 using clitest::Finished;
 using clitest::RunCli;
 
-TEST(SignInCommands, LoginStatusSyncLogoutCycle)
+TEST(SignInCommands, LoginStatusSyncRestartSyncLogoutCycle)
 {
     testsupport::TempDir root;
-    clitest::ServedService service(root / "service", "unused-token");
+    auto service = std::make_unique<clitest::ServedService>(root / "service", "unused-token");
     std::filesystem::create_directories(root / "folder");
     testsupport::WriteFileBytes(root / "folder" / "a.txt", "a");
-    const std::vector<std::string> where = {"--server",          service.ApiUrl(),
-                                            "--identity-server", service.Base() + "/ovra",
-                                            "--pref-dir",        (root / "pref").string()};
     auto run = [&](std::vector<std::string> arguments, const std::vector<std::string>& environment = {}) {
+        const std::vector<std::string> where = {"--server",          service->ApiUrl(),
+                                                "--identity-server", service->Base() + "/ovra",
+                                                "--pref-dir",        (root / "pref").string()};
         arguments.insert(arguments.begin(), where.begin(), where.end());
         return RunCli(arguments, environment);
     };
@@ -43,6 +45,13 @@ TEST(SignInCommands, LoginStatusSyncLogoutCycle)
     EXPECT_EQ(connected.mOut, "connected\n");
     const Finished synced = run(sync);
     EXPECT_EQ(synced.mStatus, 0) << synced.mErr;
+
+    // Every command is a new process; the service restarts too, on its data.
+    service.reset();
+    service = std::make_unique<clitest::ServedService>(root / "service", "unused-token");
+    EXPECT_EQ(run({"status"}).mOut, "connected\n");
+    const Finished again = run(sync);
+    EXPECT_EQ(again.mStatus, 0) << again.mErr;
 
     EXPECT_EQ(run({"logout"}).mStatus, 0);
     const Finished after = run({"status"});
