@@ -280,7 +280,7 @@ double FloorSmall(const std::string& api, const ItemList& list)
 {
     std::vector<wholebench::FloorRequest> requests;
     for (const auto& item : list.mItems)
-        requests.push_back({"GET", api + "/assets/" + item.first + "/metadata", {Bearer()}, nullptr, 200});
+        requests.push_back({"GET", api + "/assets/" + item.first + "/metadata", {Bearer()}, nullptr, 200, ""});
     return wholebench::RunFloor(requests, kParallel);
 }
 
@@ -295,7 +295,8 @@ double FloorUploads(const std::string& api, const std::string& groupId, const st
                             api + "/assets?name=" + prefix + std::to_string(i) + ".floor&collections=" + collections,
                             {Bearer(), "Content-Type: application/octet-stream"},
                             &body,
-                            201});
+                            201,
+                            ""});
     return wholebench::RunFloor(requests, kParallel);
 }
 
