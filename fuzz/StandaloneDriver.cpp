@@ -6,6 +6,7 @@
 //   NAME_smoke SECONDS SEED_DIRECTORY
 
 #include <chrono>
+#include <csignal>
 #include <cstdint>
 #include <cstdio>
 #include <cstdlib>
@@ -15,6 +16,8 @@
 #include <random>
 #include <string>
 #include <vector>
+
+#include <unistd.h>
 
 extern "C" int LLVMFuzzerTestOneInput(const std::uint8_t* data, std::size_t size);
 
@@ -64,9 +67,31 @@ std::string RandomText(std::mt19937& random)
     return text;
 }
 
+// The input being run, shown if it brings the process down.
+const std::string* sCurrent = nullptr;
+
+void ShowInputAndDie(int signal)
+{
+    static const char kHeader[] = "\nfuzz smoke: the input that failed, in hex:\n";
+    if (write(2, kHeader, sizeof kHeader - 1) < 0) _exit(1);
+    static const char kDigits[] = "0123456789abcdef";
+    if (sCurrent != nullptr) {
+        for (unsigned char c : *sCurrent) {
+            const char pair[2] = {kDigits[c >> 4], kDigits[c & 15]};
+            if (write(2, pair, 2) < 0) _exit(1);
+        }
+    }
+    if (write(2, "\n", 1) < 0) _exit(1);
+    std::signal(signal, SIG_DFL);
+    std::raise(signal);
+}
+
 int Run(const std::string& input)
 {
-    return LLVMFuzzerTestOneInput(reinterpret_cast<const std::uint8_t*>(input.data()), input.size());
+    sCurrent = &input;
+    const int result = LLVMFuzzerTestOneInput(reinterpret_cast<const std::uint8_t*>(input.data()), input.size());
+    sCurrent = nullptr;
+    return result;
 }
 
 }  // namespace
@@ -77,6 +102,7 @@ int main(int argc, char** argv)
         std::fprintf(stderr, "usage: %s SECONDS SEED_DIRECTORY\n", argv[0]);
         return 2;
     }
+    for (int signal : {SIGABRT, SIGSEGV, SIGBUS, SIGFPE}) std::signal(signal, ShowInputAndDie);
     const auto until = std::chrono::steady_clock::now() + std::chrono::seconds(std::atoi(argv[1]));
     const std::vector<std::string> seeds = ReadSeeds(argv[2]);
     for (const std::string& seed : seeds) Run(seed);

@@ -12,7 +12,7 @@ namespace server {
 
 std::shared_ptr<const FaultHandle> FaultHooks::Install(const FaultRule& rule)
 {
-    Entry entry{rule, std::regex(rule.mPathPattern), std::make_shared<FaultHandle>()};
+    Entry entry{rule, std::regex(rule.mPathPattern), std::regex(rule.mQueryPattern), std::make_shared<FaultHandle>()};
     std::lock_guard<std::mutex> lock(mMutex);
     mEntries.push_back(entry);
     return entry.mHandle;
@@ -24,13 +24,15 @@ void FaultHooks::Clear()
     mEntries.clear();
 }
 
-boost::optional<FaultRule> FaultHooks::Match(const std::string& method, const std::string& path)
+boost::optional<FaultRule> FaultHooks::Match(const std::string& method, const std::string& path,
+                                             const std::string& query)
 {
     std::lock_guard<std::mutex> lock(mMutex);
     boost::optional<FaultRule> chosen;
     for (Entry& entry : mEntries) {
         if (!entry.mRule.mMethod.empty() && entry.mRule.mMethod != method) continue;
         if (!std::regex_match(path, entry.mPattern)) continue;
+        if (!entry.mRule.mQueryPattern.empty() && !std::regex_search(query, entry.mQuery)) continue;
         const int seen = ++entry.mHandle->mSeen;
         if (seen == entry.mRule.mNth && !chosen) {
             entry.mHandle->mFired = true;

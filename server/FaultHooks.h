@@ -30,7 +30,10 @@ enum FaultAction {
 struct FaultRule {
     std::string mMethod;       // "GET", "POST", ...; empty matches every method
     std::string mPathPattern;  // ECMAScript regular expression over the whole path
-    int mNth = 1;              // 1 is the first matching request after install
+    // ECMAScript regular expression searched for in the raw query text (what
+    // follows "?"); empty matches every query, none included.
+    std::string mQueryPattern;
+    int mNth = 1;  // 1 is the first matching request after install
     FaultAction mAction = FaultAction_Status;
     int mStatus = 500;
     std::string mBody = "injected failure";
@@ -55,12 +58,14 @@ public:
     void Clear();
     // The rule that fires for this request, if any; counts the request
     // against every rule it matches. One request meets at most one fault.
-    boost::optional<FaultRule> Match(const std::string& method, const std::string& path);
+    boost::optional<FaultRule> Match(const std::string& method, const std::string& path,
+                                     const std::string& query = std::string());
 
 private:
     struct Entry {
         FaultRule mRule;
         std::regex mPattern;
+        std::regex mQuery;
         std::shared_ptr<FaultHandle> mHandle;
     };
     std::mutex mMutex;  // guards mEntries

@@ -71,7 +71,9 @@ void LocalService::Start()
     // Faults apply once the body is read, so an answer never leaves unread
     // bytes on a kept-alive connection.
     const auto handler = [this](const httplib::Request& request, httplib::Response& response) {
-        const boost::optional<FaultRule> fault = mFaults.Match(request.method, request.path);
+        const std::size_t question = request.target.find('?');
+        const std::string query = question == std::string::npos ? std::string() : request.target.substr(question + 1);
+        const boost::optional<FaultRule> fault = mFaults.Match(request.method, request.path, query);
         if (fault && ApplyFault(*fault, request, response)) return;
         Serve(request, response);
     };

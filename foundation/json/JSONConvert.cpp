@@ -1,5 +1,7 @@
 #include "foundation/json/JSONConvert.h"
 
+#include <stdexcept>
+
 #include <boost/date_time/posix_time/posix_time.hpp>
 
 namespace tolmocore {
@@ -117,9 +119,8 @@ Guid JSONConvert<Guid>::FromJSON(const boost::any& value)
 template <>
 boost::any JSONConvert<ptime>::ToJSON(const ptime& value)
 {
-    return boost::any(value.is_not_a_date_time()
-                          ? UTF8String()
-                          : UTF8String(boost::posix_time::to_simple_string(value)));
+    return boost::any(value.is_not_a_date_time() ? UTF8String()
+                                                 : UTF8String(boost::posix_time::to_simple_string(value)));
 }
 
 template <>
@@ -127,7 +128,14 @@ ptime JSONConvert<ptime>::FromJSON(const boost::any& value)
 {
     const UTF8String& text = boost::any_cast<const UTF8String&>(value);
     if (text.empty()) return ptime(boost::posix_time::not_a_date_time);
-    return boost::date_time::parse_delimited_time<ptime>(text.ToStdString(), ' ');
+    const ptime parsed = boost::date_time::parse_delimited_time<ptime>(text.ToStdString(), ' ');
+    // A time of day of many hours pushes the value out of the range of dates:
+    // it then throws when printed, or prints as another value. Only a value
+    // that reads back the same from its own print is taken.
+    if (parsed.is_special() ||
+        boost::date_time::parse_delimited_time<ptime>(boost::posix_time::to_simple_string(parsed), ' ') != parsed)
+        throw std::out_of_range("not a date and time: " + text.ToStdString());
+    return parsed;
 }
 
 }  // namespace serialization

@@ -96,13 +96,15 @@ TEST_F(CacheFileTest, BadFilesAreTracedAndIgnoredAndLeftInPlace)
         "mCachedServerEtag":"e","mCachedServerModDate":"2024-May-06 07:08:09","mCachedLocalModDate":"",
         "mCachedLocalChecksum":"00000000-0000-0000-0000-000000000000"}])";
     const std::vector<std::string> bad = {
-        good.substr(0, good.size() / 2),                        // truncated
-        R"({"mName":"a.xmp"})",                                 // not an array
-        R"([{"mName":"a.xmp","mCachedServerEtag":7}])",          // not a string
-        R"([{"mName":"a.xmp","mCachedLocalChecksum":"ABC"}])",   // identifier of the wrong length
-        R"([{"mName":"a.xmp","mCachedServerModDate":"soon"}])",  // no date
-        std::string("\xFF\xFE[", 3),                             // not text
-        std::string(200000, '['),                                // nested past any sane depth
+        good.substr(0, good.size() / 2),                                         // truncated
+        R"({"mName":"a.xmp"})",                                                  // not an array
+        R"([{"mName":"a.xmp","mCachedServerEtag":7}])",                          // not a string
+        R"([{"mName":"a.xmp","mCachedLocalChecksum":"ABC"}])",                   // identifier of the wrong length
+        R"([{"mName":"a.xmp","mCachedServerModDate":"soon"}])",                  // no date
+        R"([{"mName":"a.xmp","mCachedServerModDate":"9999-Dec-31 48:00:00"}])",  // reads past year 9999
+        R"([{"mName":"a.xmp","mCachedServerModDate":"4084-May-06 000000557100000-"}])",  // wraps out of range
+        std::string("\xFF\xFE[", 3),                                                     // not text
+        std::string(200000, '['),                                                        // nested past any sane depth
     };
     for (const std::string& text : bad) {
         WriteFileBytes(CacheFilePath(), text);
