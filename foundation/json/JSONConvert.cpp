@@ -1,5 +1,6 @@
 #include "foundation/json/JSONConvert.h"
 
+#include <regex>
 #include <stdexcept>
 
 #include <boost/date_time/posix_time/posix_time.hpp>
@@ -128,6 +129,11 @@ ptime JSONConvert<ptime>::FromJSON(const boost::any& value)
 {
     const UTF8String& text = boost::any_cast<const UTF8String&>(value);
     if (text.empty()) return ptime(boost::posix_time::not_a_date_time);
+    // Only the form this conversion writes reaches the date library's parser,
+    // which overflows inside on some malformed times.
+    static const std::regex kSimpleForm(R"(\d{4}-[A-Z][a-z]{2}-\d{2} \d{2}:\d{2}:\d{2}(\.\d{1,9})?)");
+    if (!std::regex_match(text.ToStdString(), kSimpleForm))
+        throw std::out_of_range("not a date and time: " + text.ToStdString());
     const ptime parsed = boost::date_time::parse_delimited_time<ptime>(text.ToStdString(), ' ');
     // A time of day of many hours pushes the value out of the range of dates:
     // it then throws when printed, or prints as another value. Only a value

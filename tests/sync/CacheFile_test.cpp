@@ -102,9 +102,10 @@ TEST_F(CacheFileTest, BadFilesAreTracedAndIgnoredAndLeftInPlace)
         R"([{"mName":"a.xmp","mCachedLocalChecksum":"ABC"}])",                   // identifier of the wrong length
         R"([{"mName":"a.xmp","mCachedServerModDate":"soon"}])",                  // no date
         R"([{"mName":"a.xmp","mCachedServerModDate":"9999-Dec-31 48:00:00"}])",  // reads past year 9999
-        R"([{"mName":"a.xmp","mCachedServerModDate":"4084-May-06 000000557100000-"}])",  // wraps out of range
-        std::string("\xFF\xFE[", 3),                                                     // not text
-        std::string(200000, '['),                                                        // nested past any sane depth
+        R"([{"mName":"a.xmp","mCachedServerModDate":"4084-May-06 000000557100000-"}])",    // wraps out of range
+        R"([{"mName":"a.xmp","mCachedServerModDate":"2024-May-06 -0000-000/00000001"}])",  // not the written form
+        std::string("\xFF\xFE[", 3),                                                       // not text
+        std::string(200000, '['),                                                          // nested past any sane depth
     };
     for (const std::string& text : bad) {
         WriteFileBytes(CacheFilePath(), text);
