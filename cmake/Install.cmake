@@ -2,7 +2,7 @@
 # a CMake package (tolmonetsync::tolmonetsync) and a pkg-config file.
 include(CMakePackageConfigHelpers)
 
-foreach(dir foundation/core foundation/net foundation/json assets sync tarnvault identity)
+foreach(dir foundation/core foundation/net foundation/json foundation/ui foundation/tessel assets sync tarnvault identity)
   install(DIRECTORY ${PROJECT_SOURCE_DIR}/${dir}/
     DESTINATION ${CMAKE_INSTALL_INCLUDEDIR}/tolmonetsync/${dir}
     FILES_MATCHING PATTERN "*.h" PATTERN "*Private.h" EXCLUDE)
