@@ -25,6 +25,8 @@ const char kGlobalOptionsHelp[] =
     "                           keychain store\n"
     "  --company NAME --app NAME --app-version X.Y\n"
     "                           host identity (default Tolmonet, tolmonetsync, 1.0)\n"
+    "  --ca-file FILE           trust the certificates in this PEM file instead of the system's\n"
+    "                           (also TOLMONETSYNC_CA_FILE), for a service with its own certificate\n"
     "  --trace SPEC             as TOLMONETSYNC_TRACE; lines go to stderr\n"
     "  --json                   machine-readable results on stdout\n"
     "  -q, --quiet              print nothing but errors\n";
@@ -59,6 +61,10 @@ bool ReadGlobalOption(const std::vector<std::string>& arguments, std::size_t& in
         options.mApp = OptionValue(arguments, index);
     } else if (option == "--app-version") {
         options.mAppVersion = OptionValue(arguments, index);
+    } else if (option == "--ca-file") {
+        options.mCaFile = OptionValue(arguments, index);
+        if (!std::filesystem::is_regular_file(options.mCaFile))
+            throw UsageError("--ca-file: no such file " + options.mCaFile);
     } else if (option == "--trace") {
         options.mTrace = OptionValue(arguments, index);
     } else if (option == "--json") {
@@ -83,6 +89,8 @@ void ApplyGlobalOptions(GlobalOptions& options)
     if (!options.mPrefDir.empty())
         Dir::SetPrefDir(Dir(ToUTF16(std::filesystem::absolute(options.mPrefDir).lexically_normal().string())));
     if (!options.mTrace.empty()) tolmocore::debug::SetTraceSpec(options.mTrace);
+    if (!options.mCaFile.empty())
+        ::setenv("TOLMONETSYNC_CA_FILE", std::filesystem::absolute(options.mCaFile).string().c_str(), 1);
     if (!options.mIdentityServer.empty())
         SetOvraServiceURL(UTF8String(options.mIdentityServer.begin(), options.mIdentityServer.end()));
     if (options.mToken.empty()) {

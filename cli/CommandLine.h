@@ -25,6 +25,7 @@ struct GlobalOptions {
     std::string mApp = "tolmonetsync";
     std::string mAppVersion = "1.0";
     std::string mTrace;
+    std::string mCaFile;  // --ca-file: certificates to trust instead of the system's
     bool mJson = false;
     bool mQuiet = false;
     bool mHelp = false;
@@ -41,6 +42,8 @@ const std::string& OptionValue(const std::vector<std::string>& arguments, std::s
 
 // Sets the host identity, the preference directory and tracing from the
 // options, and the token from TOLMONETSYNC_TOKEN when --token was not given.
+// --ca-file becomes TOLMONETSYNC_CA_FILE, which the request processor reads
+// when it is made: call this before anything sends a request.
 void ApplyGlobalOptions(GlobalOptions& options);
 
 // Makes the preference directory if it is missing: the library keeps the

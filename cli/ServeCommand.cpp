@@ -16,7 +16,7 @@ namespace {
 
 const char kServeUsage[] =
     "usage: tolmonetsync serve --data DIR [--listen HOST:PORT] [--user NAME:PASSWORD[:EMAIL]]...\n"
-    "         [--token NAME:TOKEN]... [--token-ttl SECONDS] [--denied-user NAME]...\n";
+    "         [--token NAME:TOKEN]... [--token-ttl SECONDS] [--denied-user NAME]... [--cert FILE --key FILE]\n";
 const char kServeHelp[] =
     "\n"
     "Runs the local asset service (under /api) and identity service (under /ovra) in the foreground until SIGINT or "
@@ -28,7 +28,10 @@ const char kServeHelp[] =
     "  --token-ttl SECONDS access tokens expire after this long (the fixed ones too; signed-in\n"
     "                      ones after an hour without it)\n"
     "  --denied-user NAME  the user's sign-in is refused (access denied) even with the right password\n"
-    "The identity service is under /ovra. The first line on stdout is \"listening on http://HOST:PORT\".\n";
+    "  --cert FILE --key FILE   serve HTTPS with this certificate (chain) and private key, both PEM;\n"
+    "                      clients that do not trust its issuer take --ca-file FILE\n"
+    "The identity service is under /ovra. The first line on stdout is \"listening on http://HOST:PORT\"\n"
+    "(https with a certificate).\n";
 
 server::LocalServiceOptions ParseServe(GlobalOptions& globals, const std::vector<std::string>& arguments)
 {
@@ -46,6 +49,10 @@ server::LocalServiceOptions ParseServe(GlobalOptions& globals, const std::vector
             options.mTokenTtlSeconds = server::ParseSecondsArgument(value());
         } else if (option == "--denied-user") {
             options.mDeniedUsers.push_back(value());
+        } else if (option == "--cert") {
+            options.mCertificateFile = value();
+        } else if (option == "--key") {
+            options.mPrivateKeyFile = value();
         } else if (option == "--token") {
             // serve's own --token (NAME:TOKEN) comes before the global one.
             options.mTokens.push_back(server::ParseTokenArgument(value()));
@@ -54,6 +61,8 @@ server::LocalServiceOptions ParseServe(GlobalOptions& globals, const std::vector
         }
     }
     if (options.mDataDirectory.empty() && !globals.mHelp) throw UsageError("--data is required");
+    if (options.mCertificateFile.empty() != options.mPrivateKeyFile.empty())
+        throw UsageError("--cert and --key go together");
     return options;
 }
 
@@ -85,7 +94,8 @@ int RunServe(GlobalOptions globals, const std::vector<std::string>& arguments)
     try {
         server::LocalService service(options);
         service.Start();
-        std::cout << "listening on http://" << options.mHost << ":" << service.Port() << std::endl;
+        std::cout << "listening on " << (service.Secure() ? "https://" : "http://") << options.mHost << ":"
+                  << service.Port() << std::endl;
         int received = 0;
         sigwait(&stopSignals, &received);
         service.Stop();

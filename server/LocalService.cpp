@@ -57,7 +57,17 @@ LocalService::~LocalService()
 void LocalService::Start()
 {
     if (mServer) throw std::runtime_error("the service is running already");
-    auto server = std::make_unique<httplib::Server>();
+    std::unique_ptr<httplib::Server> server;
+    if (Secure()) {
+        auto secure =
+            std::make_unique<httplib::SSLServer>(mOptions.mCertificateFile.c_str(), mOptions.mPrivateKeyFile.c_str());
+        if (!secure->is_valid())
+            throw std::runtime_error("cannot serve HTTPS with the certificate " + mOptions.mCertificateFile +
+                                     " and the key " + mOptions.mPrivateKeyFile);
+        server = std::move(secure);
+    } else {
+        server = std::make_unique<httplib::Server>();
+    }
     const int workers = mOptions.mWorkers;
     server->new_task_queue = [workers] { return new httplib::ThreadPool(static_cast<size_t>(workers)); };
     server->set_keep_alive_max_count(100000);
@@ -110,6 +120,11 @@ void LocalService::Stop()
     mServer.reset();
 }
 
+bool LocalService::Secure() const
+{
+    return !mOptions.mCertificateFile.empty() || !mOptions.mPrivateKeyFile.empty();
+}
+
 int LocalService::Port() const
 {
     return mPort;
@@ -117,12 +132,12 @@ int LocalService::Port() const
 
 std::string LocalService::AssetServiceUrl() const
 {
-    return "http://" + mOptions.mHost + ":" + std::to_string(mPort) + "/api";
+    return (Secure() ? "https://" : "http://") + mOptions.mHost + ":" + std::to_string(mPort) + "/api";
 }
 
 std::string LocalService::IdentityServiceUrl() const
 {
-    return "http://" + mOptions.mHost + ":" + std::to_string(mPort) + "/ovra";
+    return (Secure() ? "https://" : "http://") + mOptions.mHost + ":" + std::to_string(mPort) + "/ovra";
 }
 
 void LocalService::SetAnswerStyle(const AnswerStyle& style)

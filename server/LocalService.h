@@ -60,6 +60,10 @@ struct LocalServiceOptions {
     int mWorkers = 32;                  // each kept-alive connection holds one while it lasts
     // Users whose sign-in is refused with "access_denied_non_t1".
     std::vector<std::string> mDeniedUsers;
+    // Either given: HTTPS with this certificate chain and private key (PEM
+    // files), else plain HTTP.
+    std::string mCertificateFile;
+    std::string mPrivateKeyFile;
 };
 
 class LocalService {
@@ -71,14 +75,17 @@ public:
     LocalService(const LocalService&) = delete;
     LocalService& operator=(const LocalService&) = delete;
 
-    // Binds and starts serving; throws std::runtime_error if it cannot bind.
+    // Binds and starts serving; throws std::runtime_error if it cannot bind
+    // or cannot read the certificate and key it was given.
     void Start();
     void Stop();
 
     int Port() const;
-    // "http://127.0.0.1:PORT/api", the client's base URL.
+    // Whether it serves HTTPS.
+    bool Secure() const;
+    // "http://127.0.0.1:PORT/api" ("https" with a certificate), the client's base URL.
     std::string AssetServiceUrl() const;
-    // "http://127.0.0.1:PORT/ovra", the identity service's base URL.
+    // "http://127.0.0.1:PORT/ovra" (or "https"), the identity service's base URL.
     std::string IdentityServiceUrl() const;
 
     FaultHooks& Faults() { return mFaults; }

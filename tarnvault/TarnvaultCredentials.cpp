@@ -8,12 +8,12 @@
 #include "foundation/core/HostConfig.h"
 #include "foundation/core/Keychain.h"
 #include "foundation/net/HeaderConstants.h"
+#include "tarnvault/LastUserFile.h"
 #include "tarnvault/TarnvaultPrivate.h"
 
 namespace tolmonetsync {
 namespace tarnvault {
 
-namespace json = tolmocore::serialization;
 using tolmocore::Keychain;
 using tolmocore::filesupport::Dir;
 using tolmocore::filesupport::File;
@@ -54,10 +54,7 @@ OvraCredentials loadCredentials(const File& file)
             if (length >= kMaxJSONAnswer) throw OversizedAnswer(static_cast<std::size_t>(length));
             UTF8String text(static_cast<std::size_t>(length), 0);
             stream.ReadBlock(&text[0], static_cast<unsigned int>(length));
-            const boost::any parsed = json::JSONParse(text);
-            const json::JSONObject& object = boost::any_cast<const json::JSONObject&>(parsed);
-            const boost::shared_ptr<boost::any> userID = json::GetVariantInObject(object, "mUserID");
-            if (userID) credentials.userID = boost::any_cast<const UTF8String&>(*userID);
+            credentials.userID = ParseLastUserText(text);
         }
         credentials.accessToken = UTF16to8(Keychain::GetPassword(getKeyChainDomain(u"Access"), UTF8to16(credentials.userID)));
         credentials.refreshToken =
@@ -105,9 +102,7 @@ bool Tarnvault::SetCredentials(const ConnectionStateCallback& stateCallback, con
             const File file = getLastUserFile();
             file.Create(false);
             tolmocore::filesupport::OPlatformByteStream stream(file, 0);
-            boost::any object = json::JSONObject();
-            json::AddToObject(object, "mUserID", boost::any(credentials.userID));
-            const UTF8String text = json::GetJSONUTF8String(object, false);
+            const UTF8String text = FormatLastUserText(credentials.userID);
             stream.WriteBlock(text.data(), static_cast<unsigned int>(text.size()));
             Keychain::SetPassword(getKeyChainDomain(u"Access"), UTF8to16(credentials.userID),
                                   UTF8to16(credentials.accessToken));

@@ -82,7 +82,8 @@ Finished RunCli(const std::vector<std::string>& arguments, const std::vector<std
     return finished;
 }
 
-ServedService::ServedService(const std::filesystem::path& data, const std::string& token)
+ServedService::ServedService(const std::filesystem::path& data, const std::string& token,
+                             const std::vector<std::string>& moreOptions)
 {
     int pipeFds[2];
     if (pipe(pipeFds) != 0) throw std::runtime_error("pipe");
@@ -90,9 +91,10 @@ ServedService::ServedService(const std::filesystem::path& data, const std::strin
     posix_spawn_file_actions_init(&actions);
     posix_spawn_file_actions_adddup2(&actions, pipeFds[1], 1);
     posix_spawn_file_actions_addclose(&actions, pipeFds[0]);
-    mPid = Spawn({"serve", "--data", data.string(), "--listen", "127.0.0.1:0", "--user", "ann:secret", "--token",
-                  "ann:" + token},
-                 {}, actions);
+    std::vector<std::string> arguments = {"serve",  "--data",     data.string(), "--listen",    "127.0.0.1:0",
+                                          "--user", "ann:secret", "--token",     "ann:" + token};
+    arguments.insert(arguments.end(), moreOptions.begin(), moreOptions.end());
+    mPid = Spawn(arguments, {}, actions);
     posix_spawn_file_actions_destroy(&actions);
     close(pipeFds[1]);
     mOutput = fdopen(pipeFds[0], "r");

@@ -27,15 +27,17 @@ pid_t StartCli(const std::vector<std::string>& arguments, const std::string& out
 int WaitCli(pid_t pid);
 
 // `tolmonetsync serve` in the background on a free port, with one user and
-// one fixed token; stopped with SIGTERM on destruction.
+// one fixed token (and any further serve options); stopped with SIGTERM on
+// destruction.
 class ServedService {
 public:
-    ServedService(const std::filesystem::path& data, const std::string& token);
+    ServedService(const std::filesystem::path& data, const std::string& token,
+                  const std::vector<std::string>& moreOptions = {});
     ~ServedService();
     ServedService(const ServedService&) = delete;
     ServedService& operator=(const ServedService&) = delete;
 
-    // "http://127.0.0.1:PORT"
+    // "http://127.0.0.1:PORT" ("https" when serving with a certificate)
     const std::string& Base() const { return mBase; }
     std::string ApiUrl() const { return mBase + "/api"; }
     // Sends SIGTERM and gives the exit status.

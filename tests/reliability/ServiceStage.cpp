@@ -1,0 +1,225 @@
+#include "ServiceStage.h"
+
+#include <gtest/gtest.h>
+
+#include "foundation/core/HostConfig.h"
+#include "foundation/net/CurlRequestProcessor.h"
+#include "foundation/net/HeaderConstants.h"
+#include "server/Accounts.h"
+#include "server/AssetStore.h"
+#include "tarnvault/Tarnvault.h"
+
+namespace reliability {
+
+namespace fs = std::filesystem;
+using namespace tolmonetsync;
+using namespace tolmonetsync::server;
+using synctest::RunResult;
+using synctest::SyncHarness;
+using testsupport::ReadFileBytes;
+using testsupport::WriteFileBytes;
+
+namespace {
+
+const char kClient[] = "matrix";
+const char kRootName[] = "Co_Matrix_1.0";
+
+UTF8String Text(const char* text)
+{
+    return UTF8String(reinterpret_cast<const unsigned char*>(text));
+}
+
+SyncDir Registered(const fs::path& path, const char* group)
+{
+    return SyncDir(tolmocore::filesupport::Dir(tolmocore::utility::ToUTF16(path.string())), u".txt",
+                   tolmocore::utility::ToUTF16(group), ImmutableString::CreateStatic("text/plain"),
+                   SyncMetadata_ModDate, 1 << 20);
+}
+
+}  // namespace
+
+void UseStageHost()
+{
+    tolmocore::config::SetCompanyName(u"Co");
+    tolmocore::config::SetClientName(u"Matrix");
+    tolmocore::config::SetClientInternalVersion(u"1.0");
+    tolmonet::http::CurlRequestProcessor::SetProcessWideTimeouts(std::chrono::seconds(5), std::chrono::seconds(1));
+}
+
+void RestoreTimeouts()
+{
+    tolmonet::http::CurlRequestProcessor::SetProcessWideTimeouts(std::chrono::seconds(30), std::chrono::seconds(60));
+}
+
+std::unique_ptr<LocalService> StartStageService(const fs::path& dataDirectory)
+{
+    LocalServiceOptions options;
+    options.mDataDirectory = dataDirectory.string();
+    options.mTokens.push_back({"matrix", "tok"});
+    std::unique_ptr<LocalService> service(new LocalService(options));
+    service->Start();
+    return service;
+}
+
+Stage::Stage() : Stage(nullptr, kClient) {}
+
+Stage::Stage(LocalService& service, const std::string& clientId) : Stage(&service, clientId) {}
+
+Stage::Stage(LocalService* service, const std::string& clientId)
+    : mKeep(mRoot / "Keep"), mFresh(mRoot / "Fresh"), mClient(clientId)
+{
+    if (!service) {
+        mOwnService = StartStageService(mRoot / "service");
+        service = mOwnService.get();
+    }
+    mService = service;
+    mSeed.reset(new TreeSeeder(*mService, "matrix"));
+    fs::create_directories(mKeep);
+    fs::create_directories(mFresh);
+}
+
+Stage::~Stage()
+{
+    if (mOwnService) mOwnService->Stop();
+}
+
+boost::shared_ptr<SyncServer> Stage::Client()
+{
+    ParameterList parameters;
+    const std::string url = mApiUrl.empty() ? mService->AssetServiceUrl() : mApiUrl;
+    parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(url.begin(), url.end()));
+    parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, UTF8String(mClient.begin(), mClient.end()));
+    parameters.emplace_back(tolmonet::kHEADER_COOKIE, Text("tok"));
+    return boost::shared_ptr<SyncServer>(new tarnvault::Tarnvault(parameters));
+}
+
+RunResult Stage::Sync(bool withFresh)
+{
+    SyncHarness host(Client());
+    host.Service().RegisterSyncDirectory(Registered(mKeep, "Keep"));
+    if (withFresh) host.Service().RegisterSyncDirectory(Registered(mFresh, "Fresh"));
+    return host.Sync(SyncMode_TwoWay);
+}
+
+void Stage::PrepareEveryRequestKind()
+{
+    WriteFileBytes(mKeep / "k1.txt", "k1 old");
+    WriteFileBytes(mKeep / "k2.txt", "k2 old");
+    WriteFileBytes(mKeep / "k3.txt", "k3 old");
+    ASSERT_TRUE(Sync(false).Ok());
+    PutOnServer("Keep", "k1.txt", "k1 from the server");
+    WriteFileBytes(mKeep / "k2.txt", "k2 changed here");
+    AddStaleGroup();
+    WriteFileBytes(mFresh / "f1.txt", "f1 new");
+}
+
+void Stage::PutOnServer(const char* group, const std::string& name, const std::string& bytes)
+{
+    RemoveFromServer(group, name);
+    mService->Assets().Upload(Owner(), {GroupId(group)}, name, "text/plain", bytes);
+}
+
+void Stage::RemoveFromServer(const char* group, const std::string& name)
+{
+    for (const AssetRecord& member : mService->Assets().Members(Owner(), GroupId(group)))
+        if (member.mName == name) mService->Assets().Delete(Owner(), member.mId, false);
+}
+
+void Stage::AddStaleGroup()
+{
+    const std::string root = mSeed->Find(mSeed->ClientRoot(mClient), kRootName);
+    mSeed->Item(mSeed->Collection(root, "Stale"), "s.txt", "stale");
+}
+
+FileMap Stage::Local() const
+{
+    FileMap files;
+    for (const fs::path& dir : {mKeep, mFresh})
+        for (const auto& entry : fs::directory_iterator(dir))
+            if (entry.path().extension() == ".txt")
+                files[dir.filename().string() + "/" + entry.path().filename().string()] = ReadFileBytes(entry.path());
+    return files;
+}
+
+FileMap Stage::Server()
+{
+    FileMap files;
+    for (const char* group : {"Keep", "Fresh"}) {
+        const std::string id = GroupId(group);
+        if (id.empty()) continue;
+        for (const AssetRecord& member : mService->Assets().Members(Owner(), id)) {
+            AssetRecord record;
+            const std::string name = std::string(group) + "/" + member.mName;
+            if (!files.count(name)) files[name] = mService->Assets().Content(Owner(), member.mId, record);
+        }
+    }
+    return files;
+}
+
+std::set<std::string> Stage::BackupDirs() const
+{
+    std::set<std::string> names;
+    if (!fs::exists(mPrefs.Path() / "SyncBackup")) return names;
+    for (const auto& entry : fs::directory_iterator(mPrefs.Path() / "SyncBackup"))
+        names.insert(entry.path().filename().string());
+    return names;
+}
+
+FileMap Stage::Backups(const std::set<std::string>& skip) const
+{
+    FileMap files;
+    for (const std::string& dir : BackupDirs()) {
+        if (skip.count(dir)) continue;
+        for (const auto& entry : fs::recursive_directory_iterator(mPrefs.Path() / "SyncBackup" / dir))
+            if (entry.is_regular_file()) files[entry.path().filename().string()] += ReadFileBytes(entry.path()) + "|";
+    }
+    return files;
+}
+
+std::string Stage::CacheFile() const
+{
+    const fs::path path = mPrefs.Path() / "tolmonetsynccache.json";
+    return fs::exists(path) ? ReadFileBytes(path) : std::string("<none>");
+}
+
+std::int64_t Stage::Owner()
+{
+    return mService->GetAccounts().EnsureUser("matrix");
+}
+
+std::string Stage::GroupId(const char* group)
+{
+    const std::string root = mSeed->Find(mSeed->ClientRoot(mClient), kRootName);
+    return root.empty() ? std::string() : mSeed->Find(root, group);
+}
+
+void ExpectNothingLost(const FileMap& before, const FileMap& serverBefore, const FileMap& after, const FileMap& backups,
+                       const std::string& label)
+{
+    const auto backedUp = [&](const std::string& file, const std::string& bytes) {
+        const auto copies = backups.find(file.substr(file.find('/') + 1));
+        return copies != backups.end() && copies->second.find(bytes + "|") != std::string::npos;
+    };
+    for (const auto& file : before) {
+        const auto now = after.find(file.first);
+        const auto theirs = serverBefore.find(file.first);
+        if (now == after.end()) {
+            EXPECT_TRUE(theirs == serverBefore.end()) << label << ": " << file.first << " is gone";
+            EXPECT_TRUE(backedUp(file.first, file.second))
+                << label << ": " << file.first << " removed without a backup";
+            continue;
+        }
+        if (now->second == file.second) continue;
+        EXPECT_TRUE(theirs != serverBefore.end() && theirs->second == now->second)
+            << label << ": " << file.first << " torn";
+        EXPECT_TRUE(backedUp(file.first, file.second)) << label << ": " << file.first << " replaced without a backup";
+    }
+    for (const auto& file : after) {
+        if (before.count(file.first)) continue;
+        const auto theirs = serverBefore.find(file.first);
+        EXPECT_TRUE(theirs != serverBefore.end() && theirs->second == file.second)
+            << label << ": new " << file.first << " torn";
+    }
+}
+
+}  // namespace reliability
