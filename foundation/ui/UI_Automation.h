@@ -1,0 +1,31 @@
+#pragma once
+// Playing the user in tests. From any thread but the modal loop's own:
+// wait for a modal dialog, then run actions inside its loop, where the
+// Simulate... operations of dialogs and controls may be called and nodes read.
+// A time of -1 waits without limit.
+
+#include <boost/function.hpp>
+#include <boost/intrusive_ptr.hpp>
+
+#include "foundation/ui/UI_Dialog.h"
+
+namespace tolmoui {
+
+// The dialog of the innermost running modal loop whose close is not yet
+// posted, waiting until there is one; null on time-out.
+boost::intrusive_ptr<UI_Dialog> WaitForModalDialog(int milliseconds);
+
+// Runs `action` on the thread of the innermost modal loop, inside the loop,
+// and waits until it has run. False if no loop started it in time or the
+// loop ended first; `action` then never runs. Once started, it is waited for
+// to the end. Called on the loop's own thread, it runs `action` at once.
+// `action` must not throw.
+bool RunInModalLoop(const boost::function<void()>& action, int milliseconds);
+
+// How many modal loops run now.
+int ModalLoopDepth();
+// Waits until at least `depth` modal loops run (a nested dialog has come up);
+// false on time-out.
+bool WaitForModalLoopDepth(int depth, int milliseconds);
+
+}  // namespace tolmoui

@@ -1,0 +1,26 @@
+#include "foundation/ui/UI_TextEdit.h"
+
+namespace tolmoui {
+
+void UI_TextEdit::SetValue(const UTF16String& value, bool notify)
+{
+    mValue = value;
+    mSelection = {mValue.size(), mValue.size()};
+    if (notify) SendChanged();
+}
+
+UTF16String UI_TextEdit::GetDisplayedText() const
+{
+    if (!IsPassword()) return mValue;
+    return UTF16String(mValue.size(), u'\u2022');
+}
+
+bool UI_TextEdit::SimulateTyping(const UTF16String& newValue)
+{
+    if (IsDisabled()) return false;
+    mValue = newValue;
+    mSelection = {mValue.size(), mValue.size()};
+    return SimulateInteractiveChange(kInteractiveChange_Edit);
+}
+
+}  // namespace tolmoui

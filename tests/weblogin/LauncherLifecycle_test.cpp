@@ -1,0 +1,119 @@
+// The launcher's life: what the extension is told when it is ready, which
+// unloaded events end the launcher, and what a second sign-in finds.
+
+#include <boost/json.hpp>
+
+#include "WebSignInFixture.h"
+#include "foundation/tessel/RuvexEvent.h"
+
+namespace {
+
+using namespace weblogin;
+
+const std::string kUnloaded = ruvex::event::EVENT_TYPE_RUVEX_EXTENSION_UNLOADED;
+
+TEST_F(WebSignIn, TheExtensionIsToldWhereToSignIn)
+{
+    Extension(boost::none);
+    const std::pair<OvraAuth_Scheme, std::string> cases[] = {{OvraAuth_Stage, "stg1"}, {OvraAuth_GM, "prod"}};
+    int round = 0;
+    for (const auto& schemeAndEndpoint : cases) {
+        ++round;
+        SignInRun run(mRecorder, schemeAndEndpoint.first, "client-x", "de_DE");
+        ASSERT_TRUE(OpenAndInitialise(round));
+        const tessel::OwnedEvent sent = mExtension->Initializations().at(round - 1);
+        EXPECT_EQ(sent.Scope(), 1);
+        EXPECT_EQ(sent.AppId().value_or(""), "CINDERAL");
+        EXPECT_FALSE(sent.ExtensionId());
+
+        const boost::json::object json = boost::json::parse(sent.Data().value_or("")).as_object();
+        EXPECT_EQ(json.size(), 5u);
+        EXPECT_EQ(json.at("endpoint"), schemeAndEndpoint.second.c_str());
+        EXPECT_EQ(json.at("client_id"), "client-x");
+        EXPECT_EQ(json.at("scope"), "openid,HalvaneID,pellucid");
+        EXPECT_EQ(json.at("locale"), "de_DE");
+        EXPECT_EQ(json.at("force_reauth"), true);
+
+        ASSERT_TRUE(CloseByHand());
+        EXPECT_FALSE(run.Result());
+        ASSERT_TRUE(LauncherGoneAfter(*mExtension, round));
+    }
+    EXPECT_EQ(mExtension->Loads(), 2);
+}
+
+TEST_F(WebSignIn, OnlyAnUnloadedEventNamingTheExtensionEndsTheLauncher)
+{
+    Extension(TokenEvent("token-1", "user-1", "ann@example.test"), true);
+    SignInRun run(mRecorder);
+    ASSERT_TRUE(OpenAndInitialise());
+    ASSERT_TRUE(run.Result());
+    ASSERT_TRUE(mExtension->WaitForUnloads(1, kWaitMs));
+    const boost::shared_ptr<MerrowExtensionLauncher> launcher = CurrentMerrowExtensionLauncher();
+    ASSERT_TRUE(launcher);
+
+    tessel::SendHostEvent(kUnloaded, std::string("<ExtensionUnloaded><Id>com.example.other</Id></ExtensionUnloaded>"));
+    tessel::SendHostEvent(kUnloaded, std::string(kMerrowExtensionID));  // no tags
+    tessel::SendHostEvent(kUnloaded, std::string("<Id>") + kMerrowExtensionID);
+    tessel::SendHostEvent(kUnloaded, std::string(kMerrowExtensionID) + "</Id>");
+    tessel::SendHostEvent(kUnloaded, boost::none);
+    ASSERT_TRUE(tessel::FlushHost(kWaitMs));
+    EXPECT_EQ(CurrentMerrowExtensionLauncher(), launcher);
+
+    mExtension->ReleaseUnloaded();
+    ASSERT_TRUE(mExtension->WaitForUnloadedEvents(1, kWaitMs));
+    EXPECT_FALSE(CurrentMerrowExtensionLauncher());
+}
+
+TEST_F(WebSignIn, ASecondSignInAfterTheUnloadedEventMakesANewLauncher)
+{
+    Extension(TokenEvent("token-1", "user-1", "ann@example.test"));
+    {
+        SignInRun first(mRecorder);
+        ASSERT_TRUE(OpenAndInitialise(1));
+        ASSERT_TRUE(first.Result());
+    }
+    ASSERT_TRUE(LauncherGoneAfter(*mExtension, 1));
+
+    CredentialsRecorder second;
+    SignInRun run(second);
+    ASSERT_TRUE(OpenAndInitialise(2));
+    EXPECT_TRUE(run.Result());
+    EXPECT_EQ(mExtension->Loads(), 2);
+    EXPECT_EQ(second.Calls(), 1);
+    EXPECT_EQ(mRecorder.Calls(), 1);
+    EXPECT_TRUE(LauncherGoneAfter(*mExtension, 2));
+}
+
+TEST_F(WebSignIn, ASecondSignInBeforeTheUnloadedEventKeepsTheFirstLauncher)
+{
+    Extension(TokenEvent("token-1", "user-1", "ann@example.test"), true);
+    boost::intrusive_ptr<tolmoui::UI_Dialog> firstDialog;
+    {
+        SignInRun first(mRecorder);
+        firstDialog = OpenAndInitialise(1);
+        ASSERT_TRUE(firstDialog);
+        ASSERT_TRUE(first.Result());
+    }
+    const boost::shared_ptr<MerrowExtensionLauncher> launcher = CurrentMerrowExtensionLauncher();
+    ASSERT_TRUE(launcher);
+
+    CredentialsRecorder second;
+    SignInRun run(second);
+    const auto secondDialog = WaitForSignInDialog();
+    ASSERT_TRUE(secondDialog);
+    EXPECT_NE(secondDialog, firstDialog);
+    EXPECT_EQ(CurrentMerrowExtensionLauncher(), launcher);
+    EXPECT_EQ(launcher->dialog, firstDialog);
+    ASSERT_TRUE(tessel::FlushHost(kWaitMs));
+    EXPECT_EQ(mExtension->Loads(), 1);  // the extension was not loaded again
+
+    // Only the hand closes it, and Execute reads the kept launcher's result.
+    ASSERT_TRUE(CloseByHand());
+    EXPECT_TRUE(run.Result());
+    EXPECT_EQ(second.Calls(), 0);
+
+    mExtension->ReleaseUnloaded();
+    EXPECT_TRUE(LauncherGoneAfter(*mExtension, 1));
+}
+
+}  // namespace

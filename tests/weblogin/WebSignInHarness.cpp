@@ -1,0 +1,214 @@
+#include "WebSignInHarness.h"
+
+#include <chrono>
+
+#include <boost/json.hpp>
+
+#include "foundation/net/HeaderConstants.h"
+#include "foundation/tessel/TesselHost.h"
+#include "identity/OvraAuth.h"
+
+namespace weblogin {
+
+std::string Text(const UTF8String& text)
+{
+    return text.ToStdString();
+}
+
+UTF8String Text(const std::string& text)
+{
+    return UTF8String(text);
+}
+
+boost::shared_ptr<tessel::ScriptedExtension> RegisterSignInExtension(const boost::optional<std::string>& answer,
+                                                                     bool holdUnloaded, bool readyOnLoad)
+{
+    tessel::ExtensionScript script;
+    script.mReadyEventType = kMerrowEventReadyForInitialization;
+    script.mReadyOnLoad = readyOnLoad;
+    script.mInitializationEventType = kMerrowEventInitialization;
+    script.mAnswerEventType = kMerrowEventAuthorizationToken;
+    script.mAnswerData = answer;
+    script.mHoldUnloaded = holdUnloaded;
+    return tessel::ScriptedExtension::Register(kMerrowExtensionID, script);
+}
+
+std::string TokenEvent(const std::string& token, const std::string& userID, const std::string& email)
+{
+    boost::json::object event{{"token", token}, {"userID", userID}};
+    if (!email.empty()) event["email"] = email;
+    return boost::json::serialize(event);
+}
+
+MerrowCredentialsCallback CredentialsRecorder::Callback()
+{
+    return [this](const OvraCredentials credentials) {
+        const bool onHost = tessel::TesselHost::Get().OnHostThread();
+        {
+            std::lock_guard<std::mutex> lock(mMutex);
+            ++mCalls;
+            mLast = credentials;
+            mLastThread = std::this_thread::get_id();
+            mLastOnHostThread = onHost;
+        }
+        mCalled.notify_all();
+    };
+}
+
+bool CredentialsRecorder::WaitForCalls(int count, int milliseconds)
+{
+    std::unique_lock<std::mutex> lock(mMutex);
+    return mCalled.wait_for(lock, std::chrono::milliseconds(milliseconds), [&] { return mCalls >= count; });
+}
+
+int CredentialsRecorder::Calls()
+{
+    std::lock_guard<std::mutex> lock(mMutex);
+    return mCalls;
+}
+
+OvraCredentials CredentialsRecorder::Last()
+{
+    std::lock_guard<std::mutex> lock(mMutex);
+    return mLast;
+}
+
+std::thread::id CredentialsRecorder::LastThread()
+{
+    std::lock_guard<std::mutex> lock(mMutex);
+    return mLastThread;
+}
+
+bool CredentialsRecorder::LastOnExtensionHostThread()
+{
+    std::lock_guard<std::mutex> lock(mMutex);
+    return mLastOnHostThread;
+}
+
+SignInRun::SignInRun(CredentialsRecorder& recorder, OvraAuth_Scheme scheme, const std::string& clientID,
+                     const std::string& locale)
+{
+    const MerrowCredentialsCallback callback = recorder.Callback();
+    mThread = std::thread([this, callback, scheme, clientID, locale] {
+        mResult = DoMerrowLoginDialog(nullptr, nullptr, Text(clientID), callback, Text(locale), scheme);
+    });
+}
+
+SignInRun::~SignInRun()
+{
+    // A test that failed half way still ends its dialog.
+    if (!mJoined) {
+        CloseByHand();
+        mThread.join();
+    }
+}
+
+bool SignInRun::Result()
+{
+    if (!mJoined) {
+        mThread.join();
+        mJoined = true;
+    }
+    return mResult;
+}
+
+boost::intrusive_ptr<MerrowLoginDialogImpl> WaitForSignInDialog()
+{
+    const boost::intrusive_ptr<tolmoui::UI_Dialog> dialog = tolmoui::WaitForModalDialog(kWaitMs);
+    return boost::intrusive_ptr<MerrowLoginDialogImpl>(dynamic_cast<MerrowLoginDialogImpl*>(dialog.get()));
+}
+
+bool CloseByHand()
+{
+    const boost::intrusive_ptr<tolmoui::UI_Dialog> dialog = tolmoui::WaitForModalDialog(kWaitMs);
+    if (!dialog) return false;
+    return tolmoui::RunInModalLoop([dialog] { dialog->SimulateUserClose(); }, kWaitMs);
+}
+
+bool LauncherGoneAfter(const tessel::ScriptedExtension& extension, int unloadedEvents)
+{
+    return extension.WaitForUnloadedEvents(unloadedEvents, kWaitMs) && !CurrentMerrowExtensionLauncher();
+}
+
+LocalIdentity::LocalIdentity()
+{
+    server::LocalServiceOptions options;
+    options.mDataDirectory = mData.Path().string();
+    options.mUsers = {{"ann", "secret", "ann@example.test"}};
+    mService.reset(new server::LocalService(options));
+    mService->Start();
+    SetOvraServiceURL(Text(mService->IdentityServiceUrl()));
+}
+
+LocalIdentity::~LocalIdentity()
+{
+    mService->Stop();
+    SetOvraServiceURL(UTF8String());
+}
+
+std::string LocalIdentity::SignInToken()
+{
+    auto done = std::make_shared<std::pair<std::mutex, std::condition_variable> >();
+    auto token = std::make_shared<boost::optional<std::string> >();
+    const Guid sent = OvraAuthenticate(
+        OvraAuth_GM,
+        [done, token](OvraAuth_Scheme, const OvraResponse& answer, const boost::shared_ptr<tolmonet::Response>&) {
+            std::lock_guard<std::mutex> lock(done->first);
+            *token = Text(answer.access_token);
+            done->second.notify_all();
+        },
+        Text(std::string("ann")), Text(std::string("secret")), Text(std::string("device-1")), UTF8String(),
+        UTF8String(), UTF8String(), UTF8String(), UTF8String());
+    if (sent.IsNil()) return std::string();
+    std::unique_lock<std::mutex> lock(done->first);
+    done->second.wait_for(lock, std::chrono::milliseconds(kWaitMs), [&] { return bool(*token); });
+    return token->value_or(std::string());
+}
+
+boost::shared_ptr<tarnvault::Tarnvault> LocalIdentity::Client() const
+{
+    ParameterList parameters;
+    parameters.emplace_back(tolmonet::kHEADER_LOCATION, Text(mService->AssetServiceUrl()));
+    parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, Text(std::string("weblogin-tests")));
+    return boost::shared_ptr<tarnvault::Tarnvault>(new tarnvault::Tarnvault(parameters));
+}
+
+bool Connects(const boost::shared_ptr<tarnvault::Tarnvault>& client, const OvraCredentials& credentials)
+{
+    auto done = std::make_shared<std::pair<std::mutex, std::condition_variable> >();
+    auto state = std::make_shared<SyncServer_ConnectionState>(SyncServer_Unknown);
+    if (!client->SetCredentials(
+            [done, state](SyncServer_ConnectionState now) {
+                std::lock_guard<std::mutex> lock(done->first);
+                *state = now;
+                done->second.notify_all();
+            },
+            credentials))
+        return false;
+    std::unique_lock<std::mutex> lock(done->first);
+    done->second.wait_for(lock, std::chrono::milliseconds(kWaitMs), [&] { return *state != SyncServer_Unknown; });
+    return *state == SyncServer_Connected;
+}
+
+int RootStatus(const boost::shared_ptr<tarnvault::Tarnvault>& client)
+{
+    auto done = std::make_shared<std::pair<std::mutex, std::condition_variable> >();
+    auto status = std::make_shared<int>(0);
+    client->GetRootAsync(
+        [done, status](const Guid&, const boost::shared_ptr<Collection>&) {
+            std::lock_guard<std::mutex> lock(done->first);
+            *status = 200;
+            done->second.notify_all();
+        },
+        [done, status](const Guid&, const boost::shared_ptr<tolmonet::Response>& response) {
+            std::lock_guard<std::mutex> lock(done->first);
+            *status = response ? response->status : -1;
+            done->second.notify_all();
+        },
+        Guid::CreateUnique());
+    std::unique_lock<std::mutex> lock(done->first);
+    done->second.wait_for(lock, std::chrono::milliseconds(kWaitMs), [&] { return *status != 0; });
+    return *status;
+}
+
+}  // namespace weblogin
