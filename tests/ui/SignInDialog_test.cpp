@@ -18,7 +18,7 @@ const char kFailedText[] =
 class SignInDialog : public ::testing::Test {
 protected:
     testsupport::PrefDirScope mPrefs;
-    SignInService mService;
+    idtest::IdentityService mService;
 };
 
 TEST_F(SignInDialog, TheRightPasswordSignsInAndTheClientReachesItsRoot)
@@ -34,7 +34,7 @@ TEST_F(SignInDialog, TheRightPasswordSignsInAndTheClientReachesItsRoot)
     }));
     EXPECT_TRUE(run.Finish());
     EXPECT_EQ(ToNarrow(run.Arguments().userName), "ann");
-    EXPECT_EQ(RootStatus(client), 200);
+    EXPECT_EQ(idtest::RootStatus(client), 200);
 }
 
 TEST_F(SignInDialog, AWrongPasswordShowsTheServicesTextAndTheNextTryGetsIn)
@@ -50,14 +50,14 @@ TEST_F(SignInDialog, AWrongPasswordShowsTheServicesTextAndTheNextTryGetsIn)
         EXPECT_EQ(ToNarrow(MessageText(box)), kFailedText);
         EXPECT_TRUE(box.IsInModalLoop());
     }));
-    EXPECT_EQ(RootStatus(client), 401);  // no token yet
+    EXPECT_EQ(idtest::RootStatus(client), 401);  // no token yet
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
         Edit(box, "PasswordTextEdit")->SimulateTyping(UTF16String(u"secret"));
         EXPECT_EQ(ToNarrow(MessageText(box)), "Sign in with your Halvane ID.");
         box.SimulateButtonPress(kDialogResponse_OK);
     }));
     EXPECT_TRUE(run.Finish());
-    EXPECT_EQ(RootStatus(client), 200);
+    EXPECT_EQ(idtest::RootStatus(client), 200);
 }
 
 }  // namespace

@@ -43,8 +43,8 @@ TEST_F(WebSignIn, AReadyEventRightAfterTheLoadStillGetsTheInitialisation)
 
 TEST_F(WebSignIn, ATokenWithoutAnEmailTakesTheEmailFromTheProfile)
 {
-    LocalIdentity identity;
-    const std::string token = identity.SignInToken();
+    idtest::IdentityService identity;
+    const std::string token = SignInToken(identity);
     ASSERT_FALSE(token.empty());
     Extension(TokenEvent(token, "user-1", ""));
     SignInRun run(mRecorder);
@@ -66,8 +66,8 @@ TEST_F(WebSignIn, ATokenWithoutAnEmailTakesTheEmailFromTheProfile)
 
 TEST_F(WebSignIn, AProfileWithoutAnEmailGivesEmptyCredentialsAndClosesUnsuccessfully)
 {
-    LocalIdentity identity;
-    const std::string token = identity.SignInToken();
+    idtest::IdentityService identity;
+    const std::string token = SignInToken(identity);
     ASSERT_FALSE(token.empty());
     server::FaultRule noEmail;
     noEmail.mMethod = "GET";
@@ -88,7 +88,7 @@ TEST_F(WebSignIn, AProfileWithoutAnEmailGivesEmptyCredentialsAndClosesUnsuccessf
 
 TEST_F(WebSignIn, AFailedProfileRequestGivesEmptyCredentialsAndClosesUnsuccessfully)
 {
-    LocalIdentity identity;  // knows no such token: 401
+    idtest::IdentityService identity;  // knows no such token: 401
     Extension(TokenEvent("no-such-token", "user-1", ""));
     SignInRun run(mRecorder);
     ASSERT_TRUE(OpenAndInitialise());
@@ -147,8 +147,8 @@ TEST_F(WebSignIn, TheUserClosingTheDialogReturnsFalseWithoutCallingBack)
 TEST_F(WebSignIn, CredentialsFromTheWebFlowOpenTheAssetService)
 {
     testsupport::PrefDirScope prefs;
-    LocalIdentity identity;
-    const std::string token = identity.SignInToken();
+    idtest::IdentityService identity;
+    const std::string token = SignInToken(identity);
     ASSERT_FALSE(token.empty());
     Extension(TokenEvent(token, "user-1", ""));
     SignInRun run(mRecorder);
@@ -157,7 +157,7 @@ TEST_F(WebSignIn, CredentialsFromTheWebFlowOpenTheAssetService)
 
     const auto client = identity.Client();
     EXPECT_TRUE(Connects(client, mRecorder.Last()));
-    EXPECT_EQ(RootStatus(client), 200);
+    EXPECT_EQ(idtest::RootStatus(client), 200);
 }
 
 }  // namespace

@@ -130,85 +130,16 @@ bool LauncherGoneAfter(const tessel::ScriptedExtension& extension, int unloadedE
     return extension.WaitForUnloadedEvents(unloadedEvents, kWaitMs) && !CurrentMerrowExtensionLauncher();
 }
 
-LocalIdentity::LocalIdentity()
+std::string SignInToken(idtest::IdentityService& service)
 {
-    server::LocalServiceOptions options;
-    options.mDataDirectory = mData.Path().string();
-    options.mUsers = {{"ann", "secret", "ann@example.test"}};
-    mService.reset(new server::LocalService(options));
-    mService->Start();
-    SetOvraServiceURL(Text(mService->IdentityServiceUrl()));
-}
-
-LocalIdentity::~LocalIdentity()
-{
-    mService->Stop();
-    SetOvraServiceURL(UTF8String());
-}
-
-std::string LocalIdentity::SignInToken()
-{
-    auto done = std::make_shared<std::pair<std::mutex, std::condition_variable> >();
-    auto token = std::make_shared<boost::optional<std::string> >();
-    const Guid sent = OvraAuthenticate(
-        OvraAuth_GM,
-        [done, token](OvraAuth_Scheme, const OvraResponse& answer, const boost::shared_ptr<tolmonet::Response>&) {
-            std::lock_guard<std::mutex> lock(done->first);
-            *token = Text(answer.access_token);
-            done->second.notify_all();
-        },
-        Text(std::string("ann")), Text(std::string("secret")), Text(std::string("device-1")), UTF8String(),
-        UTF8String(), UTF8String(), UTF8String(), UTF8String());
-    if (sent.IsNil()) return std::string();
-    std::unique_lock<std::mutex> lock(done->first);
-    done->second.wait_for(lock, std::chrono::milliseconds(kWaitMs), [&] { return bool(*token); });
-    return token->value_or(std::string());
-}
-
-boost::shared_ptr<tarnvault::Tarnvault> LocalIdentity::Client() const
-{
-    ParameterList parameters;
-    parameters.emplace_back(tolmonet::kHEADER_LOCATION, Text(mService->AssetServiceUrl()));
-    parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, Text(std::string("weblogin-tests")));
-    return boost::shared_ptr<tarnvault::Tarnvault>(new tarnvault::Tarnvault(parameters));
+    return Text(service.SignIn("ann", "secret").mAnswer.access_token);
 }
 
 bool Connects(const boost::shared_ptr<tarnvault::Tarnvault>& client, const OvraCredentials& credentials)
 {
-    auto done = std::make_shared<std::pair<std::mutex, std::condition_variable> >();
-    auto state = std::make_shared<SyncServer_ConnectionState>(SyncServer_Unknown);
-    if (!client->SetCredentials(
-            [done, state](SyncServer_ConnectionState now) {
-                std::lock_guard<std::mutex> lock(done->first);
-                *state = now;
-                done->second.notify_all();
-            },
-            credentials))
-        return false;
-    std::unique_lock<std::mutex> lock(done->first);
-    done->second.wait_for(lock, std::chrono::milliseconds(kWaitMs), [&] { return *state != SyncServer_Unknown; });
-    return *state == SyncServer_Connected;
-}
-
-int RootStatus(const boost::shared_ptr<tarnvault::Tarnvault>& client)
-{
-    auto done = std::make_shared<std::pair<std::mutex, std::condition_variable> >();
-    auto status = std::make_shared<int>(0);
-    client->GetRootAsync(
-        [done, status](const Guid&, const boost::shared_ptr<Collection>&) {
-            std::lock_guard<std::mutex> lock(done->first);
-            *status = 200;
-            done->second.notify_all();
-        },
-        [done, status](const Guid&, const boost::shared_ptr<tolmonet::Response>& response) {
-            std::lock_guard<std::mutex> lock(done->first);
-            *status = response ? response->status : -1;
-            done->second.notify_all();
-        },
-        Guid::CreateUnique());
-    std::unique_lock<std::mutex> lock(done->first);
-    done->second.wait_for(lock, std::chrono::milliseconds(kWaitMs), [&] { return *status != 0; });
-    return *status;
+    return idtest::WaitForState([&](const ConnectionStateCallback& callback) {
+               return client->SetCredentials(callback, credentials);
+           }) == SyncServer_Connected;
 }
 
 }  // namespace weblogin

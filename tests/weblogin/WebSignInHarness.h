@@ -1,8 +1,8 @@
 #pragma once
 // The web sign-in as a host drives it, for tests: a scripted sign-in
 // extension, a thread standing for the host's UI thread that runs the
-// dialog, a recorder of the credentials callback, and the local service for
-// the profile request and for proving the credentials.
+// dialog, a recorder of the credentials callback, and the local service's
+// tokens for the profile request and for proving the credentials.
 
 #include <condition_variable>
 #include <memory>
@@ -13,12 +13,11 @@
 #include <boost/optional.hpp>
 #include <boost/shared_ptr.hpp>
 
+#include "IdentityService.h"
 #include "foundation/tessel/TesselScriptedExtension.h"
 #include "foundation/ui/UI_Automation.h"
 #include "identity/dialogs/MerrowLoginDialog.h"
 #include "identity/dialogs/MerrowLoginDialogImpl.h"
-#include "server/LocalService.h"
-#include "support/TempDir.h"
 #include "tarnvault/Tarnvault.h"
 
 namespace weblogin {
@@ -84,26 +83,9 @@ bool CloseByHand();
 // the launcher is gone.
 bool LauncherGoneAfter(const tessel::ScriptedExtension& extension, int unloadedEvents);
 
-// The local service with ann:secret (ann@example.test), the identity calls
-// pointed at it.
-class LocalIdentity {
-public:
-    LocalIdentity();
-    ~LocalIdentity();
-    server::LocalService& Service() { return *mService; }
-    // A real access token of ann's.
-    std::string SignInToken();
-    // A client of the asset service as a host makes it, without a token.
-    boost::shared_ptr<tarnvault::Tarnvault> Client() const;
-
-private:
-    testsupport::TempDir mData;
-    std::unique_ptr<server::LocalService> mService;
-};
-
+// A real access token of ann's from the local service (ann@example.test).
+std::string SignInToken(idtest::IdentityService& service);
 // SetCredentials on the client; true once it reports a connection.
 bool Connects(const boost::shared_ptr<tarnvault::Tarnvault>& client, const OvraCredentials& credentials);
-// A root request with the client's token: the service's answer status.
-int RootStatus(const boost::shared_ptr<tarnvault::Tarnvault>& client);
 
 }  // namespace weblogin
