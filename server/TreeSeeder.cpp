@@ -40,6 +40,17 @@ std::string TreeSeeder::Find(const std::string& collectionId, const std::string&
     return std::string();
 }
 
+std::map<std::string, std::string> TreeSeeder::Contents(const std::string& collectionId)
+{
+    std::map<std::string, std::string> contents;
+    for (const AssetRecord& member : mService.Assets().Members(mOwner, collectionId)) {
+        if (member.mCollection || contents.count(member.mName) != 0) continue;
+        AssetRecord record;
+        contents[member.mName] = mService.Assets().Content(mOwner, member.mId, record);
+    }
+    return contents;
+}
+
 std::string TreeSeeder::Describe(const std::string& collectionId)
 {
     std::string out;

@@ -13,6 +13,7 @@
 // comparing trees before and after.
 
 #include <cstdint>
+#include <map>
 #include <string>
 
 #include "server/AssetRecord.h"
@@ -36,6 +37,9 @@ public:
                      const std::string& contentType = kMediaDefaultContent);
     // The first member of that name, or empty text.
     std::string Find(const std::string& collectionId, const std::string& name);
+    // The items directly inside the collection, name -> bytes; of several of
+    // one name the first, as a client reading them by name finds it.
+    std::map<std::string, std::string> Contents(const std::string& collectionId);
     // One line per asset below the collection, depth-first, siblings in name
     // order (so that trees copied in any order compare equal), indented two
     // spaces a level: "name/" for a collection, "name (type): bytes" for an item.

@@ -16,9 +16,8 @@
 #include <vector>
 
 #include "CliProcess.h"
-#include "server/Accounts.h"
-#include "server/AssetStore.h"
 #include "server/LocalService.h"
+#include "server/TreeSeeder.h"
 #include "support/TempDir.h"
 
 namespace {
@@ -109,19 +108,11 @@ protected:
     // The user's group on the service: each name's item and its bytes.
     Contents ServerContents(const Computer& computer)
     {
-        Contents contents;
-        AssetStore& store = mService->Assets();
-        const std::int64_t owner = mService->GetAccounts().EnsureUser(computer.mUser);
+        TreeSeeder seed(*mService, computer.mUser);
         // The command's defaults: client "tolmonetsync", host Tolmonet tolmonetsync 1.0.
-        const std::string root =
-            MemberNamed(owner, store.ClientRoot(owner, "tolmonetsync").mId, "Tolmonet_tolmonetsync_1.0");
-        const std::string group = root.empty() ? std::string() : MemberNamed(owner, root, kGroup);
-        if (group.empty()) return contents;
-        for (const AssetRecord& member : store.Members(owner, group)) {
-            AssetRecord record;
-            if (!member.mCollection) contents[member.mName] = store.Content(owner, member.mId, record);
-        }
-        return contents;
+        const std::string root = seed.Find(seed.ClientRoot("tolmonetsync"), "Tolmonet_tolmonetsync_1.0");
+        const std::string group = root.empty() ? std::string() : seed.Find(root, kGroup);
+        return group.empty() ? Contents() : seed.Contents(group);
     }
 
     // Each folder holds what is expected of it, and its user's group the same.
@@ -144,14 +135,6 @@ protected:
     std::vector<Computer> mComputers;
     std::unique_ptr<LocalService> mService;
     std::shared_ptr<const FaultHandle> mCounter;
-
-private:
-    std::string MemberNamed(std::int64_t owner, const std::string& collection, const std::string& name)
-    {
-        for (const AssetRecord& member : mService->Assets().Members(owner, collection))
-            if (member.mName == name) return member.mId;
-        return std::string();
-    }
 };
 
 std::string FileName(int index)
@@ -217,11 +200,9 @@ TEST_F(ServiceLoad, SixteenUsersSyncTheirOwnFoldersAtOnceRoundAfterRoundAndLoseN
 TEST_F(ServiceLoad, ManyConnectionsReadingAtOnceGetNoErrors)
 {
     const Computer& reader = mComputers.front();
-    const std::int64_t owner = mService->GetAccounts().EnsureUser(reader.mUser);
-    AssetStore& store = mService->Assets();
-    const AssetRecord item =
-        store.Upload(owner, {store.ClientRoot(owner, "tolmonetsync").mId}, "read.txt", "text/plain", "read me\n");
-    const std::string url = mService->AssetServiceUrl() + "/assets/" + item.mId + "/metadata";
+    TreeSeeder seed(*mService, reader.mUser);
+    const std::string item = seed.Item(seed.ClientRoot("tolmonetsync"), "read.txt", "read me\n", "text/plain");
+    const std::string url = mService->AssetServiceUrl() + "/assets/" + item + "/metadata";
     const std::string command =
         "wrk -t2 -c32 -d3s --latency -H 'Authorization: Bearer " + reader.mToken + "' '" + url + "' 2>&1";
     FILE* pipe = ::popen(command.c_str(), "r");

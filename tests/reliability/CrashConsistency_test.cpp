@@ -21,6 +21,7 @@
 #include "server/Accounts.h"
 #include "server/AssetStore.h"
 #include "server/LocalService.h"
+#include "server/TreeSeeder.h"
 #include "support/TempDir.h"
 
 namespace {
@@ -52,6 +53,7 @@ public:
         mService.reset(new LocalService(options));
         mService->Start();
         mOwner = mService->GetAccounts().EnsureUser("crash");
+        mSeed.reset(new TreeSeeder(*mService, "crash"));
         // Counts every request; never fires.
         FaultRule counter;
         counter.mPathPattern = ".*";
@@ -66,42 +68,30 @@ public:
     // Each name's first item, as the client reads them.
     std::map<std::string, std::string> Items()
     {
-        std::map<std::string, std::string> items;
         const std::string group = GroupId();
-        if (group.empty()) return items;
-        for (const AssetRecord& member : Store().Members(mOwner, group)) {
-            if (member.mCollection || items.count(member.mName) != 0) continue;
-            AssetRecord record;
-            items[member.mName] = Store().Content(mOwner, member.mId, record);
-        }
-        return items;
+        return group.empty() ? std::map<std::string, std::string>() : mSeed->Contents(group);
     }
     // Replaces the item of that name, as another computer's upload would.
     void Put(const std::string& name, const std::string& bytes)
     {
         const std::string group = GroupId();
-        for (const AssetRecord& member : Store().Members(mOwner, group))
-            if (member.mName == name) Store().Delete(mOwner, member.mId, false);
-        Store().Upload(mOwner, {group}, name, "application/octet-stream", bytes);
+        AssetStore& store = mService->Assets();
+        for (const AssetRecord& member : store.Members(mOwner, group))
+            if (member.mName == name) store.Delete(mOwner, member.mId, false);
+        mSeed->Item(group, name, bytes);
     }
 
 private:
-    AssetStore& Store() { return mService->Assets(); }
-    std::string Member(const std::string& collection, const std::string& name)
-    {
-        for (const AssetRecord& member : Store().Members(mOwner, collection))
-            if (member.mName == name) return member.mId;
-        return std::string();
-    }
     // The command's defaults: client "tolmonetsync", host Tolmonet tolmonetsync 1.0.
     std::string GroupId()
     {
-        const std::string root = Member(Store().ClientRoot(mOwner, "tolmonetsync").mId, "Tolmonet_tolmonetsync_1.0");
-        return root.empty() ? std::string() : Member(root, kGroup);
+        const std::string root = mSeed->Find(mSeed->ClientRoot("tolmonetsync"), "Tolmonet_tolmonetsync_1.0");
+        return root.empty() ? std::string() : mSeed->Find(root, kGroup);
     }
 
     std::unique_ptr<LocalService> mService;
     std::int64_t mOwner = 0;
+    std::unique_ptr<TreeSeeder> mSeed;
     std::shared_ptr<const FaultHandle> mCounter;
 };
 
@@ -232,9 +222,10 @@ TEST_F(CrashConsistency, KilledSyncsLoseNothingAndTheNextOneConverges)
             ASSERT_EQ(server.count(file.first) ? server.at(file.first) : "<none>", file.second)
                 << "kill " << kill << ": " << file.first << " did not converge";
     }
-    std::printf("crash consistency: %d kills over syncs of %d files (%d requests each), %d of them inside a run; "
-                "after every one nothing was lost and the next sync converged\n",
-                kKills, kFiles, perSync, killed);
+    std::printf(
+        "crash consistency: %d kills over syncs of %d files (%d requests each), %d of them inside a run; "
+        "after every one nothing was lost and the next sync converged\n",
+        kKills, kFiles, perSync, killed);
     // Most kills must land inside a run, or the test proves little.
     EXPECT_GE(killed, kKills * 3 / 4);
 }
