@@ -7,11 +7,8 @@
 #include <thread>
 
 #include "foundation/core/Threads.h"
-#include "foundation/ui/OS_View.h"
 #include "foundation/ui/UI_Automation.h"
 #include "foundation/ui/UI_MessageBox.h"
-#include "foundation/ui/UI_NodeManager.h"
-#include "foundation/ui/UI_SubView.h"
 
 namespace {
 
@@ -191,67 +188,6 @@ TEST_F(DialogButtons, OKGoesThroughTheHookAndCancelDoesNot)
     ASSERT_TRUE(RunInModalLoop([&] { box->SimulateButtonPress(kDialogResponse_Cancel); }, kWaitMs));
     EXPECT_EQ(again.Join(), kDialogResponse_Cancel);
     EXPECT_EQ(asked, 2);
-}
-
-class NodeTree : public ::testing::Test {};
-
-TEST_F(NodeTree, GlobalRectanglesAddTheOriginsBelowTheWindow)
-{
-    boost::intrusive_ptr<UI_Dialog> dialog(new UI_Dialog(nullptr, UTF16String(u"d"), PointT<float>{0, 0},
-                                                         PointT<float>{800, 600}, false, nullptr, true, false, true,
-                                                         true, 0, 4, UI_Dialog::ViewContainerFactory()));
-    dialog->Center();
-    EXPECT_EQ(dialog->GetScreenPosition(), (PointT<float>{560, 240}));
-    EXPECT_EQ(dialog->UI_GetLocalRectF(), (RectT<float>{0, 0, 800, 600}));
-    EXPECT_FALSE(dialog->UI_IsShown());
-
-    boost::intrusive_ptr<UI_SubView> sub(new UI_SubView());
-    dialog->GetContentContainer()->ChildPushBack(sub);
-    sub->UI_SetLocalRectF(RectT<float>{10, 20, 110, 220});
-    EXPECT_EQ(sub->GetSizeChangedCount(), 1);
-    sub->UI_SetLocalRectF(RectT<float>{11, 21, 111, 221});  // moved, same size
-    EXPECT_EQ(sub->GetSizeChangedCount(), 1);
-
-    boost::intrusive_ptr<OS_View> view(new OS_View());
-    view->UI_SetNodeID("stage");
-    sub->ChildPushBack(view);
-    view->UI_SetLocalRect(RectT<int>{5, 5, 55, 45});
-    EXPECT_EQ(view->UI_LocalToGlobal(RectT<int>{0, 0, 50, 40}), (RectT<int>{16, 26, 66, 66}));
-    EXPECT_EQ(dialog->FindDescendant("stage"), view);
-
-    UI_Node::ClipRectList clips;
-    dialog->UI_GetOSControlClipRects(clips);
-    ASSERT_EQ(clips.size(), 1u);
-    EXPECT_EQ(clips[0].first, view);
-    EXPECT_EQ(clips[0].second, (RectT<float>{16, 26, 66, 66}));
-
-    EXPECT_TRUE(sub->ChildRemove(view));
-    EXPECT_FALSE(sub->ChildRemove(view));
-    EXPECT_EQ(view->UI_GetParent(), nullptr);
-    EXPECT_FALSE(dialog->FindDescendant("stage"));
-}
-
-TEST_F(NodeTree, KeyboardFocusMovesWithinAWindowAndModalScopesNest)
-{
-    auto box = MakeBox();
-    auto ok = box->GetSpecificButton(kDialogResponse_OK);
-    auto cancel = box->GetSpecificButton(kDialogResponse_Cancel);
-    ok->UI_GainKeyboardFocus(3);
-    cancel->UI_GainKeyboardFocus(1);
-    EXPECT_FALSE(ok->UI_HasKeyboardFocus());
-    EXPECT_TRUE(cancel->UI_HasKeyboardFocus());
-    EXPECT_EQ(cancel->UI_GetKeyboardFocusReason(), 1);
-
-    {
-        UI_NodeManager::SetModalWindow outer(box.get());
-        {
-            UI_NodeManager::SetModalWindow inner(nullptr);
-            EXPECT_EQ(UI_NodeManager::GetModalWindow(), nullptr);
-            EXPECT_EQ(UI_NodeManager::GetModalScopeDepth(), 2);
-        }
-        EXPECT_EQ(UI_NodeManager::GetModalWindow(), box.get());
-    }
-    EXPECT_EQ(UI_NodeManager::GetModalScopeDepth(), 0);
 }
 
 }  // namespace
