@@ -2,7 +2,9 @@
 
 #include <cstdlib>
 #include <filesystem>
+#include <iostream>
 
+#include "cli/TokenFile.h"
 #include "foundation/core/Dir.h"
 #include "foundation/core/HostConfig.h"
 #include "foundation/core/Trace.h"
@@ -19,7 +21,10 @@ const char kGlobalOptionsHelp[] =
     "  --identity-server URL    identity service base URL (for instance http://127.0.0.1:8080/ovra)\n"
     "  --client-id ID           client identifier: the name of this client's root collection\n"
     "                           (default tolmonetsync)\n"
-    "  --token TOKEN            use this access token as given (also TOLMONETSYNC_TOKEN)\n"
+    "  --token TOKEN            use this access token as given (also TOLMONETSYNC_TOKEN); other\n"
+    "                           local users can read arguments: prefer the variable or --token-file\n"
+    "  --token-file FILE        read the access token from the first line of FILE, which only its\n"
+    "                           owner may read (chmod 600)\n"
     "  --auto-login             sign in from TOLMONETSYNC_USERNAME and TOLMONETSYNC_PASSWORD\n"
     "  --pref-dir DIR           host preference directory: cache file, last-user file, backups,\n"
     "                           keychain store\n"
@@ -49,8 +54,14 @@ bool ReadGlobalOption(const std::vector<std::string>& arguments, std::size_t& in
         options.mClientId = OptionValue(arguments, index);
         if (options.mClientId.empty()) throw UsageError("--client-id must not be empty");
     } else if (option == "--token") {
+        if (!options.mTokenFile.empty()) throw UsageError("give --token or --token-file, not both");
         options.mToken = OptionValue(arguments, index);
         if (options.mToken.empty()) throw UsageError("--token must not be empty");
+    } else if (option == "--token-file") {
+        if (!options.mToken.empty() && options.mTokenFile.empty())
+            throw UsageError("give --token or --token-file, not both");
+        options.mTokenFile = OptionValue(arguments, index);
+        options.mToken = ReadTokenFile(options.mTokenFile);
     } else if (option == "--auto-login") {
         options.mAutoLogin = true;
     } else if (option == "--pref-dir") {
@@ -93,6 +104,9 @@ void ApplyGlobalOptions(GlobalOptions& options)
         ::setenv("TOLMONETSYNC_CA_FILE", std::filesystem::absolute(options.mCaFile).string().c_str(), 1);
     if (!options.mIdentityServer.empty())
         SetOvraServiceURL(UTF8String(options.mIdentityServer.begin(), options.mIdentityServer.end()));
+    if (!options.mToken.empty() && options.mTokenFile.empty())
+        std::cerr << "tolmonetsync: warning: other local users can read the --token argument; use "
+                     "TOLMONETSYNC_TOKEN or --token-file instead\n";
     if (options.mToken.empty()) {
         const char* token = std::getenv("TOLMONETSYNC_TOKEN");
         if (token != nullptr) options.mToken = token;

@@ -18,7 +18,8 @@ struct GlobalOptions {
     std::string mServer;          // asset service base URL; empty: the built-in one
     std::string mIdentityServer;  // identity service base URL; empty: the built-in one
     std::string mClientId = "tolmonetsync";
-    std::string mToken;  // --token, else TOLMONETSYNC_TOKEN
+    std::string mToken;      // --token or --token-file, else TOLMONETSYNC_TOKEN
+    std::string mTokenFile;  // --token-file: mToken was read from it
     bool mAutoLogin = false;
     std::string mPrefDir;
     std::string mCompany = "Tolmonet";
@@ -41,7 +42,8 @@ bool ReadGlobalOption(const std::vector<std::string>& arguments, std::size_t& in
 const std::string& OptionValue(const std::vector<std::string>& arguments, std::size_t& index);
 
 // Sets the host identity, the preference directory and tracing from the
-// options, and the token from TOLMONETSYNC_TOKEN when --token was not given.
+// options, and the token from TOLMONETSYNC_TOKEN when neither --token nor
+// --token-file was given. Warns on stderr about a token given as an argument.
 // --ca-file becomes TOLMONETSYNC_CA_FILE, which the request processor reads
 // when it is made: call this before anything sends a request.
 void ApplyGlobalOptions(GlobalOptions& options);

@@ -5,6 +5,7 @@
 #include <fstream>
 #include <iostream>
 
+#include "cli/PrintableName.h"
 #include "cli/Registrations.h"
 #include "cli/SyncJob.h"
 #include "foundation/core/Dir.h"
@@ -108,7 +109,7 @@ int PlayDemo(const fs::path& workspace, const GlobalOptions& globals)
 
     std::cout << "\nBoth computers now hold the same three files. The laptop's earlier layout is kept in:\n";
     for (const fs::directory_entry& entry : fs::recursive_directory_iterator(laptop.mPrefDir / "SyncBackup"))
-        if (entry.is_regular_file()) std::cout << "  " << entry.path().string() << "\n";
+        if (entry.is_regular_file()) std::cout << "  " << PrintableName(entry.path().string()) << "\n";
     service.Stop();
     return 0;
 }
@@ -140,7 +141,7 @@ int RunDemo(GlobalOptions globals, const std::vector<std::string>& arguments)
         workspace = MakeWorkspace();
         status = PlayDemo(workspace, globals);
     } catch (const std::exception& e) {
-        std::cerr << "tolmonetsync demo: " << e.what() << std::endl;
+        std::cerr << "tolmonetsync demo: " << PrintableName(e.what()) << std::endl;
         status = 1;
     }
     if (workspace.empty()) return status;

@@ -2,16 +2,20 @@
 
 #include <condition_variable>
 #include <cstdlib>
+#include <fstream>
 #include <iostream>
 #include <memory>
 #include <mutex>
 
+#include "cli/PrintableName.h"
 #include "cli/SyncJob.h"
 #include "cli/SyncRun.h"
+#include "foundation/core/Dir.h"
 #include "foundation/core/HostConfig.h"
 #include "foundation/core/Keychain.h"
 #include "identity/OvraAuth.h"
 #include "sync/SyncFilesService.h"
+#include "tarnvault/LastUserFile.h"
 #include "tarnvault/Tarnvault.h"
 
 namespace tolmonetsync {
@@ -34,14 +38,45 @@ const char kStatusHelp[] =
     "\nPrints connected, not-logged-in or connection-failed for the stored sign-in; exit status 0\n"
     "only when connected.\n";
 
+// The keychain domains of this host identity, named as the client names its
+// "Access" and "Refresh" entries.
+UTF16String OvraKeychainDomain(const char16_t* kind)
+{
+    using namespace tolmocore::config;
+    return GetCompanyName() + u" " + GetClientName() + u" " + GetClientInternalVersion() + u" OVRA " + kind;
+}
+
 // The identity service gives every sign-in a device token; the command keeps
 // it beside the library's tokens so that logout can withdraw it.
 UTF16String DeviceTokenDomain()
 {
-    using namespace tolmocore::config;
-    return GetCompanyName() + u" " + GetClientName() + u" " + GetClientInternalVersion() + u" OVRA Device";
+    return OvraKeychainDomain(u"Device");
 }
 const char16_t kDeviceTokenAccount[] = u"last";
+
+// The library's Logout forgets who signed in but leaves that user's tokens in
+// the keychain; signing out on the command line removes them as well. Call it
+// before Logout, which removes the last-user file that names the user. False
+// if tokens may be left behind.
+bool RemoveStoredTokens()
+{
+    const tolmocore::filesupport::Dir pref = tolmocore::filesupport::Dir::PrefDir();
+    std::ifstream file(ToNarrow(pref.FullPath()) + "/tarnvaultuser.txt", std::ios::binary);
+    if (!file) return true;  // nobody signed in
+    const std::string text((std::istreambuf_iterator<char>(file)), std::istreambuf_iterator<char>());
+    UTF8String user;
+    try {
+        user = tarnvault::ParseLastUserText(UTF8String(text));
+    } catch (const std::exception&) {
+        return false;
+    }
+    if (user.empty()) return true;
+    using tolmocore::security::Keychain;
+    const UTF16String account = tolmocore::utility::UTF8to16(user);
+    const bool access = Keychain::RemovePassword(OvraKeychainDomain(u"Access"), account);
+    const bool refresh = Keychain::RemovePassword(OvraKeychainDomain(u"Refresh"), account);
+    return access && refresh;
+}
 
 UTF8String Utf8(const std::string& text)
 {
@@ -84,9 +119,10 @@ int Usage(const char* command, const char* usage, const std::string& why)
     return 2;
 }
 
+// The reason may quote the service's answer.
 int Fail(const char* command, const std::string& why)
 {
-    std::cerr << "tolmonetsync " << command << ": " << why << std::endl;
+    std::cerr << "tolmonetsync " << command << ": " << PrintableName(why) << std::endl;
     return 1;
 }
 
@@ -172,7 +208,9 @@ int RunLogin(GlobalOptions globals, const std::vector<std::string>& arguments)
         return Fail("login", std::string("signed in, but the asset service said ") + ConnectionStateName(state));
     tolmocore::security::Keychain::SetPassword(DeviceTokenDomain(), kDeviceTokenAccount,
                                                ToUTF16(answer->mAnswer.device_token.ToStdString()));
-    if (!globals.mQuiet) std::cout << "signed in as " << user << " (" << credentials.userID.ToStdString() << ")\n";
+    if (!globals.mQuiet)
+        std::cout << "signed in as " << PrintableName(user) << " (" << PrintableName(credentials.userID.ToStdString())
+                  << ")\n";
     return 0;
 }
 
@@ -207,8 +245,11 @@ int RunLogout(GlobalOptions globals, const std::vector<std::string>& arguments)
         }
         tolmocore::security::Keychain::RemovePassword(DeviceTokenDomain(), kDeviceTokenAccount);
     }
+    const bool tokensRemoved = RemoveStoredTokens();
     const boost::shared_ptr<SyncServer> client = MakeClient(globals);
     WaitForConnectionState([&](const ConnectionStateCallback& report) { return client->Logout(report); });
+    if (!tokensRemoved)
+        return Fail("logout", "signed out, but the stored tokens could not be removed from the keychain");
     if (!globals.mQuiet) std::cout << "signed out\n";
     return 0;
 }

@@ -7,6 +7,7 @@
 #include <boost/json/serialize.hpp>
 
 #include "cli/MigrationNotice.h"
+#include "cli/PrintableName.h"
 #include "cli/SyncReport.h"
 #include "cli/SyncRun.h"
 #include "foundation/net/HeaderConstants.h"
@@ -99,7 +100,7 @@ public:
         after.mDecisions = plan;
         if (mOutput == Output::Text) {
             mOut << "migration: this host version had no preferences on the server; version " << version << "'s ("
-                 << oldRootName << ") were copied into its new root. The plan now:\n";
+                 << PrintableName(oldRootName) << ") were copied into its new root. The plan now:\n";
             PrintPlan(mOut, after);
         }
         mJson["migratedFrom"] = version;
@@ -115,7 +116,8 @@ public:
     }
     int Fail(const std::string& why)
     {
-        mErr << "tolmonetsync sync: " << why << std::endl;
+        // The reason may quote a server's answer or a name; JSON keeps it exact.
+        mErr << "tolmonetsync sync: " << PrintableName(why) << std::endl;
         mJson["ok"] = false;
         mJson["error"] = why;
         Flush();
@@ -199,13 +201,15 @@ int RunSyncJob(const SyncJob& job, Output output, std::ostream& out, std::ostrea
     }
     for (const SyncDir& dir : job.mDirs) {
         if (!service->RegisterSyncDirectory(dir)) {
-            err << "tolmonetsync sync: --dir " << ToNarrow(dir.mDir.FullPath()) << " is given twice" << std::endl;
+            err << "tolmonetsync sync: --dir " << PrintableName(ToNarrow(dir.mDir.FullPath())) << " is given twice"
+                << std::endl;
             return 2;
         }
     }
     for (const SyncFile& file : job.mFiles) {
         if (!service->RegisterSyncFile(file)) {
-            err << "tolmonetsync sync: --file " << ToNarrow(file.mFile.FullPath()) << " is given twice" << std::endl;
+            err << "tolmonetsync sync: --file " << PrintableName(ToNarrow(file.mFile.FullPath())) << " is given twice"
+                << std::endl;
             return 2;
         }
     }

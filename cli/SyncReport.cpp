@@ -4,6 +4,8 @@
 
 #include <boost/json/array.hpp>
 
+#include "cli/PrintableName.h"
+
 namespace tolmonetsync {
 namespace cli {
 
@@ -11,9 +13,15 @@ namespace {
 
 using tolmocore::utility::ToNarrow;
 
+// Names and paths as a terminal may show them; JSON takes them exact.
+std::string Printable(const UTF16String& name)
+{
+    return PrintableName(ToNarrow(name));
+}
+
 std::string RecordName(const CachedSyncFile& record)
 {
-    return ToNarrow(record.mCollectionName) + "/" + ToNarrow(record.mName);
+    return Printable(record.mCollectionName) + "/" + Printable(record.mName);
 }
 
 boost::json::array GroupsToJson(const GroupNameSet& groups)
@@ -39,10 +47,10 @@ void PrintPlan(std::ostream& out, const SyncPreview& preview)
         out << "create    the preferences root (first sync of this host version; with --migrate an earlier\n"
                "          version's preferences are copied into it first)\n";
     for (const UTF16String& group : preview.mGroupsToDelete)
-        out << "delete    server group " << ToNarrow(group) << ", with everything in it: no registration names it\n";
-    for (const UTF16String& group : preview.mGroupsToAdd) out << "create    server group " << ToNarrow(group) << "\n";
+        out << "delete    server group " << Printable(group) << ", with everything in it: no registration names it\n";
+    for (const UTF16String& group : preview.mGroupsToAdd) out << "create    server group " << Printable(group) << "\n";
     for (const File& file : preview.mLocalRemovals)
-        out << "remove    " << ToNarrow(file.FullPath()) << ": not on the server (backed up first)\n";
+        out << "remove    " << Printable(file.FullPath()) << ": not on the server (backed up first)\n";
     for (std::size_t i = 0; i < records.size() && i < preview.mDecisions.size(); ++i) {
         const SyncDecision& decision = preview.mDecisions[i];
         out << std::left << std::setw(9) << decision.ActionName() << " " << RecordName(records[i]) << ": "
@@ -57,9 +65,11 @@ void PrintSummary(std::ostream& out, const SyncSummary& summary)
         << summary.mDeletedOnServer << " on the server and " << summary.mRemovedLocally << " locally, left alone "
         << summary.mLeftAlone << "\n";
     if (summary.mBackedUp > 0)
-        out << "backups of " << summary.mBackedUp << " replaced or removed file(s) in " << summary.mBackupDir << "\n";
+        out << "backups of " << summary.mBackedUp << " replaced or removed file(s) in "
+            << PrintableName(summary.mBackupDir) << "\n";
     else if (!summary.mBackupDir.empty())
-        out << "no local file was replaced or removed (backup directory " << summary.mBackupDir << " is empty)\n";
+        out << "no local file was replaced or removed (backup directory " << PrintableName(summary.mBackupDir)
+            << " is empty)\n";
 }
 
 boost::json::object PlanToJson(const SyncPreview& preview)

@@ -33,7 +33,7 @@ void PrintSummary(std::ostream& out, const SyncSummary& summary);
 boost::json::object PlanToJson(const SyncPreview& preview);
 boost::json::object SummaryToJson(const SyncSummary& summary);
 
-// "A, B" for the group names.
+// "A, B" for the group names, exact: the caller escapes what it prints.
 std::string JoinGroupNames(const GroupNameSet& groups);
 
 }  // namespace cli

@@ -5,6 +5,7 @@
 
 #include <boost/bind/bind.hpp>
 
+#include "foundation/core/Redaction.h"
 #include "foundation/core/Trace.h"
 #include "foundation/net/HeaderConstants.h"
 #include "foundation/net/QuoteURL.h"
@@ -78,7 +79,11 @@ Guid PostQuery(const char* traceName, const UTF8String& url, const tolmonet::htt
 {
     const auto processor = GetGlobalSyncProcessor();
     const Guid requestUID = Guid::CreateUnique();
-    TOLMO_TRACE("OVRA", 8, traceName << ", url: " << url << ", requestUID: " << requestUID);
+    // The query holds the password, the client secret or a token: the trace
+    // keeps the call's shape and blanks those.
+    TOLMO_TRACE(
+        "OVRA", 8,
+        traceName << ", url: " << tolmocore::debug::RedactSecrets(url.ToStdString()) << ", requestUID: " << requestUID);
     const bool taken =
         processor->POST(requestUID, handler, ImmutableString::CreateDynamic(url),
                         tolmonet::http::RequestProcessor::Body(), FormHeaders(), tolmonet::Configuration());
@@ -175,7 +180,9 @@ Guid OvraProfile(OvraAuth_Scheme scheme, const UTF8String& bearerToken, const Ov
     const UTF8String url = server + "/profile/v1?bearer_token=" + bearerToken;
     const auto processor = GetGlobalSyncProcessor();
     const Guid requestUID = Guid::CreateUnique();
-    TOLMO_TRACE("OVRA", 8, "Profile, url: " << url << ", requestUID: " << requestUID);
+    TOLMO_TRACE(
+        "OVRA", 8,
+        "Profile, url: " << tolmocore::debug::RedactSecrets(url.ToStdString()) << ", requestUID: " << requestUID);
     const bool taken = processor->GET(
         requestUID,
         boost::bind(&HandleOvraResponse, scheme, "Profile", handler, boost::placeholders::_1, boost::placeholders::_2),

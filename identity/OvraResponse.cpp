@@ -6,6 +6,7 @@
 
 #include "assets/RestException.h"
 #include "foundation/core/Localizer.h"
+#include "foundation/core/Redaction.h"
 #include "foundation/core/Trace.h"
 #include "foundation/json/JSONText.h"
 
@@ -83,10 +84,10 @@ UTF8String HandleOvraResponseBody(const char* name, const Guid& requestUID,
 {
     const UTF8String body = response->BodyText();
     const int level = IsSuccess(response) ? 8 : 1;
-    // The body goes into the trace as it stands: tokens included, as the
-    // service sent them. Tracing is off unless asked for.
+    // The answer carries the user's tokens: the trace shows its keys, not them.
     TOLMO_TRACE("OVRA", level,
-                name << ", status_code: " << response->status << ", body: " << body << ", requestUID: " << requestUID);
+                name << ", status_code: " << response->status << ", body: "
+                     << tolmocore::debug::RedactSecrets(body.ToStdString()) << ", requestUID: " << requestUID);
     return body;
 }
 

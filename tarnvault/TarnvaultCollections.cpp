@@ -136,7 +136,7 @@ Guid Tarnvault::CreateCollectionAsync(const CollectionCallback& success, const E
     const UTF8String body = json::GetJSONUTF8String(request, false);
     const UTF8String url = mServerURL + "/collections";
     TOLMO_TRACE("Tarnvault", 8,
-                "CreateCollection" << ", name: " << name << ", url: " << url << ", body: " << body
+                "CreateCollection" << ", name: " << name << ", url: " << RedactedForTrace(url) << ", body: " << body
                                    << ", requestUID: " << requestUID);
     const boost::shared_ptr<Tarnvault> self = shared_from_this();
     const bool taken = mProcessor->POST(
@@ -165,7 +165,7 @@ Guid Tarnvault::AddAsync(const SuccessCallback& success, const ErrorCallback& er
     const UTF8String body = UTF8String("[") + json::GetJSONUTF8String(boost::any(asset->GetURI()), false) + "]";
     const UTF8String url = mServerURL + "/collections/" + collection->mId + "/members";
     TOLMO_TRACE("Tarnvault", 8,
-                "Add" << ", collection: " << collection << ", asset: " << asset << ", url: " << url
+                "Add" << ", collection: " << collection << ", asset: " << asset << ", url: " << RedactedForTrace(url)
                       << ", body: " << body << ", requestUID: " << requestUID);
     const bool taken = mProcessor->PUT(requestUID, boost::bind(&_HandleAdd, collection, asset, success, error, _1, _2),
                                        ImmutableString::CreateDynamic(url), BodyOf(body), JSONContent(),
@@ -180,8 +180,8 @@ Guid Tarnvault::DeleteAsync(const SuccessCallback& success, const ErrorCallback&
     pairs.push_back(std::make_pair(kRecursive, UTF8String(recursive ? "true" : "false")));
     const UTF8String url = mServerURL + asset->GetURI() + "?" + tolmonet::QuoteURL(pairs);
     TOLMO_TRACE("Tarnvault", 8,
-                "Delete" << ", asset: " << asset << ", inRecursive: " << (recursive ? 1 : 0) << ", url: " << url
-                         << ", requestUID: " << requestUID);
+                "Delete" << ", asset: " << asset << ", inRecursive: " << (recursive ? 1 : 0)
+                         << ", url: " << RedactedForTrace(url) << ", requestUID: " << requestUID);
     const bool taken = mProcessor->DEL(requestUID, boost::bind(&_HandleDelete, success, error, _1, _2),
                                        ImmutableString::CreateDynamic(url), tolmonet::HeaderList(),
                                        tolmonet::Configuration());

@@ -9,6 +9,7 @@
 #include <boost/shared_ptr.hpp>
 
 #include "assets/RestException.h"
+#include "foundation/core/Redaction.h"
 #include "foundation/core/Trace.h"
 #include "foundation/json/JSON.h"
 #include "foundation/net/Response.h"
@@ -48,11 +49,17 @@ bool DecideMigration(const boost::shared_ptr<Tarnvault>& client, const boost::sh
 
 namespace {
 
+// What trace lines may show of a URL or a body: secret values blanked.
+inline std::string RedactedForTrace(const UTF8String& text)
+{
+    return tolmocore::debug::RedactSecrets(text.ToStdString());
+}
+
 inline std::string HeaderTraceText(const boost::shared_ptr<tolmonet::Response>& response)
 {
     std::string text;
     for (const auto& header : response->headers)
-        text += ", " + header.first.ToStdString() + "=" + header.second.ToStdString();
+        text += ", " + tolmocore::debug::RedactSecrets(header.first.ToStdString() + ": " + header.second.ToStdString());
     return text;
 }
 
@@ -65,10 +72,12 @@ inline UTF8String _HandleBody(const char* name, const Guid& requestUID,
         body.assign(response->body->Data(), response->body->Size());
     // Two statements, so that each level keeps a guard of its own.
     if (response->status >= 200 && response->status <= 299) {
-        TOLMO_TRACE("Tarnvault", 8, name << ", status_code: " << response->status << ", body: " << body
+        TOLMO_TRACE("Tarnvault", 8, name << ", status_code: " << response->status << ", body: "
+                                          << RedactedForTrace(body)
                                           << ", requestUID: " << requestUID << HeaderTraceText(response));
     } else {
-        TOLMO_TRACE("Tarnvault", 1, name << ", status_code: " << response->status << ", body: " << body
+        TOLMO_TRACE("Tarnvault", 1, name << ", status_code: " << response->status << ", body: "
+                                          << RedactedForTrace(body)
                                           << ", requestUID: " << requestUID << HeaderTraceText(response));
     }
     return body;

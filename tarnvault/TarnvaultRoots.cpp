@@ -137,7 +137,8 @@ Guid Tarnvault::GetRootAsync(const CollectionCallback& success, const ErrorCallb
     pairs.push_back(std::make_pair(kName, mClientID));
     const UTF8String url = mServerURL + "/collections?" + tolmonet::QuoteURL(pairs);
     TOLMO_TRACE("Tarnvault", 8,
-                "GetRoot" << ", name: <obfuscated>" << ", url: " << url << ", requestUID: " << requestUID);
+                "GetRoot" << ", name: <obfuscated>"
+                          << ", url: " << RedactedForTrace(url) << ", requestUID: " << requestUID);
     const tolmonet::http::ResponseHandler handler =
         boost::bind(&Tarnvault::_HandleGetRoot, shared_from_this(), success, error, true, _1, _2);
     const bool taken = mProcessor->GET(requestUID, handler, ImmutableString::CreateDynamic(url),

@@ -81,7 +81,8 @@ Guid Tarnvault::SearchAsync(const AssetsCallback& success, const ErrorCallback& 
     }
     const UTF8String url = mServerURL + "/search?" + tolmonet::QuoteURL(pairs);
     TOLMO_TRACE("Tarnvault", 8,
-                "Search" << ", q: " << q << ", scope: " << scope << ", url: " << url << ", requestUID: " << requestUID);
+                "Search" << ", q: " << q << ", scope: " << scope
+                         << ", url: " << RedactedForTrace(url) << ", requestUID: " << requestUID);
     const bool taken = mProcessor->POST(requestUID, boost::bind(&_HandleSearch, success, error, _1, _2),
                                         ImmutableString::CreateDynamic(url), tolmonet::http::RequestProcessor::Body(),
                                         tolmonet::HeaderList(), tolmonet::Configuration());
@@ -99,7 +100,8 @@ Guid Tarnvault::HeaderAsync(const AssetCallback& success, const ErrorCallback& e
 {
     const UTF8String url = mServerURL + (isCollection ? "/collections/" : "/assets/") + uid +
                            (isCollection ? "/header" : "/metadata");
-    TOLMO_TRACE("Tarnvault", 8, "Header" << ", uid: " << uid << ", url: " << url << ", requestUID: " << requestUID);
+    TOLMO_TRACE("Tarnvault", 8, "Header" << ", uid: " << uid
+                                         << ", url: " << RedactedForTrace(url) << ", requestUID: " << requestUID);
     const bool taken =
         mProcessor->GET(requestUID, boost::bind(&_HandleHeader, uid, success, error, _1, _2),
                         ImmutableString::CreateDynamic(url), tolmonet::HeaderList(), tolmonet::Configuration());

@@ -118,8 +118,8 @@ void Tarnvault::_HandleUploadAsyncSearch(const boost::weak_ptr<Tarnvault>& self,
     headers.insert(std::make_pair(tolmonet::kHEADER_CONTENT_LENGTH, ImmutableString::CreateDynamic(lengthText)));
     headers.insert(std::make_pair(kPersistencePolicy, kEthereal));
     TOLMO_TRACE("Tarnvault", 8,
-                "Upload" << ", path: " << file.FullPath() << ", collection: " << collection << ", url: " << url
-                         << ", requestUID: " << requestUID);
+                "Upload" << ", path: " << file.FullPath() << ", collection: " << collection
+                         << ", url: " << RedactedForTrace(url) << ", requestUID: " << requestUID);
     const bool taken = client->mProcessor->POST(
         requestUID, boost::bind(&_HandleUpload, client, collection, success, error, _1, _2),
         ImmutableString::CreateDynamic(url), RecycledMemory::AdaptAsRecycledMemory(bytes), headers,
@@ -192,7 +192,7 @@ Guid Tarnvault::DownloadAsync(const DownloadCallback& success, const ErrorCallba
     tolmonet::HeaderList headers;
     if (!etag.empty()) headers.insert(std::make_pair(tolmonet::kHEADER_IF_NONE_MATCH, ImmutableString::CreateDynamic(etag)));
     TOLMO_TRACE("Tarnvault", 8,
-                "Download" << ", path: " << file.FullPath() << ", asset: " << item << ", url: " << url
+                "Download" << ", path: " << file.FullPath() << ", asset: " << item << ", url: " << RedactedForTrace(url)
                            << ", etag: " << etag << ", requestUID: " << requestUID);
     const bool taken = mProcessor->GET(requestUID, boost::bind(&_HandleDownload, file, success, error, _1, _2),
                                        ImmutableString::CreateDynamic(url), headers, tolmonet::Configuration());

@@ -1,13 +1,17 @@
 #include "foundation/core/Trace.h"
 
+#include <cerrno>
 #include <cstdio>
 #include <cstdlib>
 #include <cstring>
 #include <map>
 #include <mutex>
+#include <system_error>
 
-#include <unistd.h>
+#include <fcntl.h>
+#include <sys/stat.h>
 #include <sys/syscall.h>
+#include <unistd.h>
 
 namespace tolmocore {
 namespace debug {
@@ -19,8 +23,8 @@ namespace {
 struct TraceState {
     std::mutex mMutex;
     bool mLoadedFromEnvironment = false;
-    int mDefaultLevel = 0;                 // for categories not named
-    std::map<std::string, int> mLevels;    // per category
+    int mDefaultLevel = 0;               // for categories not named
+    std::map<std::string, int> mLevels;  // per category
     std::string mFilePath;
     FILE* mFile = nullptr;
     TraceListener mListener;
@@ -57,12 +61,71 @@ void ApplySpecLocked(TraceState& state, const std::string& spec)
     }
 }
 
+std::string ErrorText(int error)
+{
+    return std::generic_category().message(error);
+}
+
+// The process's own descriptors: links the system makes, which nobody can
+// plant, and which may well lead to a file the shell redirected to.
+bool IsOwnDescriptorPath(const std::string& path)
+{
+    return path == "/dev/stdout" || path == "/dev/stderr" || path.rfind("/dev/fd/", 0) == 0 ||
+           path.rfind("/proc/self/fd/", 0) == 0;
+}
+
+// Appends to what is already at `path`, unchanged in mode. A link may lead to
+// a device or a FIFO, never to a regular file: one planted at the name would
+// otherwise make the trace write into a file of the link's choosing.
+int OpenExistingTraceFile(const std::string& path, std::string& why)
+{
+    struct stat link;
+    if (::lstat(path.c_str(), &link) != 0) {
+        why = ErrorText(errno);
+        return -1;
+    }
+    const bool isLink = S_ISLNK(link.st_mode);
+    const int fd = ::open(path.c_str(), O_WRONLY | O_APPEND | O_NOCTTY | O_CLOEXEC | (isLink ? 0 : O_NOFOLLOW));
+    if (fd < 0) {
+        why = errno == ELOOP ? "it is a symbolic link" : ErrorText(errno);
+        return -1;
+    }
+    // Checked on what was opened, so a link changed in between is caught too;
+    // opening without O_CREAT or O_TRUNC has changed nothing in the file.
+    struct stat target;
+    if (isLink && !IsOwnDescriptorPath(path) && (::fstat(fd, &target) != 0 || S_ISREG(target.st_mode))) {
+        ::close(fd);
+        why = "it is a symbolic link to a regular file";
+        return -1;
+    }
+    return fd;
+}
+
+FILE* OpenTraceFile(const std::string& path)
+{
+    std::string why;
+    int fd = ::open(path.c_str(), O_WRONLY | O_APPEND | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, 0600);
+    if (fd < 0 && errno == EEXIST)
+        fd = OpenExistingTraceFile(path, why);
+    else if (fd < 0)
+        why = ErrorText(errno);
+    FILE* file = fd >= 0 ? ::fdopen(fd, "a") : nullptr;
+    if (fd >= 0 && file == nullptr) {
+        why = ErrorText(errno);
+        ::close(fd);
+    }
+    if (file == nullptr)
+        std::fprintf(stderr, "tolmonetsync: trace file %s refused (%s); trace lines go to stderr\n", path.c_str(),
+                     why.c_str());
+    return file;
+}
+
 void SetFileLocked(TraceState& state, const std::string& path)
 {
     if (state.mFile) std::fclose(state.mFile);
     state.mFile = nullptr;
     state.mFilePath = path;
-    if (!path.empty()) state.mFile = std::fopen(path.c_str(), "a");
+    if (!path.empty()) state.mFile = OpenTraceFile(path);
 }
 
 // The environment is read on first use, not at load.
@@ -139,7 +202,10 @@ void SetTraceListener(const TraceListener& listener)
     state.mListener = listener;
 }
 
-unsigned long GetCurrentThreadIDForTrace() { return static_cast<unsigned long>(::syscall(SYS_gettid)); }
+unsigned long GetCurrentThreadIDForTrace()
+{
+    return static_cast<unsigned long>(::syscall(SYS_gettid));
+}
 
 void BeginTraceLine(std::ostringstream& stream, const char* category, int level)
 {

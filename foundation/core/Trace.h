@@ -29,6 +29,11 @@ void Trace(const unsigned char* line);
 // an empty spec turns tracing off. Bad parts of a spec are ignored.
 void SetTraceSpec(const std::string& spec);
 // Sends lines to this file instead of stderr (appending); empty: stderr.
+// A path that does not exist is made 0600 (O_EXCL, O_NOFOLLOW). An existing
+// file is appended to and its mode left alone; a device or a FIFO, also
+// behind a link (/dev/stderr), is written to. A symbolic link to a regular
+// file is refused, as is a path that cannot be opened: a line on stderr says
+// why, and trace lines go to stderr.
 void SetTraceFile(const std::string& path);
 // Receives every line written; an empty function removes the listener.
 using TraceListener = boost::function<void(const std::string& line)>;
@@ -61,14 +66,14 @@ void EndTraceLine(std::ostringstream& stream);
 }  // namespace debug
 }  // namespace tolmocore
 
-#define TOLMO_TRACE(category, level, message)                                  \
-    do {                                                                       \
-        static ::tolmocore::debug::TraceGuard sTraceGuard_;                    \
-        const int traceLevel_ = (level);                                       \
-        if (sTraceGuard_.Enabled((category), traceLevel_)) {                   \
-            std::ostringstream traceStream_;                                   \
+#define TOLMO_TRACE(category, level, message)                                          \
+    do {                                                                               \
+        static ::tolmocore::debug::TraceGuard sTraceGuard_;                            \
+        const int traceLevel_ = (level);                                               \
+        if (sTraceGuard_.Enabled((category), traceLevel_)) {                           \
+            std::ostringstream traceStream_;                                           \
             ::tolmocore::debug::BeginTraceLine(traceStream_, (category), traceLevel_); \
-            traceStream_ << message;                                           \
-            ::tolmocore::debug::EndTraceLine(traceStream_);                    \
-        }                                                                      \
+            traceStream_ << message;                                                   \
+            ::tolmocore::debug::EndTraceLine(traceStream_);                            \
+        }                                                                              \
     } while (0)

@@ -8,6 +8,7 @@
 
 #include <strings.h>
 
+#include "foundation/core/Redaction.h"
 #include "foundation/net/CurlFailureText.h"
 
 namespace tolmonet {
@@ -113,7 +114,7 @@ CurlTransfer::~CurlTransfer()
 
 std::string CurlTransfer::UrlForTrace() const
 {
-    return mUrl.substr(0, mUrl.find('?'));
+    return tolmocore::debug::RedactSecrets(mUrl);
 }
 
 void CurlTransfer::Attach(CURL* easy, const CurlTransferEnvironment& environment)

@@ -51,7 +51,7 @@ public:
 
     const Guid& RequestUID() const { return mRequestUID; }
     HttpMethod Method() const { return mMethod; }
-    // The URL without its query, which may carry secrets; for trace lines.
+    // The URL with the values of secret query fields blanked; for trace lines.
     std::string UrlForTrace() const;
 
     // Gives `easy` (fresh or reset) every option of this request.

@@ -4,6 +4,7 @@
 
 #include <boost/bind/bind.hpp>
 
+#include "foundation/core/Redaction.h"
 #include "foundation/core/Trace.h"
 #include "foundation/json/JSONText.h"
 #include "foundation/json/JSONTree.h"
@@ -118,9 +119,10 @@ void MerrowExtensionLauncher::OvraDeserializeResponse(const UTF8String& text, Ov
 void MerrowExtensionLauncher::OnAuthorizationToken(const std::string& text)
 {
     if (text.empty()) return;
+    // The event carries the access token: the trace shows its keys, not it.
     TOLMO_TRACE("OVRA", 8,
                 "OnAuthorizationToken"
-                    << ", body: " << text);
+                    << ", body: " << tolmocore::debug::RedactSecrets(text));
 
     OvraTokenResponse tokenResponse;
     try {

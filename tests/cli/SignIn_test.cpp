@@ -3,14 +3,43 @@
 #include <gtest/gtest.h>
 
 #include <memory>
+#include <regex>
 
 #include "CliProcess.h"
+#include "foundation/core/KeychainStoreFormat.h"
 #include "support/TempDir.h"
 
 namespace {
 
 using clitest::Finished;
 using clitest::RunCli;
+
+bool Contains(const std::string& text, const std::string& part)
+{
+    return text.find(part) != std::string::npos;
+}
+
+// Every value the keychain store of `pref` holds.
+std::vector<std::string> StoredSecrets(const std::filesystem::path& pref)
+{
+    const std::string store = testsupport::ReadFileBytes(pref / "keychain.store");
+    std::vector<std::string> values;
+    for (const auto& entry : tolmocore::security::detail::ParseKeychainStore(
+             reinterpret_cast<const unsigned char*>(store.data()), store.size()))
+        values.push_back(tolmocore::utility::ToNarrow(entry.second));
+    return values;
+}
+
+// The value after each secret key in a trace, in whichever form it was traced.
+std::vector<std::string> TracedSecretValues(const std::string& trace)
+{
+    static const std::regex kSecret(
+        R"re((password|client_secret|refresh_token|bearer_token|access_token|device_token|token)("?\s*[:=]\s*"?)([^&",\s]*))re",
+        std::regex::icase);
+    std::vector<std::string> values;
+    for (std::sregex_iterator it(trace.begin(), trace.end(), kSecret), end; it != end; ++it) values.push_back((*it)[3]);
+    return values;
+}
 
 TEST(SignInCommands, LoginStatusSyncRestartSyncLogoutCycle)
 {
@@ -57,6 +86,48 @@ TEST(SignInCommands, LoginStatusSyncRestartSyncLogoutCycle)
     const Finished after = run({"status"});
     EXPECT_EQ(after.mStatus, 1);
     EXPECT_EQ(after.mOut, "not-logged-in\n");
+}
+
+TEST(SignInCommands, TracingShowsNeitherThePasswordNorAnyTokenAndLogoutClearsTheKeychain)
+{
+    testsupport::TempDir root;
+    const std::string password = "Pw@7q/x";  // goes out percent-encoded as Pw%407q%2fx
+    clitest::ServedService service(root / "service", "unused-token", {"--user", "bob:" + password});
+    const std::vector<std::string> where = {
+        "--server",   service.ApiUrl(),         "--identity-server", service.Base() + "/ovra",
+        "--pref-dir", (root / "pref").string(), "--trace",           "8"};
+    const auto run = [&](std::vector<std::string> arguments, const std::vector<std::string>& environment) {
+        arguments.insert(arguments.begin(), where.begin(), where.end());
+        return RunCli(arguments, environment);
+    };
+    const auto expectNoSecret = [&](const std::string& trace, const std::vector<std::string>& known) {
+        EXPECT_TRUE(Contains(trace, "Authenticate, url: ")) << "nothing traced: " << trace;
+        EXPECT_TRUE(Contains(trace, "&password=***&")) << trace;
+        for (const std::string& secret : known) EXPECT_FALSE(Contains(trace, secret)) << secret << " in " << trace;
+        const std::vector<std::string> traced = TracedSecretValues(trace);
+        EXPECT_GE(traced.size(), 5u);  // password, client secret and the three tokens of the answer
+        for (const std::string& value : traced)
+            EXPECT_TRUE(value == "***" || value == "<obfuscated>" || value.empty()) << value;
+        EXPECT_FALSE(Contains(trace, "Bearer ")) << trace;
+    };
+
+    const Finished login = run({"login", "--user", "bob"}, {"TOLMONETSYNC_PASSWORD=" + password});
+    ASSERT_EQ(login.mStatus, 0) << login.mErr;
+    std::vector<std::string> known = StoredSecrets(root / "pref");
+    ASSERT_EQ(known.size(), 3u);  // the access, refresh and device tokens
+    known.push_back(password);
+    known.push_back("Pw%407q%2fx");
+    expectNoSecret(login.mErr, known);
+
+    const Finished autoLogin =
+        run({"--auto-login", "sync", "-q", "--dir", "path=" + root.Path().string() + ",group=G,ext=.none"},
+            {"TOLMONETSYNC_USERNAME=bob", "TOLMONETSYNC_PASSWORD=" + password});
+    ASSERT_EQ(autoLogin.mStatus, 0) << autoLogin.mErr;
+    expectNoSecret(autoLogin.mErr, known);
+
+    // The access and refresh tokens go with the sign-in, and the device token too.
+    ASSERT_EQ(run({"logout"}, {}).mStatus, 0);
+    EXPECT_TRUE(StoredSecrets(root / "pref").empty());
 }
 
 }  // namespace

@@ -52,12 +52,15 @@ public:
     Finished Sync(const clitest::ServedService& service, std::vector<std::string> options = {},
                   const std::string& group = "Notes") const
     {
-        std::vector<std::string> arguments = {"--server",   service.ApiUrl(), "--token", kToken,
-                                              "--pref-dir", mPref.string(),   "sync"};
+        std::vector<std::string> arguments = {"--server", service.ApiUrl(), "--pref-dir", mPref.string(), "sync"};
         arguments.insert(arguments.end(), options.begin(), options.end());
         arguments.push_back("--dir");
-        arguments.push_back("path=" + mFolder.string() + ",group=" + group + ",ext=.txt");
-        return RunCli(arguments);
+        arguments.push_back(DirSpec(group));
+        return RunCli(arguments, {std::string("TOLMONETSYNC_TOKEN=") + kToken});
+    }
+    std::string DirSpec(const std::string& group = "Notes") const
+    {
+        return "path=" + mFolder.string() + ",group=" + group + ",ext=.txt";
     }
     void Write(const std::string& name, const std::string& bytes) const { WriteFileBytes(mFolder / name, bytes); }
     std::string Read(const std::string& name) const { return ReadFileBytes(mFolder / name); }
@@ -240,14 +243,16 @@ TEST_F(SyncCommand, FailuresExitOneWithOneLine)
     const std::string dir = "path=" + mLaptop.mFolder.string() + ",group=Notes,ext=.txt";
     const std::vector<std::string> common = {"--pref-dir", mLaptop.mPref.string()};
 
-    const Finished wrongToken = RunCli({"--server", mService.ApiUrl(), "--token", "not-a-token", "--pref-dir",
-                                        mLaptop.mPref.string(), "sync", "--dir", dir});
+    const Finished wrongToken =
+        RunCli({"--server", mService.ApiUrl(), "--pref-dir", mLaptop.mPref.string(), "sync", "--dir", dir},
+               {"TOLMONETSYNC_TOKEN=not-a-token"});
     EXPECT_EQ(wrongToken.mStatus, 1);
     EXPECT_TRUE(Contains(wrongToken.mErr, "access token")) << wrongToken.mErr;  // the service's 401 text
     EXPECT_EQ(std::count(wrongToken.mErr.begin(), wrongToken.mErr.end(), '\n'), 1) << wrongToken.mErr;
 
-    const Finished refused = RunCli({"--server", "http://127.0.0.1:9/api", "--token", kToken, "--pref-dir",
-                                     mLaptop.mPref.string(), "sync", "--dir", dir});
+    const Finished refused =
+        RunCli({"--server", "http://127.0.0.1:9/api", "--pref-dir", mLaptop.mPref.string(), "sync", "--dir", dir},
+               {std::string("TOLMONETSYNC_TOKEN=") + kToken});
     EXPECT_EQ(refused.mStatus, 1);
     EXPECT_TRUE(Contains(refused.mErr, "127.0.0.1")) << refused.mErr;
     EXPECT_EQ(std::count(refused.mErr.begin(), refused.mErr.end(), '\n'), 1) << refused.mErr;
@@ -257,6 +262,62 @@ TEST_F(SyncCommand, FailuresExitOneWithOneLine)
     EXPECT_EQ(noToken.mStatus, 1);
     EXPECT_TRUE(Contains(noToken.mErr, "not signed in")) << noToken.mErr;
     EXPECT_FALSE(fs::exists(mLaptop.CacheFile()));
+}
+
+TEST_F(SyncCommand, ServerNamesReachTheTerminalEscapedAndJsonExact)
+{
+    // ESC sequences, BEL, CR and a right-to-left override: enough to rewrite
+    // what a terminal shows, had they been printed raw.
+    const std::string hostile = "x\x1b[2K\x07\rok\xE2\x80\xAEtxt.exe\\.txt";
+    const std::string printed = "x\\x1b[2K\\x07\\x0dok\\u202etxt.exe\\\\.txt";
+    mLaptop.Write(hostile, "from the disk");
+    const Finished upload = mLaptop.Sync(mService);
+    ASSERT_EQ(upload.mStatus, 0) << upload.mErr;
+    EXPECT_TRUE(Contains(upload.mOut, "upload    Notes/" + printed + ": not on the server")) << upload.mOut;
+
+    const Finished json = mDesktop.Sync(mService, {"--json", "--dry-run"});
+    ASSERT_EQ(json.mStatus, 0) << json.mErr;
+    EXPECT_EQ(boost::json::parse(json.mOut).at("plan").at("records").at(0).at("name").as_string(), hostile);
+
+    const Finished download = mDesktop.Sync(mService);
+    ASSERT_EQ(download.mStatus, 0) << download.mErr;
+    EXPECT_EQ(mDesktop.Read(hostile), "from the disk");
+    EXPECT_TRUE(Contains(download.mOut, "download  Notes/" + printed + ": missing locally")) << download.mOut;
+    EXPECT_TRUE(Contains(download.mOut, "downloaded 1")) << download.mOut;
+    for (const char control : {'\x1b', '\x07', '\r'}) EXPECT_FALSE(Contains(download.mOut, std::string(1, control)));
+    EXPECT_FALSE(Contains(download.mOut, "\xE2\x80\xAE"));
+}
+
+TEST_F(SyncCommand, TheTokenComesFromAPrivateFileAndAnArgumentDrawsAWarning)
+{
+    mLaptop.Write("a.txt", "a1");
+    const auto sync = [&](const std::vector<std::string>& credentials) {
+        std::vector<std::string> arguments = {"--server", mService.ApiUrl(), "--pref-dir", mLaptop.mPref.string()};
+        arguments.insert(arguments.end(), credentials.begin(), credentials.end());
+        for (const char* more : {"sync", "-q", "--dir"}) arguments.push_back(more);
+        arguments.push_back(mLaptop.DirSpec());
+        return RunCli(arguments);
+    };
+    const fs::path file = mRoot / "token";
+    WriteFileBytes(file, std::string("  ") + kToken + " \nthe rest is ignored\n");
+    fs::permissions(file, fs::perms::owner_read | fs::perms::owner_write);
+    const Finished fromFile = sync({"--token-file", file.string()});
+    EXPECT_EQ(fromFile.mStatus, 0) << fromFile.mErr;
+    EXPECT_EQ(fromFile.mErr, "");
+
+    const Finished fromArgument = sync({"--token", kToken});
+    EXPECT_EQ(fromArgument.mStatus, 0) << fromArgument.mErr;
+    EXPECT_TRUE(Contains(fromArgument.mErr, "warning: other local users can read the --token argument"))
+        << fromArgument.mErr;
+
+    fs::permissions(file, fs::perms::group_read, fs::perm_options::add);
+    const Finished shared = sync({"--token-file", file.string()});
+    EXPECT_EQ(shared.mStatus, 2);
+    EXPECT_TRUE(Contains(shared.mErr, "--token-file " + file.string() + ": ")) << shared.mErr;
+    EXPECT_TRUE(Contains(shared.mErr, "chmod 600")) << shared.mErr;
+    EXPECT_EQ(sync({"--token-file", mRoot.Path().string()}).mStatus, 2);  // not a regular file
+    fs::permissions(file, fs::perms::owner_read | fs::perms::owner_write);
+    EXPECT_EQ(sync({"--token", kToken, "--token-file", file.string()}).mStatus, 2);
 }
 
 TEST_F(SyncCommand, MigrateCopiesTheEarlierVersionsPreferencesAndSaysFromWhich)

@@ -123,7 +123,9 @@ TEST_F(WebSignIn, AnUnreadableTokenTextGivesEmptyCredentialsAndLeavesTheDialogOp
     ASSERT_TRUE(mRecorder.WaitForCalls(1, kWaitMs));
     EXPECT_TRUE(mRecorder.Last().accessToken.empty());
     EXPECT_TRUE(mRecorder.Last().userID.empty());
-    EXPECT_TRUE(trace.Contains("OnAuthorizationToken, body: {\"token\": \"cut off"));
+    // Even a broken body shows its keys and not the token's value.
+    EXPECT_TRUE(trace.Contains("OnAuthorizationToken, body: {\"token\": \"***"));
+    EXPECT_FALSE(trace.Contains("cut off"));
     EXPECT_TRUE(trace.Contains("OvraDeserializeResponse error: "));
     EXPECT_EQ(WaitForSignInDialog(), dialog);
 

@@ -2,12 +2,18 @@
 
 #include <gtest/gtest.h>
 
+#include <cstdio>
+#include <filesystem>
 #include <mutex>
 #include <regex>
 #include <thread>
 #include <vector>
 
+#include <fcntl.h>
+#include <unistd.h>
+
 #include "foundation/core/Trace.h"
+#include "support/TempDir.h"
 
 using namespace tolmocore::debug;
 
@@ -47,7 +53,10 @@ int Counted(int value)
     return value;
 }
 
-void TraceAtLevel(int level) { TOLMO_TRACE("Tarnvault", level, "level " << level); }
+void TraceAtLevel(int level)
+{
+    TOLMO_TRACE("Tarnvault", level, "level " << level);
+}
 
 }  // namespace
 
@@ -63,7 +72,10 @@ TEST_F(TraceTest, OffByDefaultAndBuildsNoTextWhenOff)
 TEST_F(TraceTest, LineHasThreadCategoryLevelAndMessage)
 {
     SetTraceSpec("8");
-    TOLMO_TRACE("OVRA", 8, "signed in as " << "someone" << ", status " << 200);
+    TOLMO_TRACE("OVRA", 8,
+                "signed in as "
+                    << "someone"
+                    << ", status " << 200);
     const auto lines = Lines();
     ASSERT_EQ(lines.size(), 1u);
     EXPECT_TRUE(std::regex_match(lines[0], std::regex("<[0-9]+> <OVRA> <8> signed in as someone, status 200\n")))
@@ -125,4 +137,80 @@ TEST_F(TraceTest, ManyThreadsTraceAndReconfigureAtOnce)
     }
     for (auto& thread : threads) thread.join();
     for (const auto& line : Lines()) EXPECT_EQ(line.back(), '\n');
+}
+
+namespace {
+
+// This process's stderr goes into a file until Finish, which gives its text.
+class StderrCapture {
+public:
+    explicit StderrCapture(const std::filesystem::path& path) : mPath(path)
+    {
+        std::fflush(stderr);
+        mSaved = dup(2);
+        const int fd = open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
+        dup2(fd, 2);
+        close(fd);
+    }
+    ~StderrCapture() { Finish(); }
+    std::string Finish()
+    {
+        if (mSaved < 0) return std::string();
+        std::fflush(stderr);
+        dup2(mSaved, 2);
+        close(mSaved);
+        mSaved = -1;
+        return testsupport::ReadFileBytes(mPath);
+    }
+
+private:
+    std::filesystem::path mPath;
+    int mSaved = -1;
+};
+
+}  // namespace
+
+TEST_F(TraceTest, TraceFileIsMadePrivateAppendsAndRefusesALinkToAFile)
+{
+    namespace fs = std::filesystem;
+    testsupport::TempDir dir;
+    SetTraceSpec("8");
+    // What stderr got while `path` was the trace file and one line was traced.
+    const auto traceTo = [&](const fs::path& path, const std::string& message) {
+        StderrCapture err(dir / "stderr");
+        SetTraceFile(path.string());
+        TOLMO_TRACE("tolmonetsync", 8, message);
+        SetTraceFile("/dev/null");
+        return err.Finish();
+    };
+    const auto mode = [](const fs::path& path) { return fs::status(path).permissions() & fs::perms::mask; };
+
+    EXPECT_EQ(traceTo(dir / "new.trace", "into a new file"), "");
+    EXPECT_EQ(mode(dir / "new.trace"), fs::perms::owner_read | fs::perms::owner_write);
+    EXPECT_NE(testsupport::ReadFileBytes(dir / "new.trace").find("into a new file"), std::string::npos);
+
+    testsupport::WriteFileBytes(dir / "kept.trace", "earlier\n");
+    fs::permissions(dir / "kept.trace", fs::perms::owner_read | fs::perms::owner_write | fs::perms::group_read);
+    EXPECT_EQ(traceTo(dir / "kept.trace", "appended"), "");
+    EXPECT_EQ(mode(dir / "kept.trace"), fs::perms::owner_read | fs::perms::owner_write | fs::perms::group_read);
+    const std::string kept = testsupport::ReadFileBytes(dir / "kept.trace");
+    EXPECT_EQ(kept.rfind("earlier\n", 0), 0u);
+    EXPECT_NE(kept.find("appended"), std::string::npos);
+
+    // A link planted at the name must not lead the trace into another file.
+    testsupport::WriteFileBytes(dir / "victim", "precious\n");
+    fs::create_symlink(dir / "victim", dir / "planted.trace");
+    const std::string refused = traceTo(dir / "planted.trace", "not for the victim");
+    EXPECT_EQ(testsupport::ReadFileBytes(dir / "victim"), "precious\n");
+    EXPECT_NE(refused.find("planted.trace refused (it is a symbolic link to a regular file)"), std::string::npos)
+        << refused;
+    EXPECT_NE(refused.find("not for the victim"), std::string::npos) << "falls back to stderr: " << refused;
+
+    // Devices, also behind links, and the process's own stderr are fine.
+    fs::create_symlink("/dev/null", dir / "null.trace");
+    EXPECT_EQ(traceTo("/dev/null", "discarded"), "");
+    EXPECT_EQ(traceTo(dir / "null.trace", "discarded"), "");
+    const std::string own = traceTo("/dev/stderr", "to stderr");
+    EXPECT_EQ(own.find("refused"), std::string::npos) << own;
+    EXPECT_NE(own.find("to stderr"), std::string::npos) << own;
 }
