@@ -9,7 +9,9 @@
 // accepting, and further connections wait in the kernel's listen queue
 // until one closes. No connection is refused for being over the cap; one
 // may wait long, as long as the read and write time-outs let an open one
-// last.
+// last. The time-outs bound each pause of a client, not a whole request: a
+// client that trickles a byte now and then keeps its connection, and its
+// slot, until it is done. A stop waits for open connections as long.
 //
 // Threads: Enqueue from the accept loop; the workers run the connections.
 
