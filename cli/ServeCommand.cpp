@@ -1,5 +1,6 @@
 #include "cli/ServeCommand.h"
 
+#include <chrono>
 #include <csignal>
 #include <cstdio>
 #include <iostream>
@@ -7,7 +8,9 @@
 
 #include <pthread.h>
 
+#include "server/DataDirectoryLock.h"
 #include "server/LocalService.h"
+#include "server/SecretFiles.h"
 #include "server/ServiceArguments.h"
 
 namespace tolmonetsync {
@@ -15,16 +18,22 @@ namespace cli {
 namespace {
 
 const char kServeUsage[] =
-    "usage: tolmonetsync serve --data DIR [--listen HOST:PORT] [--user NAME:PASSWORD[:EMAIL]]...\n"
-    "         [--token NAME:TOKEN]... [--token-ttl SECONDS] [--denied-user NAME]... [--cert FILE --key FILE]\n";
+    "usage: tolmonetsync serve --data DIR [--listen HOST:PORT] [--users-file FILE] [--tokens-file FILE]\n"
+    "         [--user NAME:PASSWORD[:EMAIL]]... [--token NAME:TOKEN]... [--token-ttl SECONDS]\n"
+    "         [--denied-user NAME]... [--cert FILE --key FILE]\n";
 const char kServeHelp[] =
     "\n"
     "Runs the local asset service (under /api) and identity service (under /ovra) in the foreground until SIGINT or "
     "SIGTERM.\n"
-    "  --data DIR          where users, tokens and content are kept (made if missing)\n"
+    "  --data DIR          where users, tokens and content are kept (made 0700 if missing); one\n"
+    "                      service at a time may use it\n"
     "  --listen HOST:PORT  the address to listen on (default 127.0.0.1:0; port 0 picks a free one)\n"
-    "  --user NAME:PASSWORD[:EMAIL]   creates or updates a user\n"
-    "  --token NAME:TOKEN  grants the user a fixed access token\n"
+    "  --users-file FILE   creates or updates the users of FILE, one NAME:PASSWORD[:EMAIL] a line\n"
+    "                      ('#' starts a comment line); FILE must be readable by its owner alone\n"
+    "  --tokens-file FILE  grants the fixed access tokens of FILE, one NAME:TOKEN a line; owner alone\n"
+    "  --user NAME:PASSWORD[:EMAIL]   creates or updates a user (other local users can read\n"
+    "                      command lines: prefer --users-file)\n"
+    "  --token NAME:TOKEN  grants the user a fixed access token (prefer --tokens-file)\n"
     "  --token-ttl SECONDS access tokens expire after this long (the fixed ones too; signed-in\n"
     "                      ones after an hour without it)\n"
     "  --denied-user NAME  the user's sign-in is refused (access denied) even with the right password\n"
@@ -33,9 +42,29 @@ const char kServeHelp[] =
     "The identity service is under /ovra. The first line on stdout is \"listening on http://HOST:PORT\"\n"
     "(https with a certificate).\n";
 
-server::LocalServiceOptions ParseServe(GlobalOptions& globals, const std::vector<std::string>& arguments)
+// A whole number of milliseconds, 0 or more.
+std::chrono::milliseconds ParseMilliseconds(const std::string& text)
 {
-    server::LocalServiceOptions options;
+    if (text.empty() || text.size() > 9 || text.find_first_not_of("0123456789") != std::string::npos)
+        throw UsageError("expected a number of milliseconds");
+    return std::chrono::milliseconds(std::stol(text));
+}
+
+template <typename Entry>
+void Append(std::vector<Entry>& entries, const std::vector<Entry>& more)
+{
+    entries.insert(entries.end(), more.begin(), more.end());
+}
+
+struct ServeArguments {
+    server::LocalServiceOptions mOptions;
+    bool mSecretOnCommandLine = false;  // --user or --token
+};
+
+ServeArguments ParseServe(GlobalOptions& globals, const std::vector<std::string>& arguments)
+{
+    ServeArguments parsed;
+    server::LocalServiceOptions& options = parsed.mOptions;
     for (size_t i = 0; i < arguments.size(); ++i) {
         const std::string& option = arguments[i];
         auto value = [&]() -> const std::string& { return OptionValue(arguments, i); };
@@ -45,6 +74,14 @@ server::LocalServiceOptions ParseServe(GlobalOptions& globals, const std::vector
             server::ParseListenArgument(value(), options);
         } else if (option == "--user") {
             options.mUsers.push_back(server::ParseUserArgument(value()));
+            parsed.mSecretOnCommandLine = true;
+        } else if (option == "--users-file") {
+            Append(options.mUsers, server::ReadUsersFile(value()));
+        } else if (option == "--tokens-file") {
+            Append(options.mTokens, server::ReadTokensFile(value()));
+        } else if (option == "--dev-sign-in-delay-cap") {
+            // Not in the help: lets tests of failed sign-ins run without waiting.
+            options.mSignInDelays.mCap = ParseMilliseconds(value());
         } else if (option == "--token-ttl") {
             options.mTokenTtlSeconds = server::ParseSecondsArgument(value());
         } else if (option == "--denied-user") {
@@ -56,6 +93,7 @@ server::LocalServiceOptions ParseServe(GlobalOptions& globals, const std::vector
         } else if (option == "--token") {
             // serve's own --token (NAME:TOKEN) comes before the global one.
             options.mTokens.push_back(server::ParseTokenArgument(value()));
+            parsed.mSecretOnCommandLine = true;
         } else if (!ReadGlobalOption(arguments, i, globals)) {
             throw UsageError("unknown option '" + option + "'");
         }
@@ -63,16 +101,16 @@ server::LocalServiceOptions ParseServe(GlobalOptions& globals, const std::vector
     if (options.mDataDirectory.empty() && !globals.mHelp) throw UsageError("--data is required");
     if (options.mCertificateFile.empty() != options.mPrivateKeyFile.empty())
         throw UsageError("--cert and --key go together");
-    return options;
+    return parsed;
 }
 
 }  // namespace
 
 int RunServe(GlobalOptions globals, const std::vector<std::string>& arguments)
 {
-    server::LocalServiceOptions options;
+    ServeArguments parsed;
     try {
-        options = ParseServe(globals, arguments);
+        parsed = ParseServe(globals, arguments);
     } catch (const std::invalid_argument& e) {
         std::cerr << "tolmonetsync serve: " << e.what() << "\n" << kServeUsage << std::flush;
         return 2;
@@ -82,6 +120,12 @@ int RunServe(GlobalOptions globals, const std::vector<std::string>& arguments)
         return 0;
     }
     ApplyGlobalOptions(globals);
+    const server::LocalServiceOptions& options = parsed.mOptions;
+    if (parsed.mSecretOnCommandLine) {
+        std::cerr << "tolmonetsync serve: warning: other local users can read command-line arguments; "
+                     "give passwords and tokens with --users-file and --tokens-file instead"
+                  << std::endl;
+    }
 
     // Block the stop signals in every thread the service starts; this one
     // waits for them below.
@@ -99,6 +143,9 @@ int RunServe(GlobalOptions globals, const std::vector<std::string>& arguments)
         int received = 0;
         sigwait(&stopSignals, &received);
         service.Stop();
+    } catch (const server::DataDirectoryInUse& e) {
+        std::cerr << e.what() << std::endl;
+        return 1;
     } catch (const std::exception& e) {
         std::cerr << "tolmonetsync serve: " << e.what() << std::endl;
         return 1;

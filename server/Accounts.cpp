@@ -51,7 +51,7 @@ std::int64_t Accounts::SetUser(const std::string& name, const std::string& passw
 {
     if (name.empty()) throw std::invalid_argument("empty user name");
     const std::string salt = RandomBytes(kSaltBytes);
-    const std::string hash = Derive(password, salt);
+    const std::string hash = Hash(password, salt);
     const std::string mail = email.empty() ? name + "@localhost" : email;
     std::lock_guard<std::mutex> writer(mDatabase.WriteLock());
     Database::Lease db = mDatabase.Acquire();
@@ -70,10 +70,32 @@ std::int64_t Accounts::SetUser(const std::string& name, const std::string& passw
 
 bool Accounts::CheckPassword(const std::string& name, const std::string& password)
 {
-    Database::Lease db = mDatabase.Acquire();
-    Statement find(*db, "SELECT salt, hash FROM users WHERE name = ?1");
-    if (!find.Bind(1, name).Step() || find.IsNull(0)) return false;
-    return SameBytes(Derive(password, find.Text(0)), find.Text(1));
+    std::string salt;
+    std::string hash;
+    {
+        Database::Lease db = mDatabase.Acquire();
+        Statement find(*db, "SELECT salt, hash FROM users WHERE name = ?1");
+        if (find.Bind(1, name).Step() && !find.IsNull(0)) {
+            salt = find.Text(0);
+            hash = find.Text(1);
+        }
+    }
+    // An unknown user (or one without a password) costs the same hash as a
+    // wrong password, so the time of the answer does not tell which names exist.
+    const bool known = !salt.empty();
+    const std::string derived = Hash(password, known ? salt : std::string(kSaltBytes, '\0'));
+    return SameBytes(derived, known ? hash : std::string(kHashBytes, '\0')) && known;
+}
+
+std::string Accounts::Hash(const std::string& password, const std::string& salt)
+{
+    ++mHashesComputed;
+    return Derive(password, salt);
+}
+
+std::uint64_t Accounts::HashesComputed() const
+{
+    return mHashesComputed;
 }
 
 std::int64_t Accounts::EnsureUser(const std::string& name)

@@ -6,6 +6,7 @@
 // Threads: any. Errors: DatabaseError from the storage; std::invalid_argument
 // for an empty user name or token.
 
+#include <atomic>
 #include <cstdint>
 #include <string>
 
@@ -28,7 +29,10 @@ public:
     // Creates the user or replaces its password and email. An empty email
     // becomes NAME@localhost. Gives the user's number.
     std::int64_t SetUser(const std::string& name, const std::string& password, const std::string& email);
+    // Costs one password hash whether or not the user exists.
     bool CheckPassword(const std::string& name, const std::string& password);
+    // How many passwords CheckPassword has hashed; the work done is visible to tests.
+    std::uint64_t HashesComputed() const;
     // The user's number, made with no password if there is none yet.
     std::int64_t EnsureUser(const std::string& name);
     // A token for that user; ttlSeconds 0 never expires, and one below 0
@@ -39,7 +43,10 @@ public:
     boost::optional<UserInfo> User(std::int64_t user);
 
 private:
+    std::string Hash(const std::string& password, const std::string& salt);
+
     Database& mDatabase;
+    std::atomic<std::uint64_t> mHashesComputed{0};
 };
 
 }  // namespace server

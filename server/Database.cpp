@@ -1,5 +1,12 @@
 #include "server/Database.h"
 
+#include <cerrno>
+#include <cstring>
+
+#include <fcntl.h>
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include <sqlite3.h>
 
 namespace tolmonetsync {
@@ -33,6 +40,18 @@ void Check(sqlite3* db, int rc)
     if (rc != SQLITE_OK && rc != SQLITE_ROW && rc != SQLITE_DONE) {
         throw DatabaseError(db ? sqlite3_errmsg(db) : sqlite3_errstr(rc));
     }
+}
+
+// SQLite makes its WAL and shared-memory files with the database's own mode,
+// so a database made 0600 keeps all three readable by the service's user alone.
+void MakePrivateFile(const std::string& path)
+{
+    const int fd = ::open(path.c_str(), O_RDWR | O_CREAT | O_CLOEXEC, 0600);
+    if (fd < 0) throw DatabaseError("cannot open " + path + ": " + std::strerror(errno));
+    struct stat status {};
+    // One made by an older service may be wider; it holds password hashes.
+    if (::fstat(fd, &status) == 0 && (status.st_mode & 077) != 0) ::fchmod(fd, status.st_mode & 0700);
+    ::close(fd);
 }
 
 }  // namespace
@@ -167,6 +186,7 @@ void Transaction::Commit()
 
 Database::Database(const std::string& path, std::size_t poolSize) : mPath(path), mPoolSize(poolSize)
 {
+    MakePrivateFile(path);
     auto first = std::make_unique<Connection>(path);
     first->Exec(kSchema);
     mIdle.push_back(std::move(first));

@@ -85,7 +85,8 @@ private:
 
 class Database {
 public:
-    // Opens (and creates) the file and its tables.
+    // Opens (and creates) the file and its tables. The file is made (or
+    // narrowed to) mode 0600.
     explicit Database(const std::string& path, std::size_t poolSize = 4);
     ~Database();
 

@@ -6,6 +6,7 @@
 
 #include "server/Accounts.h"
 #include "server/Sessions.h"
+#include "server/SignInThrottle.h"
 
 namespace tolmonetsync {
 namespace server {
@@ -46,12 +47,18 @@ void AnswerTokens(Exchange& exchange, Accounts& accounts, const IssuedTokens& is
 
 }  // namespace
 
-std::vector<Route> IdentityRoutes(Sessions& sessions, Accounts& accounts, const std::vector<std::string>& deniedUsers)
+std::vector<Route> IdentityRoutes(Sessions& sessions, Accounts& accounts, SignInThrottle& throttle,
+                                  const std::vector<std::string>& deniedUsers)
 {
-    const auto signIn = [&sessions, &accounts, deniedUsers](Exchange& exchange) {
+    const auto signIn = [&sessions, &accounts, &throttle, deniedUsers](Exchange& exchange) {
         const std::string name = exchange.Query("username");
+        throttle.WaitBeforeAttempt(name);
         const boost::optional<IssuedTokens> issued = sessions.SignIn(name, exchange.Query("password"));
-        if (!issued) return Refuse(exchange, 401, "invalid_credentials", "wrong user name or password");
+        if (!issued) {
+            throttle.Failed(name);
+            return Refuse(exchange, 401, "invalid_credentials", "wrong user name or password");
+        }
+        throttle.Succeeded(name);
         if (std::find(deniedUsers.begin(), deniedUsers.end(), name) != deniedUsers.end()) {
             sessions.Invalidate(issued->mDevice);
             return Refuse(exchange, 403, "access_denied_non_t1", "this account may not use the service");

@@ -17,10 +17,13 @@ namespace server {
 
 class Accounts;
 class Sessions;
+class SignInThrottle;
 
 // `deniedUsers` sign in with the right password and are still refused
-// ("access_denied_non_t1").
-std::vector<Route> IdentityRoutes(Sessions& sessions, Accounts& accounts, const std::vector<std::string>& deniedUsers);
+// ("access_denied_non_t1"). Every sign-in first waits as `throttle` says
+// for its user name.
+std::vector<Route> IdentityRoutes(Sessions& sessions, Accounts& accounts, SignInThrottle& throttle,
+                                  const std::vector<std::string>& deniedUsers);
 
 }  // namespace server
 }  // namespace tolmonetsync

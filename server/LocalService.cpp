@@ -8,11 +8,15 @@
 #include "server/Accounts.h"
 #include "server/AssetRoutes.h"
 #include "server/AssetStore.h"
+#include "server/ConnectionQueue.h"
 #include "server/ContentFiles.h"
+#include "server/DataDirectoryLock.h"
 #include "server/Database.h"
 #include "server/IdentityRoutes.h"
+#include "server/InternalError.h"
 #include "server/Router.h"
 #include "server/Sessions.h"
+#include "server/SignInThrottle.h"
 
 namespace tolmonetsync {
 namespace server {
@@ -34,6 +38,8 @@ std::string BearerToken(const httplib::Request& request)
 LocalService::LocalService(const LocalServiceOptions& options) : mOptions(options)
 {
     if (mOptions.mDataDirectory.empty()) throw std::runtime_error("the service needs a data directory");
+    // Before anything sweeps: another service's uncommitted content looks unreferenced.
+    mLock = std::make_unique<DataDirectoryLock>(mOptions.mDataDirectory);
     mContent = std::make_unique<ContentFiles>(mOptions.mDataDirectory);
     mDatabase = std::make_unique<Database>(mOptions.mDataDirectory + "/service.sqlite3",
                                            static_cast<std::size_t>(mOptions.mWorkers));
@@ -41,7 +47,9 @@ LocalService::LocalService(const LocalServiceOptions& options) : mOptions(option
     mAssets = std::make_unique<AssetStore>(*mDatabase, *mContent);
     mRouter = std::make_unique<Router>(AssetRoutes());
     mSessions = std::make_unique<Sessions>(*mDatabase, *mAccounts, mOptions.mTokenTtlSeconds);
-    mIdentityRouter = std::make_unique<Router>(IdentityRoutes(*mSessions, *mAccounts, mOptions.mDeniedUsers));
+    mThrottle = std::make_unique<SignInThrottle>(mOptions.mSignInDelays);
+    mIdentityRouter =
+        std::make_unique<Router>(IdentityRoutes(*mSessions, *mAccounts, *mThrottle, mOptions.mDeniedUsers));
     mAssets->RemoveUnreferencedContent();
     for (const ServiceUser& user : mOptions.mUsers) mAccounts->SetUser(user.mName, user.mPassword, user.mEmail);
     for (const ServiceToken& token : mOptions.mTokens) {
@@ -68,8 +76,13 @@ void LocalService::Start()
     } else {
         server = std::make_unique<httplib::Server>();
     }
-    const int workers = mOptions.mWorkers;
-    server->new_task_queue = [workers] { return new httplib::ThreadPool(static_cast<size_t>(workers)); };
+    const auto workers = static_cast<std::size_t>(mOptions.mWorkers);
+    const auto maxConnections = static_cast<std::size_t>(mOptions.mMaxConnections);
+    server->new_task_queue = [workers, maxConnections] { return new ConnectionQueue(workers, maxConnections); };
+    // A client that stops sending or reading loses its connection.
+    server->set_read_timeout(mOptions.mReadTimeoutSeconds);
+    server->set_write_timeout(mOptions.mWriteTimeoutSeconds);
+    server->set_exception_handler(AnswerEscapedException);
     server->set_keep_alive_max_count(100000);
     // Answers go out in several writes (headers, then body): without this the
     // second write waits for the client's delayed acknowledgement, 40 ms a request.
@@ -159,7 +172,7 @@ void LocalService::Serve(const httplib::Request& request, httplib::Response& res
         try {
             mIdentityRouter->Dispatch(exchange);
         } catch (const std::exception& failure) {
-            exchange.Text(500, std::string("internal error: ") + failure.what());
+            AnswerInternalError(request, response, failure.what());
         }
         return;
     }
@@ -178,7 +191,7 @@ void LocalService::Serve(const httplib::Request& request, httplib::Response& res
     } catch (const StoreFailure& failure) {
         exchange.Text(failure.Status(), failure.what());
     } catch (const std::exception& failure) {
-        exchange.Text(500, std::string("internal error: ") + failure.what());
+        AnswerInternalError(request, response, failure.what());
     }
 }
 

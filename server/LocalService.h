@@ -28,6 +28,7 @@
 
 #include "server/AnswerStyle.h"
 #include "server/FaultHooks.h"
+#include "server/SignInThrottle.h"
 
 namespace tolmonetsync {
 namespace server {
@@ -35,6 +36,7 @@ namespace server {
 class Accounts;
 class AssetStore;
 class ContentFiles;
+class DataDirectoryLock;
 class Database;
 class Router;
 class Sessions;
@@ -58,6 +60,13 @@ struct LocalServiceOptions {
     std::vector<ServiceToken> mTokens;
     std::int64_t mTokenTtlSeconds = 0;  // for mTokens; 0 never expires
     int mWorkers = 32;                  // each kept-alive connection holds one while it lasts
+    // Defences against slow and greedy clients. A connection whose client
+    // sends or reads nothing for the time-out is closed. Over the cap a new
+    // connection waits to be accepted, never refused: server/ConnectionQueue.h.
+    int mReadTimeoutSeconds = 10;
+    int mWriteTimeoutSeconds = 10;
+    int mMaxConnections = 128;   // open at once, served or waiting for a worker
+    SignInDelays mSignInDelays;  // the growing wait after failed sign-ins
     // Users whose sign-in is refused with "access_denied_non_t1".
     std::vector<std::string> mDeniedUsers;
     // Either given: HTTPS with this certificate chain and private key (PEM
@@ -68,8 +77,10 @@ struct LocalServiceOptions {
 
 class LocalService {
 public:
-    // Throws std::runtime_error (DatabaseError among them) if the storage
-    // cannot be opened.
+    // Throws DataDirectoryInUse if another service (in any process) has the
+    // data directory, and std::runtime_error (DatabaseError among them) if
+    // the storage cannot be opened. A new data directory is made 0700, the
+    // database and content files 0600.
     explicit LocalService(const LocalServiceOptions& options);
     ~LocalService();
     LocalService(const LocalService&) = delete;
@@ -101,12 +112,14 @@ private:
     bool ApplyFault(const FaultRule& rule, const httplib::Request& request, httplib::Response& response);
 
     LocalServiceOptions mOptions;
+    std::unique_ptr<DataDirectoryLock> mLock;  // first made, last gone
     std::unique_ptr<Database> mDatabase;
     std::unique_ptr<ContentFiles> mContent;
     std::unique_ptr<Accounts> mAccounts;
     std::unique_ptr<AssetStore> mAssets;
     std::unique_ptr<Router> mRouter;
     std::unique_ptr<Sessions> mSessions;
+    std::unique_ptr<SignInThrottle> mThrottle;
     std::unique_ptr<Router> mIdentityRouter;
     std::unique_ptr<httplib::Server> mServer;
     std::thread mThread;

@@ -30,7 +30,15 @@ Sessions::Sessions(Database& database, Accounts& accounts, std::int64_t accessTt
     : mDatabase(database), mAccounts(accounts), mAccessTtlSeconds(accessTtlSeconds > 0 ? accessTtlSeconds : 3600)
 {
     std::lock_guard<std::mutex> writer(mDatabase.WriteLock());
-    mDatabase.Acquire()->Exec(kSchema);
+    Database::Lease db = mDatabase.Acquire();
+    db->Exec(kSchema);
+    PurgeExpired(*db);
+}
+
+void Sessions::PurgeExpired(Connection& db)
+{
+    Statement(db, "DELETE FROM tokens WHERE expires != 0 AND expires <= ?1").Bind(1, NowSeconds()).Run();
+    Statement(db, "DELETE FROM session_tokens WHERE token_hash NOT IN (SELECT hash FROM tokens)").Run();
 }
 
 std::string Sessions::GrantAccess(Connection& db, std::int64_t user, const std::string& deviceHash)
@@ -63,6 +71,7 @@ boost::optional<IssuedTokens> Sessions::SignIn(const std::string& name, const st
         .Bind(3, Sha256Hex(issued.mRefresh))
         .Run();
     issued.mAccess = GrantAccess(*db, issued.mUser, Sha256Hex(issued.mDevice));
+    PurgeExpired(*db);
     return issued;
 }
 
@@ -81,6 +90,7 @@ boost::optional<IssuedTokens> Sessions::Refresh(const std::string& refreshToken)
         .Bind(2, deviceHash)
         .Run();
     issued.mAccess = GrantAccess(*db, issued.mUser, deviceHash);
+    PurgeExpired(*db);
     return issued;
 }
 

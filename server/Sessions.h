@@ -5,6 +5,9 @@
 // old one stops working) and grants a new access token; invalidating the
 // device token ends the session and withdraws its access tokens at once.
 // Every token is random URL-safe text, stored only as its SHA-256.
+// Expired access tokens are deleted at start-up and whenever a sign-in or a
+// refresh grants a new one, so the tables hold only what can still open
+// something; no timer is needed. Sessions themselves do not expire.
 //
 // Threads: any. Errors: DatabaseError from the storage.
 
@@ -39,6 +42,9 @@ public:
     bool Invalidate(const std::string& deviceToken);
 
 private:
+    // Deletes expired access tokens and their links to sessions; the
+    // caller holds the write lock.
+    void PurgeExpired(Connection& db);
     std::string GrantAccess(Connection& db, std::int64_t user, const std::string& deviceHash);
 
     Database& mDatabase;

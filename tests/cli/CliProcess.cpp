@@ -83,7 +83,7 @@ Finished RunCli(const std::vector<std::string>& arguments, const std::vector<std
 }
 
 ServedService::ServedService(const std::filesystem::path& data, const std::string& token,
-                             const std::vector<std::string>& moreOptions)
+                             const std::vector<std::string>& moreOptions, const std::string& errPath)
 {
     int pipeFds[2];
     if (pipe(pipeFds) != 0) throw std::runtime_error("pipe");
@@ -91,6 +91,8 @@ ServedService::ServedService(const std::filesystem::path& data, const std::strin
     posix_spawn_file_actions_init(&actions);
     posix_spawn_file_actions_adddup2(&actions, pipeFds[1], 1);
     posix_spawn_file_actions_addclose(&actions, pipeFds[0]);
+    if (!errPath.empty())
+        posix_spawn_file_actions_addopen(&actions, 2, errPath.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
     std::vector<std::string> arguments = {"serve",  "--data",     data.string(), "--listen",    "127.0.0.1:0",
                                           "--user", "ann:secret", "--token",     "ann:" + token};
     arguments.insert(arguments.end(), moreOptions.begin(), moreOptions.end());

@@ -28,11 +28,11 @@ int WaitCli(pid_t pid);
 
 // `tolmonetsync serve` in the background on a free port, with one user and
 // one fixed token (and any further serve options); stopped with SIGTERM on
-// destruction.
+// destruction. Its stderr goes to errPath when one is given.
 class ServedService {
 public:
     ServedService(const std::filesystem::path& data, const std::string& token,
-                  const std::vector<std::string>& moreOptions = {});
+                  const std::vector<std::string>& moreOptions = {}, const std::string& errPath = std::string());
     ~ServedService();
     ServedService(const ServedService&) = delete;
     ServedService& operator=(const ServedService&) = delete;
