@@ -28,6 +28,7 @@ const char kGlobalOptionsHelp[] =
     "  --auto-login             sign in from TOLMONETSYNC_USERNAME and TOLMONETSYNC_PASSWORD\n"
     "  --pref-dir DIR           host preference directory: cache file, last-user file, backups,\n"
     "                           keychain store\n"
+    "  --allow-shared-pref-dir  use a preference directory that another user owns or can write\n"
     "  --company NAME --app NAME --app-version X.Y\n"
     "                           host identity (default Tolmonet, tolmonetsync, 1.0)\n"
     "  --ca-file FILE           trust the certificates in this PEM file instead of the system's\n"
@@ -66,6 +67,8 @@ bool ReadGlobalOption(const std::vector<std::string>& arguments, std::size_t& in
         options.mAutoLogin = true;
     } else if (option == "--pref-dir") {
         options.mPrefDir = OptionValue(arguments, index);
+    } else if (option == "--allow-shared-pref-dir") {
+        options.mAllowSharedPrefDir = true;
     } else if (option == "--company") {
         options.mCompany = OptionValue(arguments, index);
     } else if (option == "--app") {
@@ -99,6 +102,7 @@ void ApplyGlobalOptions(GlobalOptions& options)
     using tolmocore::filesupport::Dir;
     if (!options.mPrefDir.empty())
         Dir::SetPrefDir(Dir(ToUTF16(std::filesystem::absolute(options.mPrefDir).lexically_normal().string())));
+    Dir::SetAllowSharedPrefDir(options.mAllowSharedPrefDir);
     if (!options.mTrace.empty()) tolmocore::debug::SetTraceSpec(options.mTrace);
     if (!options.mCaFile.empty())
         ::setenv("TOLMONETSYNC_CA_FILE", std::filesystem::absolute(options.mCaFile).string().c_str(), 1);
@@ -115,9 +119,9 @@ void ApplyGlobalOptions(GlobalOptions& options)
 
 void EnsurePrefDir()
 {
-    std::error_code ignored;
-    std::filesystem::create_directories(tolmocore::utility::ToNarrow(tolmocore::filesupport::Dir::PrefDir().FullPath()),
-                                        ignored);
+    using tolmocore::filesupport::Dir;
+    Dir::CheckPrefDir();
+    Dir::PrefDir().CreatePrivate();
 }
 
 }  // namespace cli

@@ -22,6 +22,7 @@ struct GlobalOptions {
     std::string mTokenFile;  // --token-file: mToken was read from it
     bool mAutoLogin = false;
     std::string mPrefDir;
+    bool mAllowSharedPrefDir = false;  // --allow-shared-pref-dir
     std::string mCompany = "Tolmonet";
     std::string mApp = "tolmonetsync";
     std::string mAppVersion = "1.0";
@@ -48,9 +49,10 @@ const std::string& OptionValue(const std::vector<std::string>& arguments, std::s
 // when it is made: call this before anything sends a request.
 void ApplyGlobalOptions(GlobalOptions& options);
 
-// Makes the preference directory if it is missing: the library keeps the
-// cache file, backups and stored sign-in there and expects it to exist, as a
-// host's does.
+// Makes the preference directory if it is missing (0700): the library keeps
+// the cache file, backups and stored sign-in there and expects it to exist,
+// as a host's does. Throws, naming it, for a directory that another user owns
+// or could write, unless --allow-shared-pref-dir was given.
 void EnsurePrefDir();
 
 extern const char kGlobalOptionsHelp[];

@@ -56,6 +56,7 @@ Computer MakeComputer(const fs::path& workspace, const std::string& name)
     Computer computer{name, workspace / name / "Preferences", workspace / name / "pref"};
     fs::create_directories(computer.mFolder);
     fs::create_directories(computer.mPrefDir);
+    fs::permissions(computer.mPrefDir, fs::perms::owner_all);  // as the library makes one
     return computer;
 }
 

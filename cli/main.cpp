@@ -26,6 +26,22 @@ const char kUsage[] =
     "  demo     the main job end to end on a local service with temporary data\n"
     "'tolmonetsync COMMAND --help' tells more.\n";
 
+int RunCommand(const std::string& command, const GlobalOptions& globals, const std::vector<std::string>& rest)
+{
+    if (command == "serve") return RunServe(globals, rest);
+    if (command == "sync") return RunSync(globals, rest);
+    if (command == "demo") return RunDemo(globals, rest);
+    if (command == "login") return RunLogin(globals, rest);
+    if (command == "logout") return RunLogout(globals, rest);
+    if (command == "status") return RunStatus(globals, rest);
+    if (command == "help") {
+        std::cout << kUsage << "\n" << kGlobalOptionsHelp;
+        return 0;
+    }
+    std::cerr << "tolmonetsync: unknown command '" << command << "'\n" << kUsage;
+    return 2;
+}
+
 }  // namespace
 
 int main(int argc, char** argv)
@@ -49,16 +65,11 @@ int main(int argc, char** argv)
     }
     const std::string& command = arguments[index];
     const std::vector<std::string> rest(arguments.begin() + static_cast<long>(index) + 1, arguments.end());
-    if (command == "serve") return RunServe(globals, rest);
-    if (command == "sync") return RunSync(globals, rest);
-    if (command == "demo") return RunDemo(globals, rest);
-    if (command == "login") return RunLogin(globals, rest);
-    if (command == "logout") return RunLogout(globals, rest);
-    if (command == "status") return RunStatus(globals, rest);
-    if (command == "help") {
-        std::cout << kUsage << "\n" << kGlobalOptionsHelp;
-        return 0;
+    try {
+        return RunCommand(command, globals, rest);
+    } catch (const std::exception& e) {
+        // A refused preference directory, for one: the reason, on one line.
+        std::cerr << "tolmonetsync " << command << ": " << e.what() << "\n";
+        return 1;
     }
-    std::cerr << "tolmonetsync: unknown command '" << command << "'\n" << kUsage;
-    return 2;
 }

@@ -122,9 +122,11 @@ void SyncCache::SaveCache()
     File cacheFile = GetCache();
     cacheFile.Create(false);
     // The stream replaces the file whole when it closes: a crash leaves the
-    // old file or the new one, never a torn one.
-    OPlatformByteStream out(cacheFile, 1);
-    const UTF8String text = json::GetJSONUTF8String(json::JSONConvertStdContainer<CachedSyncFile>::ToJSON(mFiles), false);
+    // old file or the new one, never a torn one. Private, and a link planted
+    // at its name is replaced, not written through.
+    OPlatformByteStream out(cacheFile, 1, 0600);
+    const UTF8String text =
+        json::GetJSONUTF8String(json::JSONConvertStdContainer<CachedSyncFile>::ToJSON(mFiles), false);
     out.WriteBlock(text.data(), static_cast<unsigned int>(text.size()));
     out.Close();
 }

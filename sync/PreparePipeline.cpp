@@ -97,6 +97,7 @@ bool SyncFilesService::PrepareSync(const PrepareSuccessCallback& success, const 
                                    const ProgressCallback& progress, const ItemToFileCallback& itemToFile)
 {
     boost::lock_guard<boost::recursive_mutex> lock(SyncMutex());
+    Dir::CheckPrefDir();
     SetCache(boost::shared_ptr<SyncCache>());
     const boost::shared_ptr<SyncCache> cache = CreateCache(mSyncFiles, mSyncDirs, progress, itemToFile);
     SetCache(cache);

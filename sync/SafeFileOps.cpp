@@ -2,7 +2,10 @@
 // without a copy in this run's backup directory, and downloads land beside
 // their target first.
 
+#include <sys/stat.h>
+
 #include <algorithm>
+#include <cerrno>
 #include <sstream>
 #include <vector>
 
@@ -24,13 +27,18 @@ namespace {
 constexpr unsigned int kBlockSize = 10240;
 
 // Copies `source` into `backupDir` under its own name. Backups are flat:
-// within one run a later file of the same name replaces an earlier copy.
+// within one run a later file of the same name replaces an earlier copy. The
+// copy is as private as the original from its first byte on.
 void CopyIntoBackup(const File& source, const Dir& backupDir)
 {
+    struct stat original;
+    const std::string sourcePath = tolmocore::utility::ToNarrow(source.FullPath());
+    if (::stat(sourcePath.c_str(), &original) != 0)
+        tolmocore::filesupport::ThrowFileSystemError("Cannot back up", source.FullPath());
     File copy(backupDir, source.GetName());
     copy.Create(false);
     IPlatformByteStream in(source, 1);
-    OPlatformByteStream out(copy, 1);
+    OPlatformByteStream out(copy, 1, original.st_mode & 07777);
     std::vector<unsigned char> block(kBlockSize);
     for (std::uint64_t remaining = in.Length(); remaining > 0;) {
         const unsigned int size = static_cast<unsigned int>(std::min<std::uint64_t>(kBlockSize, remaining));
@@ -39,6 +47,29 @@ void CopyIntoBackup(const File& source, const Dir& backupDir)
         remaining -= size;
     }
     out.Close();
+}
+
+bool IsLink(const Dir& dir)
+{
+    struct stat info;
+    return ::lstat(tolmocore::utility::ToNarrow(dir.FullPath()).c_str(), &info) == 0 && S_ISLNK(info.st_mode);
+}
+
+// Backups hold copies of the user's files: a directory of them is made 0700,
+// and one that is a link could send them, or the pruning, anywhere.
+void MakeBackupDirectory(const Dir& dir)
+{
+    if (IsLink(dir))
+        throw tolmocore::filesupport::FileSystemError("Refusing the backup directory", dir.FullPath(), ELOOP,
+                                                      "it is a symbolic link");
+    dir.CreatePrivate();
+}
+
+// Only what the library made is pruned: real directories named "Backup_...".
+bool IsPrunable(const Dir& dir)
+{
+    const UTF16String prefix(u"Backup_");
+    return dir.GetName().compare(0, prefix.size(), prefix) == 0 && !IsLink(dir);
 }
 
 std::string BackupDirName(const boost::posix_time::ptime& now)
@@ -60,9 +91,13 @@ void CachedSyncFile::SafeRenameSwap(const Dir& backupDir)
 {
     // The copy goes aside first; then the rename replaces the target in one
     // step, so there is never a moment without a file under the target name.
+    // The download takes the old file's permissions before it is renamed, and
+    // the directory is synced before the cache file may record the swap.
     if (mFile.Exists()) CopyIntoBackup(mFile, backupDir);
     File downloaded = GetSafeRenameFile();
+    downloaded.PrepareToReplace(mFile);
     downloaded.Rename(mFile.GetName());
+    mFile.Parent().Sync();
 }
 
 Guid CachedSyncFile::ComputeChecksum() const
@@ -108,18 +143,19 @@ void CachedSyncFile::FreshenModDate()
 
 Dir SyncCache::NewBackupDir()
 {
-    Dir backupRoot(Dir::PrefDir(), u"SyncBackup");
-    if (!backupRoot.Exists()) backupRoot.Create();
+    const Dir prefDir = Dir::PrefDir();
+    prefDir.CreatePrivate();
+    Dir backupRoot(prefDir, u"SyncBackup");
+    MakeBackupDirectory(backupRoot);
 
     Dir backup(backupRoot, tolmocore::utility::ToUTF16(BackupDirName(BackupClock()())));
-    if (!backup.Exists()) backup.Create();
+    MakeBackupDirectory(backup);
 
     // Oldest first; equal dates keep the walk's (name) order.
     std::vector<std::pair<boost::posix_time::ptime, Dir> > existing;
     for (auto it = backupRoot.BeginSubdirs(false, nullptr); it != backupRoot.EndSubdirs(); ++it)
-        existing.emplace_back((*it).Modified(), *it);
-    std::stable_sort(existing.begin(), existing.end(),
-                     [](const auto& a, const auto& b) { return a.first < b.first; });
+        if (IsPrunable(*it)) existing.emplace_back((*it).Modified(), *it);
+    std::stable_sort(existing.begin(), existing.end(), [](const auto& a, const auto& b) { return a.first < b.first; });
 
     // Ten, not the number above a limit: at eleven only the newest survives,
     // and the count climbs again from one.

@@ -78,11 +78,16 @@ public:
     // Reads present local state, the server's dates and the cache file's
     // kept values into mFiles. Never throws: a bad file is traced and ignored.
     void LoadCache();
-    // Writes every record's kept values to the cache file. Throws on failure.
+    // Writes every record's kept values to the cache file (0600, replacing a
+    // link planted at its name rather than writing through it). Throws on
+    // failure.
     void SaveCache();
 
-    // Makes this run's backup directory under the preference directory and
-    // prunes old ones.
+    // Makes this run's backup directory under the preference directory (the
+    // preference directory, "SyncBackup" and the new one 0700 when made here)
+    // and prunes old ones: only real directories named "Backup_...", never
+    // through a link, whatever else lies there. A "SyncBackup" that is a
+    // symbolic link is refused: throws FileSystemError naming it.
     static Dir NewBackupDir();
     // The clock backup directories are named by (local time); replaceable by tests.
     using Clock = boost::function<boost::posix_time::ptime()>;

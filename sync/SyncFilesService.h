@@ -64,7 +64,9 @@ public:
 
     // Starts the prepare chain. False, and no callback, if the first request
     // could not be sent. Exceptions from making the cache (the backup
-    // directory) pass out. `success` and `error` must be set.
+    // directory) pass out, and so does the refusal of a preference directory
+    // that others could change (Dir::CheckPrefDir), before anything is
+    // touched. `success` and `error` must be set.
     bool PrepareSync(const PrepareSuccessCallback& success, const SyncErrorCallback& error,
                      const ProgressCallback& progress, const ItemToFileCallback& itemToFile);
     // Runs the pass over `cache`. Always true. `error` may come more than once
@@ -76,7 +78,9 @@ public:
     // DoSync in `mode`, from requests that only read (a missing preferences
     // root or group counts as empty). Nothing is created, deleted or migrated
     // on the server and nothing is written locally. False if the first
-    // request could not be sent.
+    // request could not be sent. A preference directory that others could
+    // change (Dir::CheckPrefDir) goes to `error` at once, before anything is
+    // read or sent.
     bool PreviewSync(const PreviewSuccessCallback& success, const SyncErrorCallback& error, SyncMode mode,
                      const ItemToFileCallback& itemToFile);
 

@@ -164,6 +164,12 @@ private:
 bool SyncFilesService::PreviewSync(const PreviewSuccessCallback& success, const SyncErrorCallback& error,
                                    SyncMode mode, const ItemToFileCallback& itemToFile)
 {
+    try {
+        Dir::CheckPrefDir();
+    } catch (const std::exception& e) {
+        error(AsciiToUTF16(e.what()));
+        return true;  // the error callback has run
+    }
     const boost::shared_ptr<SyncCache> cache(new PreviewCache(GetApi(), mSyncFiles, mSyncDirs, itemToFile));
     const boost::shared_ptr<PreviewChain> chain(new PreviewChain(cache, mSyncDirs, mode, success, error));
     return chain->Start();

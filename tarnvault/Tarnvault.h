@@ -85,6 +85,11 @@ public:
     explicit Tarnvault(const ParameterList& parameters);
     ~Tarnvault();
 
+    // Both refuse a preference directory that others could change
+    // (Dir::CheckPrefDir) before they touch a file there: SetCredentials
+    // stores nothing ("OvraLogin error: " and the reason, traced), and
+    // CheckConnection reports SyncServer_ConnectionFailed with the reason
+    // traced after "CheckConnectionError: ", leaving the stored sign-in alone.
     bool SetCredentials(const ConnectionStateCallback& stateCallback, const OvraCredentials& credentials) override;
     bool CheckConnection(const ConnectionStateCallback& stateCallback) override;
     bool Logout(const ConnectionStateCallback& stateCallback) override;

@@ -99,9 +99,12 @@ bool Tarnvault::SetCredentials(const ConnectionStateCallback& stateCallback, con
                     << credentials.userID);
     if (!credentials.accessToken.empty()) {
         try {
+            // Nothing is written into a directory that others could change.
+            Dir::CheckPrefDir();
             const File file = getLastUserFile();
             file.Create(false);
-            tolmocore::filesupport::OPlatformByteStream stream(file, 0);
+            // Private, and a link planted at its name is replaced, not written through.
+            tolmocore::filesupport::OPlatformByteStream stream(file, 0, 0600);
             const UTF8String text = FormatLastUserText(credentials.userID);
             stream.WriteBlock(text.data(), static_cast<unsigned int>(text.size()));
             Keychain::SetPassword(getKeyChainDomain(u"Access"), UTF8to16(credentials.userID),
@@ -126,6 +129,15 @@ bool Tarnvault::SetCredentials(const ConnectionStateCallback& stateCallback, con
 bool Tarnvault::CheckConnection(const ConnectionStateCallback& stateCallback)
 {
     mConnectionState = SyncServer_Checking;
+    // Checked here and not in loadCredentials: its failure path deletes the
+    // last-user file, and a refused directory must not sign the user out.
+    try {
+        Dir::CheckPrefDir();
+    } catch (const std::exception& e) {
+        TOLMO_TRACE("Tarnvault", 1, "CheckConnectionError: " << e.what());
+        ReportState(stateCallback, SyncServer_ConnectionFailed);
+        return true;
+    }
     const OvraCredentials credentials = loadCredentials(getLastUserFile());
     if (credentials.accessToken.empty()) {
         ReportState(stateCallback, SyncServer_NotLoggedIn);

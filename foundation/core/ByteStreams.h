@@ -8,6 +8,10 @@
 // never an empty or torn file. A stream destroyed without Close() deletes its
 // temporary and leaves the target as it was.
 //
+// Every write, sync, rename and permission change goes through the
+// process-wide FileOps (FileOps.h), which tests replace to watch the order of
+// operations or to fail one.
+//
 // Failures throw FileSystemError (a std::runtime_error) naming the path. A
 // stream is used by one thread at a time. The flags are reserved: callers
 // pass 1, and no bit changes anything.
@@ -18,11 +22,15 @@
 
 #include <sys/types.h>
 
+#include <boost/shared_ptr.hpp>
+
 #include "foundation/core/File.h"
 #include "foundation/core/SmallBlockAllocator.h"
 
 namespace tolmocore {
 namespace filesupport {
+
+class FileOps;
 
 class IPlatformByteStream {
 public:
@@ -48,15 +56,18 @@ private:
 class OPlatformByteStream {
 public:
     // Opens for writing by making the temporary in the target's directory.
-    // The result keeps the permission bits (and, where allowed, the owner) of
-    // the file it replaces; a new file gets 0666 less the umask. If the target
-    // is a symbolic link, the file it points to is replaced and the link stays.
-    // Throws if the target is a directory or the temporary cannot be made (a
-    // missing directory included).
+    // The result keeps the permission bits (and, where allowed, the owner and
+    // group) of the file it replaces; a new file gets 0666 less the umask. If
+    // the target is a symbolic link, the file it points to is replaced and the
+    // link stays. Throws if the target is a directory or the temporary cannot
+    // be made (a missing directory included).
     OPlatformByteStream(const File& file, Flags<unsigned int> flags);
-    // The same with the permission bits given: the temporary is made with
-    // exactly these (never wider, whatever the umask or the old file) before a
-    // byte is written. For private files such as the keychain store.
+    // For private files (the cache file, the last-user file, the keychain
+    // store, backup copies): the temporary is made with O_EXCL|O_NOFOLLOW and
+    // exactly these permission bits (never wider, whatever the umask or the
+    // old file) before a byte is written, and the rename replaces whatever is
+    // at the file's name. A symbolic link planted there is replaced, never
+    // written through, and what it points to is left alone.
     OPlatformByteStream(const File& file, Flags<unsigned int> flags, mode_t permissions);
     // Without a successful Close(): deletes the temporary; the target keeps
     // its old bytes. Never throws.
@@ -77,9 +88,10 @@ private:
     void Flush();
     void Discard() noexcept;
 
-    File mFile;              // what the caller named
-    UTF16String mTarget;     // what is replaced: mFile, or the file a link points to
-    std::string mTemporary;  // as the system names it; empty once gone
+    boost::shared_ptr<FileOps> mOps;  // the one instance this stream uses throughout
+    File mFile;                       // what the caller named
+    UTF16String mTarget;              // what is replaced: mFile, or the file a link points to
+    std::string mTemporary;           // as the system names it; empty once gone
     int mFd;
     std::vector<unsigned char> mBuffer;
     bool mClosed;

@@ -8,6 +8,7 @@
 #include <system_error>
 
 #include "foundation/core/DirListing.h"
+#include "foundation/core/FileOps.h"
 #include "foundation/core/FileTimes.h"
 #include "foundation/core/PathNames.h"
 #include "foundation/core/TreeRemoval.h"
@@ -47,6 +48,24 @@ bool Dir::Create() const
     const bool made = std::filesystem::create_directories(detail::NativePath(mPath), error);
     if (error) ThrowFileSystemError("Cannot create the directory", mPath, error.value());
     return made;
+}
+
+bool Dir::CreatePrivate() const
+{
+    const std::string native = detail::NativePath(mPath);
+    if (::mkdir(native.c_str(), 0700) == 0) return true;
+    if (errno == ENOENT) {
+        Parent().Create();
+        if (::mkdir(native.c_str(), 0700) == 0) return true;
+    }
+    if (errno == EEXIST && Exists()) return false;
+    ThrowFileSystemError("Cannot create the directory", mPath);
+}
+
+void Dir::Sync() const
+{
+    if (GetFileOps()->SyncDirectory(detail::NativePath(mPath)) != 0 && errno != EINVAL)
+        ThrowFileSystemError("Cannot sync the directory", mPath);
 }
 
 bool Dir::Delete() const

@@ -44,6 +44,15 @@ public:
     // false if it existed already; throws if something else is in the way or
     // the system refuses.
     bool Create() const;
+    // The same, but the directory itself is made readable by its owner alone
+    // (0700); missing parents get the usual mode. A directory that exists
+    // keeps its mode.
+    bool CreatePrivate() const;
+    // Makes the directory's entries durable: a rename into it, or a file made
+    // in it, survives a crash from then on. Goes through FileOps (FileOps.h).
+    // Throws on failure; a file system that cannot sync a directory (EINVAL)
+    // has nothing more to offer and counts as done.
+    void Sync() const;
     // Removes the directory with everything in it. Symbolic links inside are
     // removed as links and their targets are left alone; if this Dir itself
     // names a link, only the link goes. Gives false if nothing was there;
@@ -91,6 +100,18 @@ public:
     static Dir PrefDir();
     // Replaces the default; an empty Dir() restores it.
     static void SetPrefDir(const Dir& directory);
+    // Refuses a preference directory that someone else could change under the
+    // library: throws FileSystemError (EACCES) naming it if it belongs to
+    // another user, is writable by others, or is writable by its group while
+    // that group is not its owner's own (a group of the owner's name with no
+    // other member, as a umask of 002 leaves directories on systems that give
+    // each user a group). A missing directory passes: what the library makes
+    // there is 0700. Runs before the library touches a file there; never in
+    // the loading of stored credentials, whose failure would sign the user out.
+    static void CheckPrefDir();
+    // True lets any preference directory pass CheckPrefDir, for a host that
+    // shares one deliberately. False (the default) restores the check.
+    static void SetAllowSharedPrefDir(bool allow);
     // The directory of the host application: what SetAppDir set, or else the
     // directory of the running executable. Throws if that cannot be read.
     static Dir AppDir();

@@ -9,6 +9,7 @@
 #include <vector>
 
 #include "foundation/core/ByteStreams.h"
+#include "foundation/core/FileOps.h"
 #include "foundation/core/FileTimes.h"
 #include "foundation/core/PathNames.h"
 
@@ -66,9 +67,31 @@ void File::Rename(const UTF16String& newName)
     if (::lstat(detail::NativePath(mPath).c_str(), &info) != 0) ThrowFileSystemError("Cannot rename", mPath);
     if (S_ISDIR(info.st_mode)) ThrowFileSystemError("Cannot rename", mPath, EISDIR);
     if (newPath == mPath) return;
-    if (::rename(detail::NativePath(mPath).c_str(), detail::NativePath(newPath).c_str()) != 0)
+    if (GetFileOps()->Rename(detail::NativePath(mPath), detail::NativePath(newPath)) != 0)
         ThrowFileSystemError("Cannot rename " + utility::ToNarrow(mPath) + " to", newPath);
     mPath = newPath;
+}
+
+void File::PrepareToReplace(const File& target) const
+{
+    struct stat old;
+    const bool replacing = ::stat(detail::NativePath(target.mPath).c_str(), &old) == 0 && S_ISREG(old.st_mode);
+    const boost::shared_ptr<FileOps> ops = GetFileOps();
+    const int fd = ops->Open(detail::NativePath(mPath), O_RDONLY | O_NOFOLLOW | O_CLOEXEC, 0);
+    if (fd < 0) ThrowFileSystemError("Cannot open", mPath);
+    int result = 0;
+    if (replacing) {
+        // The owner goes first, as a change of owner clears set-id bits.
+        if ((old.st_uid != ::geteuid() || old.st_gid != ::getegid()) && ops->Fchown(fd, old.st_uid, old.st_gid) != 0 &&
+            errno != EPERM)
+            result = -1;
+        if (result == 0) result = ops->Fchmod(fd, old.st_mode & 07777);
+    }
+    if (result == 0 && ops->Fsync(fd) != 0 && errno != EINVAL) result = -1;
+    const int error = errno;
+    ops->Close(fd);
+    if (result != 0)
+        ThrowFileSystemError("Cannot ready " + utility::ToNarrow(mPath) + " to replace", target.mPath, error);
 }
 
 void File::CopyTo(const File& target) const

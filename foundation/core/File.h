@@ -49,7 +49,16 @@ public:
     // step, so that name never goes missing: callers back it up first. A
     // directory under `newName` is never replaced. Afterwards this object
     // names the new file. Throws if the file is missing or the system refuses.
+    // Goes through FileOps (FileOps.h).
     void Rename(const UTF16String& newName);
+    // Readies this file to be renamed over `target`: gives it the target's
+    // permission bits and, where the process may, its owner and group (a
+    // missing target leaves this file's own, which for a new file is the
+    // umask's default), then syncs it. Done before the rename, the file under
+    // the target's name is never more open than it was. Goes through FileOps;
+    // a symbolic link in this file's place is refused. Throws on failure, a
+    // refused change of owner (EPERM) aside.
+    void PrepareToReplace(const File& target) const;
     // Makes `target` a copy of this file: the same bytes, permission bits and
     // modification time. The target is replaced atomically, as by
     // OPlatformByteStream; on failure it keeps its old bytes. Throws on any

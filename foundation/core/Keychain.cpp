@@ -57,7 +57,7 @@ bool ReadStore(const File& store, KeychainEntries& entries)
 bool WriteStore(const File& store, const KeychainEntries& entries)
 {
     try {
-        store.Parent().Create();
+        store.Parent().CreatePrivate();
         const std::string text = detail::SerializeKeychainStore(entries);
         filesupport::OPlatformByteStream out(store, 1, kStorePermissions);
         out.WriteBlock(reinterpret_cast<const unsigned char*>(text.data()), static_cast<unsigned int>(text.size()));

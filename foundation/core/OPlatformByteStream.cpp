@@ -10,6 +10,7 @@
 #include <system_error>
 
 #include "foundation/core/ByteStreams.h"
+#include "foundation/core/FileOps.h"
 #include "foundation/core/PathNames.h"
 
 namespace tolmocore {
@@ -50,10 +51,10 @@ UTF16String ReplacedPath(const UTF16String& path)
     return utility::ToUTF16(resolved.string());
 }
 
-void WriteAll(int fd, const unsigned char* data, size_t size, const UTF16String& shownPath)
+void WriteAll(FileOps& ops, int fd, const unsigned char* data, size_t size, const UTF16String& shownPath)
 {
     while (size > 0) {
-        const ssize_t count = ::write(fd, data, size);
+        const ssize_t count = ops.Write(fd, data, size);
         if (count > 0) {
             data += count;
             size -= static_cast<size_t>(count);
@@ -63,7 +64,7 @@ void WriteAll(int fd, const unsigned char* data, size_t size, const UTF16String&
     }
 }
 
-// Some file systems cannot sync a directory (EINVAL); that is all they offer.
+// Some file systems cannot sync a file (EINVAL); that is all they offer.
 bool SyncFailed(int result)
 {
     return result != 0 && errno != EINVAL;
@@ -71,23 +72,27 @@ bool SyncFailed(int result)
 
 }  // namespace
 
-OPlatformByteStream::OPlatformByteStream(const File& file, Flags<unsigned int>) : mFile(file), mFd(-1), mClosed(false)
+OPlatformByteStream::OPlatformByteStream(const File& file, Flags<unsigned int>)
+    : mOps(GetFileOps()), mFile(file), mFd(-1), mClosed(false)
 {
     Open(0, false);
 }
 
 OPlatformByteStream::OPlatformByteStream(const File& file, Flags<unsigned int>, mode_t permissions)
-    : mFile(file), mFd(-1), mClosed(false)
+    : mOps(GetFileOps()), mFile(file), mFd(-1), mClosed(false)
 {
     Open(permissions & 07777, true);
 }
 
 void OPlatformByteStream::Open(mode_t permissions, bool permissionsGiven)
 {
-    mTarget = ReplacedPath(mFile.FullPath());
-    const UTF16String directory = detail::ParentPath(mTarget);
+    // A private file replaces a link planted at its name instead of writing
+    // through it; any other write replaces what the user's link points to.
+    mTarget = permissionsGiven ? mFile.FullPath() : ReplacedPath(mFile.FullPath());
+    const std::string nativeTarget = detail::NativePath(mTarget);
     struct stat old;
-    const bool exists = ::stat(detail::NativePath(mTarget).c_str(), &old) == 0;
+    const bool exists =
+        (permissionsGiven ? ::lstat(nativeTarget.c_str(), &old) : ::stat(nativeTarget.c_str(), &old)) == 0;
     if (exists && S_ISDIR(old.st_mode)) ThrowFileSystemError("Cannot open for writing", mFile.FullPath(), EISDIR);
     const bool replacing = exists && S_ISREG(old.st_mode);
     // The umask narrows the mode at creation; fchmod below sets exactly what
@@ -95,11 +100,11 @@ void OPlatformByteStream::Open(mode_t permissions, bool permissionsGiven)
     const mode_t createMode = permissionsGiven ? permissions : replacing ? (old.st_mode & 07777) : 0666;
 
     const std::string targetName = detail::NativePath(detail::LastComponent(mTarget));
-    std::string prefix = detail::NativePath(directory);
+    std::string prefix = detail::NativePath(detail::ParentPath(mTarget));
     if (prefix.back() != '/') prefix += '/';
     for (int attempt = 0; mFd < 0; ++attempt) {
         const std::string candidate = prefix + TemporaryName(targetName);
-        mFd = ::open(candidate.c_str(), O_WRONLY | O_CREAT | O_EXCL | O_CLOEXEC, createMode);
+        mFd = mOps->Open(candidate, O_WRONLY | O_CREAT | O_EXCL | O_NOFOLLOW | O_CLOEXEC, createMode);
         if (mFd >= 0) {
             mTemporary = candidate;
         } else if (errno != EEXIST || attempt + 1 >= kNameAttempts) {
@@ -109,12 +114,14 @@ void OPlatformByteStream::Open(mode_t permissions, bool permissionsGiven)
 
     int result = 0;
     if (permissionsGiven) {
-        result = ::fchmod(mFd, permissions);
+        result = mOps->Fchmod(mFd, permissions);
     } else if (replacing) {
-        // Best effort: only a privileged process may give a file away. The mode
-        // goes after, as a change of owner clears set-id bits.
-        if (old.st_uid != ::geteuid() || old.st_gid != ::getegid()) (void)!::fchown(mFd, old.st_uid, old.st_gid);
-        result = ::fchmod(mFd, old.st_mode & 07777);
+        // Only a privileged process may give a file away (EPERM otherwise).
+        // The mode goes after, as a change of owner clears set-id bits.
+        if ((old.st_uid != ::geteuid() || old.st_gid != ::getegid()) &&
+            mOps->Fchown(mFd, old.st_uid, old.st_gid) != 0 && errno != EPERM)
+            result = -1;
+        if (result == 0) result = mOps->Fchmod(mFd, old.st_mode & 07777);
     }
     if (result != 0) {
         const int error = errno;
@@ -135,7 +142,7 @@ void OPlatformByteStream::WriteBlock(const unsigned char* buffer, unsigned int s
     try {
         if (mBuffer.size() + size > kBufferSize) Flush();
         if (size >= kBufferSize)
-            WriteAll(mFd, buffer, size, mFile.FullPath());
+            WriteAll(*mOps, mFd, buffer, size, mFile.FullPath());
         else
             mBuffer.insert(mBuffer.end(), buffer, buffer + size);
     } catch (...) {
@@ -146,7 +153,7 @@ void OPlatformByteStream::WriteBlock(const unsigned char* buffer, unsigned int s
 
 void OPlatformByteStream::Flush()
 {
-    WriteAll(mFd, mBuffer.data(), mBuffer.size(), mFile.FullPath());
+    WriteAll(*mOps, mFd, mBuffer.data(), mBuffer.size(), mFile.FullPath());
     mBuffer.clear();
 }
 
@@ -156,31 +163,25 @@ void OPlatformByteStream::Close()
     if (mFd < 0) ThrowFileSystemError("Cannot close a failed stream on", mFile.FullPath(), EBADF);
     try {
         Flush();
-        if (SyncFailed(::fsync(mFd))) ThrowFileSystemError("Cannot write", mFile.FullPath());
+        if (SyncFailed(mOps->Fsync(mFd))) ThrowFileSystemError("Cannot write", mFile.FullPath());
         const int fd = mFd;
         mFd = -1;
-        if (::close(fd) != 0) ThrowFileSystemError("Cannot write", mFile.FullPath());
-        if (::rename(mTemporary.c_str(), detail::NativePath(mTarget).c_str()) != 0)
+        if (mOps->Close(fd) != 0) ThrowFileSystemError("Cannot write", mFile.FullPath());
+        if (mOps->Rename(mTemporary, detail::NativePath(mTarget)) != 0)
             ThrowFileSystemError("Cannot replace", mFile.FullPath());
     } catch (...) {
         Discard();
         throw;
     }
     mClosed = true;
-
+    mTemporary.clear();
     // The rename is only durable once the directory entry is on the disk.
-    const UTF16String directory = detail::ParentPath(mTarget);
-    const int directoryFd = ::open(detail::NativePath(directory).c_str(), O_RDONLY | O_DIRECTORY | O_CLOEXEC);
-    if (directoryFd < 0) ThrowFileSystemError("Cannot sync the directory", directory);
-    const bool failed = SyncFailed(::fsync(directoryFd));
-    const int error = errno;
-    ::close(directoryFd);
-    if (failed) ThrowFileSystemError("Cannot sync the directory", directory, error);
+    Dir(detail::ParentPath(mTarget)).Sync();
 }
 
 void OPlatformByteStream::Discard() noexcept
 {
-    if (mFd >= 0) ::close(mFd);
+    if (mFd >= 0) mOps->Close(mFd);
     mFd = -1;
     if (!mTemporary.empty()) ::unlink(mTemporary.c_str());
     mTemporary.clear();

@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <sys/stat.h>
+
 #include <memory>
 #include <regex>
 
@@ -13,6 +15,13 @@ namespace {
 
 using clitest::Finished;
 using clitest::RunCli;
+namespace fs = std::filesystem;
+
+unsigned ModeOf(const fs::path& path)
+{
+    struct stat info;
+    return ::stat(path.c_str(), &info) == 0 ? info.st_mode & 07777 : ~0u;
+}
 
 bool Contains(const std::string& text, const std::string& part)
 {
@@ -69,11 +78,17 @@ TEST(SignInCommands, LoginStatusSyncRestartSyncLogoutCycle)
 
     const Finished login = run({"login", "--user", "ann"}, {"TOLMONETSYNC_PASSWORD=secret"});
     ASSERT_EQ(login.mStatus, 0) << login.mErr;
+    // The command made the preference directory, and what it stores there is private.
+    EXPECT_EQ(ModeOf(root / "pref"), 0700u);
+    EXPECT_EQ(ModeOf(root / "pref" / "tarnvaultuser.txt"), 0600u);
+    EXPECT_EQ(ModeOf(root / "pref" / "keychain.store"), 0600u);
     const Finished connected = run({"status"});
     EXPECT_EQ(connected.mStatus, 0);
     EXPECT_EQ(connected.mOut, "connected\n");
     const Finished synced = run(sync);
     EXPECT_EQ(synced.mStatus, 0) << synced.mErr;
+    EXPECT_EQ(ModeOf(root / "pref" / "tolmonetsynccache.json"), 0600u);
+    EXPECT_EQ(ModeOf(root / "pref" / "SyncBackup"), 0700u);
 
     // Every command is a new process; the service restarts too, on its data.
     service.reset();
@@ -128,6 +143,22 @@ TEST(SignInCommands, TracingShowsNeitherThePasswordNorAnyTokenAndLogoutClearsThe
     // The access and refresh tokens go with the sign-in, and the device token too.
     ASSERT_EQ(run({"logout"}, {}).mStatus, 0);
     EXPECT_TRUE(StoredSecrets(root / "pref").empty());
+}
+
+TEST(SignInCommands, APreferenceDirectoryOthersCanWriteIsRefusedUnlessAllowed)
+{
+    testsupport::TempDir root;
+    const fs::path pref = root / "shared";
+    fs::create_directory(pref);
+    fs::permissions(pref, fs::perms::all);
+    const Finished refused = RunCli({"--pref-dir", pref.string(), "status"});
+    EXPECT_EQ(refused.mStatus, 1);
+    EXPECT_EQ(refused.mErr, "tolmonetsync status: Refusing the preference directory " + pref.string() +
+                                ": it is writable by other users (mode 0777)\n");
+    EXPECT_TRUE(fs::is_empty(pref));
+
+    const Finished allowed = RunCli({"--allow-shared-pref-dir", "--pref-dir", pref.string(), "status"});
+    EXPECT_EQ(allowed.mOut, "not-logged-in\n") << allowed.mErr;
 }
 
 }  // namespace

@@ -160,3 +160,16 @@ TEST_F(CacheFileTest, SaveReplacesTheWholeFileAndFoldsPresentStateIn)
     empty.SaveCache();
     EXPECT_EQ(ReadFileBytes(CacheFilePath()), "[]");
 }
+
+TEST_F(CacheFileTest, SavedFileIsPrivateAndReplacesALinkPlantedAtItsName)
+{
+    WriteFileBytes(mWork / "victim", "someone else's");
+    fs::permissions(mWork / "victim", static_cast<fs::perms>(0644));
+    fs::create_symlink(mWork / "victim", CacheFilePath());
+    Plan()->SaveCache();
+    EXPECT_FALSE(fs::is_symlink(CacheFilePath()));
+    EXPECT_EQ(fs::status(CacheFilePath()).permissions(), fs::perms::owner_read | fs::perms::owner_write);
+    EXPECT_NE(ReadFileBytes(CacheFilePath()).find("a.xmp"), std::string::npos);
+    EXPECT_EQ(ReadFileBytes(mWork / "victim"), "someone else's");
+    EXPECT_EQ(fs::status(mWork / "victim").permissions(), static_cast<fs::perms>(0644));
+}

@@ -9,6 +9,7 @@
 #include "InMemoryScenarioServer.h"
 #include "SyncHarness.h"
 #include "SyncTestSupport.h"
+#include "support/FileOpsRecorder.h"
 
 using namespace synctest;
 using namespace testsupport;
@@ -175,4 +176,71 @@ TEST_F(FailuresTest, ProgressAndCancelFromAnotherThreadDuringAPass)
     ASSERT_TRUE(result.Ok()) << result.mError;  // the in-memory server's requests cannot be cancelled
     EXPECT_EQ(result.mMoved, 200);
     EXPECT_EQ(host->Service().GetStatus(), SyncStatus_Syncing);
+}
+
+TEST_F(FailuresTest, DiskFaultsInTheSwapFailThePassAndKeepTheCacheFile)
+{
+    WriteFileBytes(Preset("A.xmp"), "a1");
+    ASSERT_TRUE(NewHost()->Sync(SyncMode_TwoWay).Ok());
+    const std::string before = CacheFile();
+    mServer.PutItem("Presets", "A.xmp", "a2");
+    const std::string target = Preset("A.xmp").string();
+    {
+        // The download cannot be made durable before the rename: the old file stays.
+        FileOpsRecorder disk;
+        disk.FailNext("fsync", target + ".temp", EIO);
+        const RunResult failed = NewHost()->Sync(SyncMode_TwoWay);
+        EXPECT_TRUE(disk.AllFailuresMet());
+        EXPECT_FALSE(failed.mFinished);
+        EXPECT_NE(failed.mError.find("A.xmp"), std::string::npos) << failed.mError;
+        EXPECT_EQ(ReadFileBytes(Preset("A.xmp")), "a1");
+        EXPECT_EQ(CacheFile(), before);
+    }
+    {
+        // The rename cannot be made durable: the cache file must not record it.
+        FileOpsRecorder disk;
+        disk.FailNext("dirsync", (mDesk.Path() / "Presets").string(), EIO, "rename " + target + ".temp -> " + target);
+        const RunResult failed = NewHost()->Sync(SyncMode_TwoWay);
+        EXPECT_TRUE(disk.AllFailuresMet());
+        EXPECT_FALSE(failed.mFinished);
+        EXPECT_NE(failed.mError.find("Cannot sync the directory"), std::string::npos) << failed.mError;
+        EXPECT_EQ(CacheFile(), before);
+    }
+}
+
+TEST_F(FailuresTest, PreferenceDirectoryOthersCanWriteIsRefusedBeforeAnythingIsTouched)
+{
+    WriteFileBytes(Preset("A.xmp"), "a");
+    fs::permissions(mPrefs.Path(), fs::perms::all);
+    const std::string named = "Refusing the preference directory " + mPrefs.Path().string() + ": it is writable";
+    const RunResult preview = NewHost()->Preview(SyncMode_TwoWay);
+    EXPECT_EQ(preview.mError.find(named), 0u) << preview.mError;
+    try {
+        NewHost()->Prepare();
+        ADD_FAILURE() << "PrepareSync accepted a directory others can write";
+    } catch (const std::exception& e) {
+        EXPECT_EQ(std::string(e.what()).find(named), 0u) << e.what();
+    }
+    EXPECT_TRUE(fs::is_empty(mPrefs.Path()));
+    EXPECT_TRUE(mServer.Groups().empty());
+
+    Dir::SetAllowSharedPrefDir(true);
+    const RunResult allowed = NewHost()->Sync(SyncMode_TwoWay);
+    Dir::SetAllowSharedPrefDir(false);
+    ASSERT_TRUE(allowed.Ok()) << allowed.mError;
+    EXPECT_EQ(mServer.Items("Presets"), (std::map<std::string, std::string>{{"A.xmp", "a"}}));
+}
+
+TEST_F(FailuresTest, ABackupDirectoryThatIsALinkIsRefusedThroughPrepareSync)
+{
+    TempDir elsewhere;
+    fs::create_directory_symlink(elsewhere.Path(), mPrefs.Path() / "SyncBackup");
+    try {
+        NewHost()->Prepare();
+        ADD_FAILURE() << "PrepareSync used a linked SyncBackup";
+    } catch (const std::exception& e) {
+        EXPECT_EQ(std::string(e.what()), "Refusing the backup directory " + (mPrefs.Path() / "SyncBackup").string() +
+                                             ": it is a symbolic link");
+    }
+    EXPECT_TRUE(fs::is_empty(elsewhere.Path()));
 }

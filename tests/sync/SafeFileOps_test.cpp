@@ -3,6 +3,8 @@
 
 #include <gtest/gtest.h>
 
+#include <sys/stat.h>
+
 #include <boost/date_time/posix_time/posix_time.hpp>
 
 #include "SyncTestSupport.h"
@@ -69,6 +71,32 @@ TEST_F(SafeFileOpsTest, PruningDeletesTheTenOldestAtElevenAndClimbsAgain)
     EXPECT_EQ(ReadFileBytes(BackupDirs()[0] / "saved.xmp"), "copy 11");
     makeCache();
     EXPECT_EQ(BackupDirs().size(), 2u);
+}
+
+TEST_F(SafeFileOpsTest, BackupDirectoriesArePrivateAndPruningTouchesOnlyItsOwn)
+{
+    // What the library makes is 0700, the preference directory included.
+    testsupport::TempDir temp;
+    Dir::SetPrefDir(DirAt(temp / "made"));
+    const mode_t oldMask = ::umask(0);
+    const Dir made = SyncCache::NewBackupDir();
+    ::umask(oldMask);
+    for (const fs::path& path :
+         {temp / "made", temp / "made" / "SyncBackup", fs::path(tolmocore::utility::ToNarrow(made.FullPath()))})
+        EXPECT_EQ(fs::status(path).permissions(), fs::perms::owner_all) << path;
+    Dir::SetPrefDir(DirAt(mPrefs.Path()));
+
+    // A link named like a backup and a directory of someone else's stay, and
+    // so does everything behind the link.
+    const fs::path root = mPrefs.Path() / "SyncBackup";
+    fs::create_directories(root / "Keep");
+    fs::create_directories(mWork / "elsewhere");
+    WriteFileBytes(mWork / "elsewhere" / "precious", "p");
+    fs::create_directory_symlink(mWork / "elsewhere", root / "Backup_00000000-000000_000000");
+    for (int i = 0; i < 12; ++i) SyncCache::NewBackupDir();
+    EXPECT_TRUE(fs::is_symlink(root / "Backup_00000000-000000_000000"));
+    EXPECT_TRUE(fs::is_directory(root / "Keep"));
+    EXPECT_EQ(ReadFileBytes(mWork / "elsewhere" / "precious"), "p");
 }
 
 TEST_F(SafeFileOpsTest, SwapBacksUpTheOldFileAndPutsTheDownloadInPlace)

@@ -1,6 +1,11 @@
 #include "SyncScenarios.h"
 
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include <fstream>
+
+#include "support/FileOpsRecorder.h"
 
 namespace synctest {
 
@@ -65,6 +70,13 @@ namespace {
 
 using Files = std::map<std::string, std::string>;
 
+struct stat StatOf(const fs::path& path)
+{
+    struct stat info {};
+    EXPECT_EQ(::stat(path.c_str(), &info), 0) << path;
+    return info;
+}
+
 // Gives a file a modification date clearly apart from the last one, so a
 // change shows even on file systems with coarse timestamps.
 void Touch(const fs::path& path)
@@ -117,6 +129,63 @@ TEST_P(SyncScenarios, ChangesTravelBothWaysAndReplacedFilesAreBackedUp)
     EXPECT_EQ(ReadLocal(PresetPath("Remote.xmp")), "v2 from elsewhere");
     EXPECT_EQ(Backups()["Remote.xmp"], "v1");
     EXPECT_FALSE(fs::exists(PresetPath("Remote.xmp.temp")));
+}
+
+TEST_P(SyncScenarios, DownloadsKeepTheReplacedFilesAccessAndNewFilesGetTheUmask)
+{
+    const mode_t mask = ::umask(0);  // read while nothing else makes files
+    ::umask(mask);
+    // A settings file holding a key is its owner's alone, and stays so.
+    WriteFileBytes(SettingsPath(), "{\"key\":\"one\"}");
+    ASSERT_TRUE(Sync(SyncMode_TwoWay).Ok());
+    fs::permissions(SettingsPath(), fs::perms::owner_read | fs::perms::owner_write);
+    const bool root = ::geteuid() == 0;  // only root may give a file away
+    if (root) {
+        ASSERT_EQ(::chown(SettingsPath().c_str(), 65534, 65534), 0);
+    }
+    mServer->PutItem("Settings", "settings", "{\"key\":\"two\"}");
+    mServer->PutItem("Presets", "New.xmp", "new");
+
+    const RunResult result = Sync(SyncMode_TwoWay);
+    ASSERT_TRUE(result.Ok()) << result.mError;
+    EXPECT_EQ(ReadLocal(SettingsPath()), "{\"key\":\"two\"}");
+    const struct stat replaced = StatOf(SettingsPath());
+    EXPECT_EQ(replaced.st_mode & 07777, 0600u);
+    if (root) {
+        EXPECT_EQ(replaced.st_uid, 65534u);
+        EXPECT_EQ(replaced.st_gid, 65534u);
+    }
+    fs::path backup;
+    for (const auto& dir : fs::directory_iterator(mPrefs.Path() / "SyncBackup"))
+        if (fs::exists(dir.path() / "settings.json")) backup = dir.path() / "settings.json";
+    ASSERT_FALSE(backup.empty());
+    EXPECT_EQ(ReadFileBytes(backup), "{\"key\":\"one\"}");
+    EXPECT_EQ(StatOf(backup).st_mode & 07777, 0600u);
+    EXPECT_EQ(StatOf(PresetPath("New.xmp")).st_mode & 07777, 0666u & ~mask);
+}
+
+TEST_P(SyncScenarios, TheCacheFileIsSavedOnlyAfterEverySwapIsDurable)
+{
+    WriteFileBytes(SettingsPath(), "s1");
+    WritePreset("A.xmp", "a1");
+    ASSERT_TRUE(Sync(SyncMode_TwoWay).Ok());
+    mServer->PutItem("Settings", "settings", "s2");
+    mServer->PutItem("Presets", "A.xmp", "a2");
+    testsupport::FileOpsRecorder disk;
+    const RunResult result = Sync(SyncMode_TwoWay);
+    ASSERT_TRUE(result.Ok()) << result.mError;
+    EXPECT_EQ(ReadLocal(PresetPath("A.xmp")), "a2");
+
+    const int cacheSaved = disk.IndexOfPrefix("rename " + (mPrefs.Path() / ".tolmonetsynccache.json.tmsw-").string());
+    ASSERT_GE(cacheSaved, 0);
+    for (const fs::path& swapped : {PresetPath("A.xmp"), SettingsPath()}) {
+        const int renamed = disk.IndexOf("rename " + swapped.string() + ".temp -> " + swapped.string());
+        ASSERT_GE(renamed, 0) << swapped;
+        const int synced = disk.IndexOf("dirsync " + swapped.parent_path().string(), renamed);
+        EXPECT_GT(synced, renamed) << swapped;
+        EXPECT_LT(synced, cacheSaved) << swapped;
+    }
+    EXPECT_GT(disk.IndexOf("dirsync " + mPrefs.Path().string(), cacheSaved), cacheSaved);
 }
 
 TEST_P(SyncScenarios, TwoWayLetsALocalChangeWinOverAServerChange)

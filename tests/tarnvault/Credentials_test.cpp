@@ -92,6 +92,56 @@ TEST_F(CredentialsTest, SetCredentialsStoresThemAndProvesTheStoredToken)
     EXPECT_FALSE(mClient->CachedRoot());
 }
 
+TEST_F(CredentialsTest, StoredSignInIsPrivateAndNeverWrittenThroughALink)
+{
+    testsupport::TempDir elsewhere;
+    WriteFileBytes(elsewhere / "victim", "not yours");
+    std::filesystem::create_symlink(elsewhere / "victim", mPrefs.Path() / "tarnvaultuser.txt");
+    mService.Script(200, "[" + kRoot + "]");
+    States states;
+    EXPECT_TRUE(mClient->SetCredentials(states.Callback(), Credentials("acc-1", "ref-1", "user-7")));
+    ASSERT_TRUE(states.Wait());
+    EXPECT_EQ(states.Seen(), StateList{SyncServer_Connected});
+    EXPECT_FALSE(std::filesystem::is_symlink(mPrefs.Path() / "tarnvaultuser.txt"));
+    EXPECT_EQ(ReadFileBytes(elsewhere / "victim"), "not yours");
+    for (const char* name : {"tarnvaultuser.txt", "keychain.store"})
+        EXPECT_EQ(std::filesystem::status(mPrefs.Path() / name).permissions(),
+                  std::filesystem::perms::owner_read | std::filesystem::perms::owner_write)
+            << name;
+}
+
+TEST_F(CredentialsTest, APreferenceDirectoryOthersCanWriteIsRefusedWithoutSigningOut)
+{
+    mService.Script(200, "[" + kRoot + "]");
+    States stored;
+    ASSERT_TRUE(mClient->SetCredentials(stored.Callback(), Credentials("acc-1", "ref-1", "user-7")));
+    ASSERT_TRUE(stored.Wait());
+    std::filesystem::permissions(mPrefs.Path(), std::filesystem::perms::all);
+    const std::size_t requests = mService.Requests().size();
+    testsupport::TraceCapture trace("Tarnvault:1");
+    States checked, set;
+    EXPECT_TRUE(mClient->CheckConnection(checked.Callback()));
+    EXPECT_TRUE(mClient->SetCredentials(set.Callback(), Credentials("acc-2", "ref-2", "user-8")));
+    EXPECT_EQ(checked.Seen(), StateList{SyncServer_ConnectionFailed});
+    EXPECT_EQ(set.Seen(), StateList{SyncServer_ConnectionFailed});
+    EXPECT_EQ(mService.Requests().size(), requests);
+    const std::string named = "Refusing the preference directory " + mPrefs.Path().string() + ": it is writable";
+    EXPECT_TRUE(trace.Contains("CheckConnectionError: " + named));
+    EXPECT_TRUE(trace.Contains("OvraLogin error: " + named));
+    // Nobody was signed out, and nobody new was stored.
+    EXPECT_EQ(ReadFileBytes(mPrefs.Path() / "tarnvaultuser.txt"), R"({"mUserID":"user-7"})");
+    EXPECT_EQ(tolmocore::Keychain::GetPassword(Domain(u"Access"), u"user-8"), UTF16String());
+
+    tolmocore::filesupport::Dir::SetAllowSharedPrefDir(true);
+    mService.Script(200, "[" + kRoot + "]");
+    States allowed;
+    EXPECT_TRUE(mClient->CheckConnection(allowed.Callback()));
+    const bool came = allowed.Wait();
+    tolmocore::filesupport::Dir::SetAllowSharedPrefDir(false);
+    ASSERT_TRUE(came);
+    EXPECT_EQ(allowed.Seen(), StateList{SyncServer_Connected});
+}
+
 TEST_F(CredentialsTest, AStoredTokenMakesAClientWithoutOneUsable)
 {
     WriteFileBytes(mPrefs.Path() / "tarnvaultuser.txt", R"({"mUserID":"u"})");

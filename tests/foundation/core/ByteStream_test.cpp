@@ -9,6 +9,7 @@
 #include <thread>
 
 #include "foundation/core/ByteStreams.h"
+#include "support/FileOpsRecorder.h"
 #include "support/TempDir.h"
 
 using namespace tolmocore::filesupport;
@@ -116,6 +117,19 @@ TEST_F(ByteStreamTest, CloseFailuresThrowAndLeaveNothing)
     EXPECT_THROW(Write(out, "more"), FileSystemError);
     EXPECT_THROW(out.Close(), FileSystemError);
 
+    // A disk that fails the sync: the old bytes stay and no temporary is left.
+    WriteFileBytes(mTemp / "kept", "old");
+    {
+        testsupport::FileOpsRecorder disk;
+        disk.FailNext("fsync", "", EIO);
+        OPlatformByteStream failing(InTemp("kept"), 1);
+        Write(failing, "new");
+        EXPECT_THROW(failing.Close(), FileSystemError);
+        EXPECT_TRUE(disk.AllFailuresMet());
+    }
+    EXPECT_EQ(ReadFileBytes(mTemp / "kept"), "old");
+    std::filesystem::remove(mTemp / "kept");
+
     EXPECT_THROW(OPlatformByteStream(File(Dir(mDir, u"missing"), u"f"), 1), FileSystemError);
     std::filesystem::create_directory(mTemp / "dir");
     EXPECT_THROW(OPlatformByteStream(InTemp("dir"), 1), FileSystemError);
@@ -150,6 +164,18 @@ TEST_F(ByteStreamTest, ReplacementKeepsPermissionsAndLinks)
     throughLink.Close();
     EXPECT_TRUE(std::filesystem::is_symlink(mTemp / "link"));
     EXPECT_EQ(ReadFileBytes(mTemp / "shared"), "via link");
+
+    // A private write replaces a link planted at its name; what it points to
+    // keeps its bytes and its mode.
+    std::filesystem::create_symlink("shared", mTemp / "planted");
+    OPlatformByteStream notThrough(InTemp("planted"), 1, 0600);
+    Write(notThrough, "private");
+    notThrough.Close();
+    EXPECT_FALSE(std::filesystem::is_symlink(mTemp / "planted"));
+    EXPECT_EQ(ReadFileBytes(mTemp / "planted"), "private");
+    EXPECT_EQ(Permissions(mTemp / "planted"), 0600u);
+    EXPECT_EQ(ReadFileBytes(mTemp / "shared"), "via link");
+    EXPECT_EQ(Permissions(mTemp / "shared"), 0640u);
 }
 
 TEST_F(ByteStreamTest, ReadsGiveExactlyWhatWasWritten)

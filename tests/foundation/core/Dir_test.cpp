@@ -3,6 +3,9 @@
 
 #include <gtest/gtest.h>
 
+#include <sys/stat.h>
+#include <unistd.h>
+
 #include <algorithm>
 #include <cerrno>
 #include <cstdlib>
@@ -88,6 +91,20 @@ TEST_F(DirTest, CreateMakesMissingParents)
     EXPECT_THROW(Dir(mDir, u"file").Create(), FileSystemError);
 }
 
+TEST_F(DirTest, CreatePrivateMakesTheDirectoryTheOwnersAlone)
+{
+    const mode_t oldMask = ::umask(0);
+    const Dir made(Dir(mDir, u"parent"), u"private");
+    const bool created = made.CreatePrivate();
+    const bool again = made.CreatePrivate();
+    ::umask(oldMask);
+    EXPECT_TRUE(created);
+    EXPECT_FALSE(again);
+    struct stat info;
+    ASSERT_EQ(::stat((mTemp / "parent" / "private").c_str(), &info), 0);
+    EXPECT_EQ(info.st_mode & 07777, 0700u);
+}
+
 TEST_F(DirTest, DeleteRemovesTheTreeButNothingBehindLinks)
 {
     const std::filesystem::path outside = mTemp / "outside";
@@ -166,4 +183,40 @@ TEST_F(DirLocationsTest, AppDirIsTheExecutablesDirectoryUntilSet)
     EXPECT_EQ(Dir::AppDir(), Dir(ToUTF16(expected.string())));
     Dir::SetAppDir(Dir(u"/opt/host"));
     EXPECT_EQ(Dir::AppDir(), Dir(u"/opt/host"));
+}
+
+TEST_F(DirLocationsTest, PrefDirOthersCouldChangeIsRefusedByName)
+{
+    testsupport::TempDir temp;
+    const std::filesystem::path pref = temp / "pref";
+    Dir::SetPrefDir(Dir(ToUTF16(pref.string())));
+    EXPECT_NO_THROW(Dir::CheckPrefDir());  // missing: it will be made 0700
+    std::filesystem::create_directory(pref);
+    ::chmod(pref.c_str(), 0755);
+    EXPECT_NO_THROW(Dir::CheckPrefDir());
+
+    auto refusal = [] {
+        try {
+            Dir::CheckPrefDir();
+        } catch (const FileSystemError& e) {
+            return std::string(e.what());
+        }
+        return std::string("accepted");
+    };
+    const std::string named = "Refusing the preference directory " + pref.string() + ": ";
+    ::chmod(pref.c_str(), 0777);
+    EXPECT_EQ(refusal(), named + "it is writable by other users (mode 0777)");
+    Dir::SetAllowSharedPrefDir(true);
+    EXPECT_EQ(refusal(), "accepted");
+    Dir::SetAllowSharedPrefDir(false);
+
+    if (::geteuid() != 0) return;  // giving a directory away takes root
+    ::chmod(pref.c_str(), 0775);
+    ASSERT_EQ(::chown(pref.c_str(), 0, 65534), 0);  // a group that is not root's own
+    EXPECT_EQ(refusal(), named + "it is writable by group 65534, which is not its owner's own (mode 0775)");
+    ASSERT_EQ(::chown(pref.c_str(), 0, 0), 0);
+    EXPECT_EQ(refusal(), "accepted");
+    ASSERT_EQ(::chown(pref.c_str(), 65534, 0), 0);
+    ::chmod(pref.c_str(), 0700);
+    EXPECT_EQ(refusal(), named + "it belongs to another user (uid 65534)");
 }

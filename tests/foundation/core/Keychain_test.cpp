@@ -57,6 +57,8 @@ TEST_F(KeychainTest, StoreIsReadableByTheUserAloneWhateverTheUmask)
     ASSERT_EQ(::stat(mStore.c_str(), &info), 0);
     EXPECT_EQ(info.st_mode & 07777, 0600u);
     EXPECT_EQ(std::distance(std::filesystem::directory_iterator(mPrefDir), {}), 1);
+    ASSERT_EQ(::stat(mPrefDir.c_str(), &info), 0);  // made by the first write
+    EXPECT_EQ(info.st_mode & 07777, 0700u);
 }
 
 TEST_F(KeychainTest, DamagedStoreKeepsWhatCanStillBeRead)
