@@ -1,6 +1,7 @@
 // Moving content: upload (after deleting what has the name) and conditional
 // download into a given file.
 
+#include <algorithm>
 #include <cstdio>
 
 #include <boost/bind/bind.hpp>
@@ -141,10 +142,29 @@ Guid Tarnvault::UploadAsync(const ItemCallback& success, const ErrorCallback& er
 
 namespace {
 
-void _HandleDownload(const File& file, const DownloadCallback& success, const ErrorCallback& error,
+constexpr char kDownloadTooLarge[] = "Data size beyond the limitation!";
+
+// Reports a download that could not be finished, and removes what it may
+// have left in its file.
+void FailDownload(const File& file, const ErrorCallback& error, const Guid& requestUID, const char* text)
+{
+    TOLMO_TRACE("Tarnvault", 1,
+                "Error: Download: " << file.FullPath() << ", error: " << text << ", requestUID: " << requestUID);
+    error(requestUID, MakeErrorResponse(tolmocore::utility::AsciiToUTF16(text)));
+    try {
+        if (file.Exists()) file.Delete();
+    } catch (const std::exception&) {
+    }
+}
+
+void _HandleDownload(const File& file, std::uint64_t limit, const DownloadCallback& success, const ErrorCallback& error,
                      const Guid& requestUID, const boost::shared_ptr<tolmonet::Response>& response)
 {
     const UTF8String body = _HandleBody("Download", requestUID, response);
+    if (tolmonet::IsResponseTooLarge(*response)) {
+        FailDownload(file, error, requestUID, kDownloadTooLarge);
+        return;
+    }
     DownloadResult result;
     if (response->status == 304) {
         success(requestUID, result);
@@ -157,7 +177,7 @@ void _HandleDownload(const File& file, const DownloadCallback& success, const Er
     try {
         file.Create(false);
         tolmocore::filesupport::OPlatformByteStream stream(file, 0);
-        if (body.size() >= kMaxBlock) throw std::runtime_error("Data size beyond the limitation!");
+        if (body.size() >= limit) throw std::runtime_error(kDownloadTooLarge);
         if (!body.empty()) stream.WriteBlock(body.data(), static_cast<unsigned int>(body.size()));
         result.mContentType = LastHeader(response, tolmonet::kHEADER_CONTENT_TYPE);
         result.mEtag = LastHeader(response, tolmonet::kHEADER_ETAG);
@@ -170,13 +190,7 @@ void _HandleDownload(const File& file, const DownloadCallback& success, const Er
                                << ", last_modified: " << result.mLastModified);
         stream.Close();
     } catch (const std::exception& e) {
-        TOLMO_TRACE("Tarnvault", 1,
-                    "Error: Download: " << file.FullPath() << ", error: " << e.what() << ", requestUID: " << requestUID);
-        error(requestUID, MakeErrorResponse(tolmocore::utility::AsciiToUTF16(e.what())));
-        try {
-            if (file.Exists()) file.Delete();
-        } catch (const std::exception&) {
-        }
+        FailDownload(file, error, requestUID, e.what());
         return;
     }
     success(requestUID, result);
@@ -194,9 +208,17 @@ Guid Tarnvault::DownloadAsync(const DownloadCallback& success, const ErrorCallba
     TOLMO_TRACE("Tarnvault", 8,
                 "Download" << ", path: " << file.FullPath() << ", asset: " << item << ", url: " << url
                            << ", etag: " << etag << ", requestUID: " << requestUID);
-    const bool taken = mProcessor->GET(requestUID, boost::bind(&_HandleDownload, file, success, error, _1, _2),
-                                       ImmutableString::CreateDynamic(url), headers, tolmonet::Configuration());
+    const std::uint64_t limit = DownloadSizeLimit();
+    tolmonet::Configuration configuration;
+    configuration.mMaxResponseBody = limit - 1;
+    const bool taken = mProcessor->GET(requestUID, boost::bind(&_HandleDownload, file, limit, success, error, _1, _2),
+                                       ImmutableString::CreateDynamic(url), headers, configuration);
     return Sent(taken, requestUID);
+}
+
+void Tarnvault::SetDownloadSizeLimit(std::uint64_t bytes)
+{
+    mDownloadSizeLimit = std::max<std::uint64_t>(1, std::min(bytes, kMaxDownloadSize));
 }
 
 }  // namespace tarnvault

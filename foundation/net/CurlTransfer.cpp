@@ -92,13 +92,14 @@ const char* MethodName(HttpMethod method)
 
 CurlTransfer::CurlTransfer(const Guid& requestUID, const ResponseHandler& handler, HttpMethod method,
                            const ImmutableString& url, const RequestProcessor::Body& body, const HeaderList& headers,
-                           const char* contentType, const CurlTransferTimeouts& timeouts)
+                           const char* contentType, const CurlTransferTimeouts& timeouts, std::uint64_t maxBody)
     : mRequestUID(requestUID),
       mHandler(handler),
       mMethod(method),
       mUrl(url.c_str(), url.size()),
       mBody(body),
       mTimeouts(timeouts),
+      mMaxBody(maxBody),
       mResponseBody(new std::vector<unsigned char>)
 {
     const bool hasBody = method == HttpMethod_PUT || method == HttpMethod_POST || method == HttpMethod_PATCH;
@@ -208,7 +209,8 @@ void CurlTransfer::AddHeaderLine(const char* data, size_t length)
 
     if (name == "CONTENT-LENGTH" && mMethod != HttpMethod_HEAD) {
         const unsigned long long announced = std::strtoull(std::string(value, end).c_str(), nullptr, 10);
-        mResponseBody->reserve(static_cast<size_t>(std::min<unsigned long long>(announced, kMaxBodyReserve)));
+        const unsigned long long reserve = std::min<unsigned long long>({announced, kMaxBodyReserve, mMaxBody});
+        mResponseBody->reserve(static_cast<size_t>(reserve));
     }
     mResponseHeaders.emplace(ImmutableString::CreateDynamic(name),
                              ImmutableString::CreateDynamic(std::string(value, end)));
@@ -218,6 +220,13 @@ size_t CurlTransfer::OnBody(char* data, size_t size, size_t count, void* self)
 {
     CurlTransfer* transfer = static_cast<CurlTransfer*>(self);
     const size_t length = size * count;
+    // Stopped as soon as it passes the bound, not once it is whole: a server
+    // must not be able to make us hold more than the request accepts.
+    if (length > transfer->mMaxBody - transfer->mResponseBody->size()) {
+        transfer->mTooLarge = true;
+        std::vector<unsigned char>().swap(*transfer->mResponseBody);
+        return 0;  // ends the transfer
+    }
     try {
         transfer->mResponseBody->insert(transfer->mResponseBody->end(), data, data + length);
     } catch (const std::bad_alloc&) {
@@ -229,6 +238,7 @@ size_t CurlTransfer::OnBody(char* data, size_t size, size_t count, void* self)
 
 boost::shared_ptr<Response> CurlTransfer::MakeResponse(CURLcode result)
 {
+    if (mTooLarge) return MakeFailureResponse(UTF8String(kResponseTooLargeText));
     if (mOutOfMemory) return MakeFailureResponse(UTF8String("Out of memory while receiving the response"));
     if (result != CURLE_OK) return MakeFailureResponse(DescribeCurlFailure(mEasy, result, mErrorText));
     long status = 0;

@@ -4,6 +4,7 @@
 // Made on the thread that calls a verb; from then on touched only by the
 // network thread, apart from mCancelled.
 
+#include <cstdint>
 #include <memory>
 #include <string>
 #include <vector>
@@ -41,10 +42,11 @@ struct CurlTransferTimeouts {
 class CurlTransfer {
 public:
     // `contentType` is sent when the headers name none; null sends no
-    // Content-Type at all rather than libcurl's form default.
+    // Content-Type at all rather than libcurl's form default. An answer whose
+    // body passes `maxBody` bytes is stopped as soon as it does.
     CurlTransfer(const Guid& requestUID, const ResponseHandler& handler, HttpMethod method, const ImmutableString& url,
                  const RequestProcessor::Body& body, const HeaderList& headers, const char* contentType,
-                 const CurlTransferTimeouts& timeouts);
+                 const CurlTransferTimeouts& timeouts, std::uint64_t maxBody);
     ~CurlTransfer();
     CurlTransfer(const CurlTransfer&) = delete;
     CurlTransfer& operator=(const CurlTransfer&) = delete;
@@ -83,12 +85,14 @@ private:
     const RequestProcessor::Body mBody;
     curl_slist* mRequestHeaders = nullptr;
     const CurlTransferTimeouts mTimeouts;
+    const std::uint64_t mMaxBody;
 
     CURL* mEasy = nullptr;
     char mErrorText[CURL_ERROR_SIZE];
     HeaderList mResponseHeaders;
     boost::shared_ptr<std::vector<unsigned char> > mResponseBody;
     bool mOutOfMemory = false;
+    bool mTooLarge = false;  // the answer passed mMaxBody
 };
 
 }  // namespace http

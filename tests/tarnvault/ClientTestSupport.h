@@ -62,6 +62,16 @@ public:
         std::lock_guard<std::mutex> lock(mMutex);
         mAnswers.push_back(answer);
     }
+    // A 200 of `prefix` and then `fillBytes` spaces, made as they go out.
+    void ScriptLarge(const std::string& prefix, size_t fillBytes)
+    {
+        HttpAnswer answer;
+        answer.mBody = prefix;
+        answer.mFillBytes = fillBytes;
+        std::lock_guard<std::mutex> lock(mMutex);
+        mAnswers.push_back(answer);
+    }
+    size_t BodyBytesSent() const { return mServer.BodyBytesSent(); }
     std::vector<HttpRequest> Requests() const
     {
         std::lock_guard<std::mutex> lock(mMutex);

@@ -217,3 +217,41 @@ TEST_F(TransferTest, DownloadCutOffMidBodyFailsWithoutTouchingTheFile)
     EXPECT_FALSE(outcome.ErrorText().empty());
     EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "old");
 }
+
+TEST_F(TransferTest, DownloadReachingItsLimitFailsAndRemovesItsFile)
+{
+    EXPECT_EQ(mClient->DownloadSizeLimit(), std::uint64_t(1) << 32);
+    const size_t limit = size_t(1) << 20;
+    mClient->SetDownloadSizeLimit(limit);
+    WriteFileBytes(mDir / "f.txt", "old");
+
+    // Far past the limit: stopped while it arrives.
+    mService.ScriptLarge("", size_t(64) << 20);
+    Outcome over;
+    mClient->DownloadAsync(over.Downloaded(), over.Error(), MakeItem("i1"), FileAt(mDir / "f.txt.temp"), "",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(over.Wait());
+    EXPECT_LT(mService.BodyBytesSent(), size_t(64) << 20);
+    // At the limit exactly, and a byte below it.
+    mService.ScriptLarge("", limit);
+    Outcome at;
+    mClient->DownloadAsync(at.Downloaded(), at.Error(), MakeItem("i1"), FileAt(mDir / "f.txt.temp"), "",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(at.Wait());
+    mService.ScriptLarge("", limit - 1);
+    Outcome below;
+    mClient->DownloadAsync(below.Downloaded(), below.Error(), MakeItem("i1"), FileAt(mDir / "g.txt.temp"), "",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(below.Wait());
+
+    for (const Outcome* refused : {&over, &at}) {
+        EXPECT_FALSE(refused->Succeeded());
+        EXPECT_EQ(refused->Status(), -100);
+        EXPECT_EQ(refused->ErrorText(), "Data size beyond the limitation!");
+    }
+    EXPECT_FALSE(std::filesystem::exists(mDir / "f.txt.temp"));
+    EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "old");
+    ASSERT_TRUE(below.Succeeded());
+    EXPECT_EQ(below.DownloadSeen().mContentSize, limit - 1);
+    EXPECT_EQ(ReadFileBytes(mDir / "g.txt.temp"), std::string(limit - 1, ' '));
+}
