@@ -152,7 +152,8 @@ public:
     // A download whose body reaches the limit fails with "Data size beyond
     // the limitation!", and the file it was given is removed. The limit
     // travels with each download's request (Configuration::mMaxResponseBody),
-    // so the processor stops the transfer there and holds no more of it. The
+    // so the processor stops the transfer there; the body streams into the
+    // file as it arrives (DownloadSinkPrivate.h) and is never held whole. The
     // default, and the most, is kMaxDownloadSize, the range of one block
     // write; a host may set a lower one, at least 1 (only empty bodies).
     // Any thread; counts from the next download.

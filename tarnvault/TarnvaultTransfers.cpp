@@ -1,5 +1,5 @@
 // Moving content: upload (after deleting what has the name) and conditional
-// download into a given file.
+// download into a given file, streamed there as it arrives.
 
 #include <algorithm>
 #include <cstdio>
@@ -12,6 +12,7 @@
 #include "foundation/core/ByteStreams.h"
 #include "foundation/net/HeaderConstants.h"
 #include "foundation/net/QuoteURL.h"
+#include "tarnvault/DownloadSinkPrivate.h"
 #include "tarnvault/TarnvaultPrivate.h"
 
 namespace tolmonetsync {
@@ -157,10 +158,17 @@ void FailDownload(const File& file, const ErrorCallback& error, const Guid& requ
     }
 }
 
-void _HandleDownload(const File& file, std::uint64_t limit, const DownloadCallback& success, const ErrorCallback& error,
-                     const Guid& requestUID, const boost::shared_ptr<tolmonet::Response>& response)
+void _HandleDownload(const File& file, const boost::shared_ptr<DownloadSink>& sink, std::uint64_t limit,
+                     const DownloadCallback& success, const ErrorCallback& error, const Guid& requestUID,
+                     const boost::shared_ptr<tolmonet::Response>& response)
 {
     const UTF8String body = _HandleBody("Download", requestUID, response);
+    // Nothing of an answer that failed may reach the file.
+    if (response->status != 200) sink->Discard();
+    if (!sink->Failure().empty()) {
+        FailDownload(file, error, requestUID, sink->Failure().c_str());
+        return;
+    }
     if (tolmonet::IsResponseTooLarge(*response)) {
         FailDownload(file, error, requestUID, kDownloadTooLarge);
         return;
@@ -175,21 +183,22 @@ void _HandleDownload(const File& file, std::uint64_t limit, const DownloadCallba
         return;
     }
     try {
-        file.Create(false);
-        tolmocore::filesupport::OPlatformByteStream stream(file, 0);
-        if (body.size() >= limit) throw std::runtime_error(kDownloadTooLarge);
-        if (!body.empty()) stream.WriteBlock(body.data(), static_cast<unsigned int>(body.size()));
+        // The body streamed into the sink, or, from a processor that does
+        // not stream, came whole in the response.
+        if (sink->Size() + body.size() >= limit) throw std::runtime_error(kDownloadTooLarge);
+        sink->Append(body);
         result.mContentType = LastHeader(response, tolmonet::kHEADER_CONTENT_TYPE);
         result.mEtag = LastHeader(response, tolmonet::kHEADER_ETAG);
         result.mLastModified = tolmocore::utility::UTF8to16(LastHeader(response, kLastModified));
-        result.mContentSize = body.size();
+        result.mContentSize = sink->Size();
         result.mDownloaded = true;
         TOLMO_TRACE("Tarnvault", 8,
                     "Download" << ", content-type: " << result.mContentType << ", content-size: "
                                << result.mContentSize << ", etag: " << result.mEtag
                                << ", last_modified: " << result.mLastModified);
-        stream.Close();
+        sink->Close();
     } catch (const std::exception& e) {
+        sink->Discard();
         FailDownload(file, error, requestUID, e.what());
         return;
     }
@@ -209,10 +218,13 @@ Guid Tarnvault::DownloadAsync(const DownloadCallback& success, const ErrorCallba
                 "Download" << ", path: " << file.FullPath() << ", asset: " << item << ", url: " << url
                            << ", etag: " << etag << ", requestUID: " << requestUID);
     const std::uint64_t limit = DownloadSizeLimit();
+    const boost::shared_ptr<DownloadSink> sink(new DownloadSink(file));
     tolmonet::Configuration configuration;
     configuration.mMaxResponseBody = limit - 1;
-    const bool taken = mProcessor->GET(requestUID, boost::bind(&_HandleDownload, file, limit, success, error, _1, _2),
-                                       ImmutableString::CreateDynamic(url), headers, configuration);
+    configuration.mBodySink = sink;
+    const bool taken =
+        mProcessor->GET(requestUID, boost::bind(&_HandleDownload, file, sink, limit, success, error, _1, _2),
+                        ImmutableString::CreateDynamic(url), headers, configuration);
     return Sent(taken, requestUID);
 }
 

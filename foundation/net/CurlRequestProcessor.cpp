@@ -87,8 +87,8 @@ bool CurlRequestProcessor::Submit(HttpMethod method, const Guid& requestUID, con
     CurlTransferTimeouts timeouts;
     timeouts.mConnectMilliseconds = mTimeouts->mConnectMilliseconds.load(std::memory_order_relaxed);
     timeouts.mStallSeconds = mTimeouts->mStallSeconds.load(std::memory_order_relaxed);
-    std::unique_ptr<CurlTransfer> transfer(new CurlTransfer(requestUID, handler, method, url, body, headers,
-                                                            contentType, timeouts, configuration.mMaxResponseBody));
+    std::unique_ptr<CurlTransfer> transfer(
+        new CurlTransfer(requestUID, handler, method, url, body, headers, contentType, timeouts, configuration));
     return mNetwork->Start(transfer);
 }
 

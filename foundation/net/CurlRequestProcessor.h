@@ -32,10 +32,11 @@
 // a Content-Type header a body goes without one. "Expect: 100-continue" is
 // never sent. TLS certificates are always verified. A request header whose
 // name or value holds CR or LF is dropped. An empty handler is refused. Of
-// the Configuration only mMaxResponseBody is read: an answer whose body passes
-// it is stopped while it arrives, what came of it is freed, and the handler
-// gets status -100 with kResponseTooLargeText. Trace lines name the method
-// and the URL without its query, never a header value.
+// the Configuration only mMaxResponseBody and mBodySink are read: an answer
+// whose body passes the bound is stopped while it arrives, what came of it is
+// freed, and the handler gets status -100 with kResponseTooLargeText; a body
+// the sink accepts streams into it (ResponseBodySink.h). Trace lines name the
+// method and the URL without its query, never a header value.
 //
 // Process exit. The process-wide processor stops at exit (an atexit hook made
 // with it): it waits for a handler that runs right now to return (unless

@@ -1,10 +1,13 @@
 #include "foundation/net/Response.h"
 
+#include "foundation/net/ResponseBodySink.h"
+
 #include <cstring>
 
 namespace tolmonet {
 
 const char kResponseTooLargeText[] = "The answer is larger than the request allows";
+const char http::kBodySinkRefusedText[] = "The receiver of the answer's body refused it";
 
 const ImmutableString* FindHeader(const HeaderList& headers, const ImmutableString& name)
 {

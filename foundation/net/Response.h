@@ -13,6 +13,9 @@
 #include "foundation/net/RecycledMemory.h"
 
 namespace tolmonet {
+namespace http {
+class ResponseBodySink;  // ResponseBodySink.h
+}
 
 using StatusCode = std::int32_t;
 
@@ -76,6 +79,10 @@ struct Configuration {
     // request, so the verbs keep their signatures: a download raises it to
     // its own limit, everything else keeps the default.
     std::uint64_t mMaxResponseBody = kDefaultMaxResponseBody;
+    // Null: the body comes in the Response. Else the body of an answer the
+    // sink accepts streams into it as it arrives (still bounded by
+    // mMaxResponseBody), and the Response carries none.
+    boost::shared_ptr<http::ResponseBodySink> mBodySink;
 };
 
 namespace http {
