@@ -224,14 +224,6 @@ size_t CurlTransfer::OnBody(char* data, size_t size, size_t count, void* self)
 
 bool CurlTransfer::TakeBody(const char* data, size_t length)
 {
-    // Stopped as soon as it passes the bound, not once it is whole: a server
-    // must not be able to make us hold more than the request accepts.
-    if (length > mMaxBody - mBodyBytes) {
-        mTooLarge = true;
-        std::vector<unsigned char>().swap(*mResponseBody);
-        return false;
-    }
-    mBodyBytes += length;
     if (mBodySink && !mSinkAsked) {
         long status = 0;
         curl_easy_getinfo(mEasy, CURLINFO_RESPONSE_CODE, &status);
@@ -243,6 +235,17 @@ bool CurlTransfer::TakeBody(const char* data, size_t length)
             return false;
         }
     }
+    // Stopped as soon as it passes the bound, not once it is whole: a server
+    // must not be able to make us hold more than the request accepts. The
+    // large bound of a streamed body never applies to one held in memory.
+    const std::uint64_t bound =
+        mStreaming || !mBodySink ? mMaxBody : std::min<std::uint64_t>(mMaxBody, kDefaultMaxResponseBody);
+    if (length > bound - mBodyBytes) {
+        mTooLarge = true;
+        std::vector<unsigned char>().swap(*mResponseBody);
+        return false;
+    }
+    mBodyBytes += length;
     if (mStreaming) {
         try {
             mSinkRefused = !mBodySink->Write(reinterpret_cast<const unsigned char*>(data), length);

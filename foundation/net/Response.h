@@ -81,7 +81,9 @@ struct Configuration {
     std::uint64_t mMaxResponseBody = kDefaultMaxResponseBody;
     // Null: the body comes in the Response. Else the body of an answer the
     // sink accepts streams into it as it arrives (still bounded by
-    // mMaxResponseBody), and the Response carries none.
+    // mMaxResponseBody), and the Response carries none; the body of one it
+    // declines comes in the Response, bounded by kDefaultMaxResponseBody at
+    // most.
     boost::shared_ptr<http::ResponseBodySink> mBodySink;
 };
 
