@@ -14,7 +14,7 @@ bool DownloadSink::Write(const unsigned char* data, std::size_t size)
         WriteBlock(data, size);
         return true;
     } catch (const std::exception& e) {
-        mFailure = e.what();
+        mFailure = *e.what() ? e.what() : "Download: the file could not be written";
         mStream.reset();  // drops what was written
         return false;
     }

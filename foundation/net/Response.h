@@ -63,8 +63,8 @@ struct Response {
 bool IsResponseTooLarge(const Response& response);
 
 // Per-request options. Callers start from the default; the authorising layer
-// sets mAuthorized. A processor reads mMaxResponseBody; the other fields are
-// carried and not interpreted.
+// sets mAuthorized. A processor reads mMaxResponseBody and mBodySink; the
+// other fields are carried and not interpreted.
 struct Configuration {
     boost::shared_ptr<void> mExtension;
     bool mAuthorized = false;
