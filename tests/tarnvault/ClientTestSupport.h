@@ -62,10 +62,11 @@ public:
         std::lock_guard<std::mutex> lock(mMutex);
         mAnswers.push_back(answer);
     }
-    // A 200 of `prefix` and then `fillBytes` spaces, made as they go out.
-    void ScriptLarge(const std::string& prefix, size_t fillBytes)
+    // `prefix` and then `fillBytes` spaces, made as they go out.
+    void ScriptLarge(const std::string& prefix, size_t fillBytes, int status = 200)
     {
         HttpAnswer answer;
+        answer.mStatus = status;
         answer.mBody = prefix;
         answer.mFillBytes = fillBytes;
         std::lock_guard<std::mutex> lock(mMutex);

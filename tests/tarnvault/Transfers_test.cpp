@@ -260,3 +260,20 @@ TEST_F(TransferTest, DownloadReachingItsLimitFailsAndRemovesItsFile)
     EXPECT_EQ(below.DownloadSeen().mContentSize, limit - 1);
     EXPECT_EQ(ReadFileBytes(mDir / "g.txt.temp"), std::string(limit - 1, ' '));
 }
+
+TEST_F(TransferTest, DownloadRefusedWithAHugeTextIsStoppedAtTheJSONBound)
+{
+    // The download's own limit is for content; the text of a refusal is held
+    // in memory, so it keeps the bound of every other answer.
+    const size_t huge = size_t(128) << 20;
+    mService.ScriptLarge("", huge, 404);
+    Outcome refused;
+    mClient->DownloadAsync(refused.Downloaded(), refused.Error(), MakeItem("i1"), FileAt(mDir / "f.txt.temp"), "",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(refused.Wait());
+    EXPECT_FALSE(refused.Succeeded());
+    const std::string text = refused.ErrorText();
+    EXPECT_TRUE(text == "Data size beyond the limitation!") << text.size() << " bytes: " << text.substr(0, 60);
+    EXPECT_LT(mService.BodyBytesSent(), huge);
+    EXPECT_FALSE(std::filesystem::exists(mDir / "f.txt.temp"));
+}
