@@ -7,6 +7,8 @@
 // each request keeps the client alive through shared_from_this() until its
 // callback has run, and the handlers look at it through a weak pointer.
 
+#include <atomic>
+#include <cstdint>
 #include <vector>
 
 #include <boost/enable_shared_from_this.hpp>
@@ -152,6 +154,18 @@ public:
     // Whether the parameter list asked for the environment login.
     bool AutoLoginRequested() const { return mAutoLogin; }
 
+    // A download whose body reaches the limit fails with "Data size beyond
+    // the limitation!", and the file it was given is removed. The limit
+    // travels with each download's request (Configuration::mMaxResponseBody),
+    // so the processor stops the transfer there; the body streams into the
+    // file as it arrives (DownloadSinkPrivate.h) and is never held whole. The
+    // default, and the most, is kMaxDownloadSize, the range of one block
+    // write; a host may set a lower one, at least 1 (only empty bodies).
+    // Any thread; counts from the next download.
+    static constexpr std::uint64_t kMaxDownloadSize = std::uint64_t(1) << 32;
+    void SetDownloadSizeLimit(std::uint64_t bytes);
+    std::uint64_t DownloadSizeLimit() const { return mDownloadSizeLimit.load(); }
+
 private:
     // Signs in from TOLMONETSYNC_USERNAME and TOLMONETSYNC_PASSWORD, or reuses
     // the process's earlier environment sign-in once the service accepts it.
@@ -183,6 +197,7 @@ private:
     boost::shared_ptr<tolmonet::http::RequestProcessor> mProcessor;
     boost::shared_ptr<Collection> mRootCollection;  // guarded by ChildrenMutex
     bool mAutoLogin = false;
+    std::atomic<std::uint64_t> mDownloadSizeLimit{kMaxDownloadSize};
 };
 
 // The sync service of the asset service: owns one client for its life.

@@ -51,7 +51,7 @@ OvraCredentials loadCredentials(const File& file)
         tolmocore::filesupport::IPlatformByteStream stream(file, 0);
         const std::uint64_t length = stream.Length();
         if (length != 0) {
-            if (length >= kMaxJSONAnswer) throw OversizedAnswer(static_cast<std::size_t>(length));
+            if (length > kMaxJSONAnswer) throw OversizedAnswer();
             UTF8String text(static_cast<std::size_t>(length), 0);
             stream.ReadBlock(&text[0], static_cast<unsigned int>(length));
             credentials.userID = ParseLastUserText(text);

@@ -18,18 +18,18 @@
 namespace tolmonetsync {
 namespace tarnvault {
 
-// An answer above this size is refused before it is parsed: the whole body
-// already sits in memory, and its tree would take several times as much.
+// The largest answer that is parsed: its tree takes several times its size.
+// The processor stops a longer answer while it arrives, as every request but
+// a download keeps the default bound; the check before parsing stays for a
+// processor that does not.
 constexpr std::size_t kMaxJSONAnswer = std::size_t(64) << 20;
+static_assert(kMaxJSONAnswer == tolmonet::kDefaultMaxResponseBody, "JSON answers keep the processor's default bound");
 
-// Raised for an answer of kMaxJSONAnswer bytes or more, so that the caller
+// Raised for an answer of more than kMaxJSONAnswer bytes, so that the caller
 // can say so instead of calling it a parsing problem.
 class OversizedAnswer : public std::runtime_error {
 public:
-    explicit OversizedAnswer(std::size_t size)
-        : std::runtime_error("JSON answer of " + std::to_string(size) + " bytes is larger than 64 MiB")
-    {
-    }
+    OversizedAnswer() : std::runtime_error("JSON answer is larger than 64 MiB") {}
 };
 
 // Raised where an answer holds a collection where an item belongs, or the
@@ -85,7 +85,7 @@ inline UTF8String _HandleBody(const char* name, const Guid& requestUID,
 
 inline boost::any ParseAnswer(const UTF8String& body)
 {
-    if (body.size() >= kMaxJSONAnswer) throw OversizedAnswer(body.size());
+    if (body.size() > kMaxJSONAnswer) throw OversizedAnswer();
     return tolmocore::serialization::JSONParse(body);
 }
 
@@ -107,6 +107,16 @@ inline void ReportParseFailure(const char* handler, const ErrorCallback& error, 
     if (dynamic_cast<const OversizedAnswer*>(&exception) || dynamic_cast<const WrongAssetClass*>(&exception))
         text = std::string(handler) + ": " + exception.what();
     error(requestUID, MakeErrorResponse(tolmocore::utility::ToUTF16(text)));
+}
+
+// A JSON answer that the processor stopped at its bound is reported as one
+// refused before parsing. True: `error` has been called.
+inline bool ReportStoppedAnswer(const char* handler, const ErrorCallback& error, const Guid& requestUID,
+                                const boost::shared_ptr<tolmonet::Response>& response)
+{
+    if (!tolmonet::IsResponseTooLarge(*response)) return false;
+    ReportParseFailure(handler, error, requestUID, OversizedAnswer());
+    return true;
 }
 
 // The last value of a response header, or empty.

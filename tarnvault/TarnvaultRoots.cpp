@@ -93,6 +93,7 @@ void Tarnvault::_HandleGetRoot(const boost::weak_ptr<Tarnvault>& self, const Col
     const boost::shared_ptr<Tarnvault> client = self.lock();
     if (!client) return;
     const UTF8String body = _HandleBody("GetRoot", requestUID, response);
+    if (ReportStoppedAnswer("_HandleGetRoot", error, requestUID, response)) return;
     if (response->status != 200) {
         error(requestUID, response);
         return;

@@ -19,6 +19,7 @@ void _HandleSearch(const AssetsCallback& success, const ErrorCallback& error, co
                    const boost::shared_ptr<tolmonet::Response>& response)
 {
     const UTF8String body = _HandleBody("Search", requestUID, response);
+    if (ReportStoppedAnswer("_HandleSearch", error, requestUID, response)) return;
     if (response->status != 200) {
         error(requestUID, response);
         return;
@@ -48,6 +49,7 @@ void _HandleHeader(const UTF8String& uid, const AssetCallback& success, const Er
                    const Guid& requestUID, const boost::shared_ptr<tolmonet::Response>& response)
 {
     const UTF8String body = _HandleBody("Header", requestUID, response);
+    if (ReportStoppedAnswer("_HandleHeader", error, requestUID, response)) return;
     if (response->status != 200) {
         error(requestUID, response);
         return;

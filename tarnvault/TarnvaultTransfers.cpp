@@ -1,6 +1,7 @@
 // Moving content: upload (after deleting what has the name) and conditional
-// download into a given file.
+// download into a given file, streamed there as it arrives.
 
+#include <algorithm>
 #include <cstdio>
 
 #include <boost/bind/bind.hpp>
@@ -11,6 +12,7 @@
 #include "foundation/core/ByteStreams.h"
 #include "foundation/net/HeaderConstants.h"
 #include "foundation/net/QuoteURL.h"
+#include "tarnvault/DownloadSinkPrivate.h"
 #include "tarnvault/TarnvaultPrivate.h"
 
 namespace tolmonetsync {
@@ -141,10 +143,36 @@ Guid Tarnvault::UploadAsync(const ItemCallback& success, const ErrorCallback& er
 
 namespace {
 
-void _HandleDownload(const File& file, const DownloadCallback& success, const ErrorCallback& error,
-                     const Guid& requestUID, const boost::shared_ptr<tolmonet::Response>& response)
+constexpr char kDownloadTooLarge[] = "Data size beyond the limitation!";
+
+// Reports a download that could not be finished, and removes what it may
+// have left in its file.
+void FailDownload(const File& file, const ErrorCallback& error, const Guid& requestUID, const char* text)
+{
+    TOLMO_TRACE("Tarnvault", 1,
+                "Error: Download: " << file.FullPath() << ", error: " << text << ", requestUID: " << requestUID);
+    error(requestUID, MakeErrorResponse(tolmocore::utility::AsciiToUTF16(text)));
+    try {
+        if (file.Exists()) file.Delete();
+    } catch (const std::exception&) {
+    }
+}
+
+void _HandleDownload(const File& file, const boost::shared_ptr<DownloadSink>& sink, std::uint64_t limit,
+                     const DownloadCallback& success, const ErrorCallback& error, const Guid& requestUID,
+                     const boost::shared_ptr<tolmonet::Response>& response)
 {
     const UTF8String body = _HandleBody("Download", requestUID, response);
+    // Nothing of an answer that failed may reach the file.
+    if (response->status != 200) sink->Discard();
+    if (!sink->Failure().empty()) {
+        FailDownload(file, error, requestUID, sink->Failure().c_str());
+        return;
+    }
+    if (tolmonet::IsResponseTooLarge(*response)) {
+        FailDownload(file, error, requestUID, kDownloadTooLarge);
+        return;
+    }
     DownloadResult result;
     if (response->status == 304) {
         success(requestUID, result);
@@ -155,28 +183,23 @@ void _HandleDownload(const File& file, const DownloadCallback& success, const Er
         return;
     }
     try {
-        file.Create(false);
-        tolmocore::filesupport::OPlatformByteStream stream(file, 0);
-        if (body.size() >= kMaxBlock) throw std::runtime_error("Data size beyond the limitation!");
-        if (!body.empty()) stream.WriteBlock(body.data(), static_cast<unsigned int>(body.size()));
+        // The body streamed into the sink, or, from a processor that does
+        // not stream, came whole in the response.
+        if (sink->Size() + body.size() >= limit) throw std::runtime_error(kDownloadTooLarge);
+        sink->Append(body);
         result.mContentType = LastHeader(response, tolmonet::kHEADER_CONTENT_TYPE);
         result.mEtag = LastHeader(response, tolmonet::kHEADER_ETAG);
         result.mLastModified = tolmocore::utility::UTF8to16(LastHeader(response, kLastModified));
-        result.mContentSize = body.size();
+        result.mContentSize = sink->Size();
         result.mDownloaded = true;
         TOLMO_TRACE("Tarnvault", 8,
                     "Download" << ", content-type: " << result.mContentType << ", content-size: "
                                << result.mContentSize << ", etag: " << result.mEtag
                                << ", last_modified: " << result.mLastModified);
-        stream.Close();
+        sink->Close();
     } catch (const std::exception& e) {
-        TOLMO_TRACE("Tarnvault", 1,
-                    "Error: Download: " << file.FullPath() << ", error: " << e.what() << ", requestUID: " << requestUID);
-        error(requestUID, MakeErrorResponse(tolmocore::utility::AsciiToUTF16(e.what())));
-        try {
-            if (file.Exists()) file.Delete();
-        } catch (const std::exception&) {
-        }
+        sink->Discard();
+        FailDownload(file, error, requestUID, e.what());
         return;
     }
     success(requestUID, result);
@@ -194,9 +217,20 @@ Guid Tarnvault::DownloadAsync(const DownloadCallback& success, const ErrorCallba
     TOLMO_TRACE("Tarnvault", 8,
                 "Download" << ", path: " << file.FullPath() << ", asset: " << item << ", url: " << RedactedForTrace(url)
                            << ", etag: " << etag << ", requestUID: " << requestUID);
-    const bool taken = mProcessor->GET(requestUID, boost::bind(&_HandleDownload, file, success, error, _1, _2),
-                                       ImmutableString::CreateDynamic(url), headers, tolmonet::Configuration());
+    const std::uint64_t limit = DownloadSizeLimit();
+    const boost::shared_ptr<DownloadSink> sink(new DownloadSink(file));
+    tolmonet::Configuration configuration;
+    configuration.mMaxResponseBody = limit - 1;
+    configuration.mBodySink = sink;
+    const bool taken =
+        mProcessor->GET(requestUID, boost::bind(&_HandleDownload, file, sink, limit, success, error, _1, _2),
+                        ImmutableString::CreateDynamic(url), headers, configuration);
     return Sent(taken, requestUID);
+}
+
+void Tarnvault::SetDownloadSizeLimit(std::uint64_t bytes)
+{
+    mDownloadSizeLimit = std::max<std::uint64_t>(1, std::min(bytes, kMaxDownloadSize));
 }
 
 }  // namespace tarnvault

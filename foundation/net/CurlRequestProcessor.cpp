@@ -81,23 +81,24 @@ void CurlRequestProcessor::StoreTimeouts(Timeouts& timeouts, std::chrono::millis
 
 bool CurlRequestProcessor::Submit(HttpMethod method, const Guid& requestUID, const ResponseHandler& handler,
                                   const ImmutableString& url, const Body& body, const HeaderList& headers,
-                                  const char* contentType)
+                                  const Configuration& configuration, const char* contentType)
 {
     if (!handler) return false;
     CurlTransferTimeouts timeouts;
     timeouts.mConnectMilliseconds = mTimeouts->mConnectMilliseconds.load(std::memory_order_relaxed);
     timeouts.mStallSeconds = mTimeouts->mStallSeconds.load(std::memory_order_relaxed);
     std::unique_ptr<CurlTransfer> transfer(
-        new CurlTransfer(requestUID, handler, method, url, body, headers, contentType, timeouts));
+        new CurlTransfer(requestUID, handler, method, url, body, headers, contentType, timeouts, configuration));
     return mNetwork->Start(transfer);
 }
 
 bool CurlRequestProcessor::SubmitForm(HttpMethod method, const Guid& requestUID, const ResponseHandler& handler,
-                                      const ImmutableString& url, const FormList& form, const HeaderList& headers)
+                                      const ImmutableString& url, const FormList& form, const HeaderList& headers,
+                                      const Configuration& configuration)
 {
     const UTF8String quoted = QuoteURL(form);
     return Submit(method, requestUID, handler, url, RecycledMemory::CopyOf(quoted.data(), quoted.size()), headers,
-                  kHEADER_CONTENT_TYPE_APPLICATION_WWW_FORM_URLENCODED.c_str());
+                  configuration, kHEADER_CONTENT_TYPE_APPLICATION_WWW_FORM_URLENCODED.c_str());
 }
 
 void CurlRequestProcessor::TryToCancelRequest(const Guid& requestUID)
@@ -106,51 +107,51 @@ void CurlRequestProcessor::TryToCancelRequest(const Guid& requestUID)
 }
 
 bool CurlRequestProcessor::GET(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
-                               const HeaderList& headers, const Configuration&)
+                               const HeaderList& headers, const Configuration& configuration)
 {
-    return Submit(HttpMethod_GET, requestUID, handler, url, Body(), headers, nullptr);
+    return Submit(HttpMethod_GET, requestUID, handler, url, Body(), headers, configuration, nullptr);
 }
 
 bool CurlRequestProcessor::HEAD(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
-                                const HeaderList& headers, const Configuration&)
+                                const HeaderList& headers, const Configuration& configuration)
 {
-    return Submit(HttpMethod_HEAD, requestUID, handler, url, Body(), headers, nullptr);
+    return Submit(HttpMethod_HEAD, requestUID, handler, url, Body(), headers, configuration, nullptr);
 }
 
 bool CurlRequestProcessor::PUT(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
-                               const Body& body, const HeaderList& headers, const Configuration&)
+                               const Body& body, const HeaderList& headers, const Configuration& configuration)
 {
-    return Submit(HttpMethod_PUT, requestUID, handler, url, body, headers, nullptr);
+    return Submit(HttpMethod_PUT, requestUID, handler, url, body, headers, configuration, nullptr);
 }
 
 bool CurlRequestProcessor::PUTForm(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
-                                   const FormList& form, const HeaderList& headers, const Configuration&)
+                                   const FormList& form, const HeaderList& headers, const Configuration& configuration)
 {
-    return SubmitForm(HttpMethod_PUT, requestUID, handler, url, form, headers);
+    return SubmitForm(HttpMethod_PUT, requestUID, handler, url, form, headers, configuration);
 }
 
 bool CurlRequestProcessor::POST(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
-                                const Body& body, const HeaderList& headers, const Configuration&)
+                                const Body& body, const HeaderList& headers, const Configuration& configuration)
 {
-    return Submit(HttpMethod_POST, requestUID, handler, url, body, headers, nullptr);
+    return Submit(HttpMethod_POST, requestUID, handler, url, body, headers, configuration, nullptr);
 }
 
 bool CurlRequestProcessor::POSTForm(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
-                                    const FormList& form, const HeaderList& headers, const Configuration&)
+                                    const FormList& form, const HeaderList& headers, const Configuration& configuration)
 {
-    return SubmitForm(HttpMethod_POST, requestUID, handler, url, form, headers);
+    return SubmitForm(HttpMethod_POST, requestUID, handler, url, form, headers, configuration);
 }
 
 bool CurlRequestProcessor::PATCH(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
-                                 const Body& body, const HeaderList& headers, const Configuration&)
+                                 const Body& body, const HeaderList& headers, const Configuration& configuration)
 {
-    return Submit(HttpMethod_PATCH, requestUID, handler, url, body, headers, nullptr);
+    return Submit(HttpMethod_PATCH, requestUID, handler, url, body, headers, configuration, nullptr);
 }
 
 bool CurlRequestProcessor::DEL(const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
-                               const HeaderList& headers, const Configuration&)
+                               const HeaderList& headers, const Configuration& configuration)
 {
-    return Submit(HttpMethod_DELETE, requestUID, handler, url, Body(), headers, nullptr);
+    return Submit(HttpMethod_DELETE, requestUID, handler, url, Body(), headers, configuration, nullptr);
 }
 
 void CurlRequestProcessor::CallAsynchronously(const boost::function<void()>& function,

@@ -31,9 +31,12 @@
 // POSTForm send QuoteURL(form) as application/x-www-form-urlencoded. Without
 // a Content-Type header a body goes without one. "Expect: 100-continue" is
 // never sent. TLS certificates are always verified. A request header whose
-// name or value holds CR or LF is dropped. An empty handler is refused. The
-// Configuration argument is accepted and not interpreted. Trace lines name
-// the method and the URL without its query, never a header value.
+// name or value holds CR or LF is dropped. An empty handler is refused. Of
+// the Configuration only mMaxResponseBody and mBodySink are read: an answer
+// whose body passes the bound is stopped while it arrives, what came of it is
+// freed, and the handler gets status -100 with kResponseTooLargeText; a body
+// the sink accepts streams into it (ResponseBodySink.h). Trace lines name the
+// method and the URL without its query, never a header value.
 //
 // Process exit. The process-wide processor stops at exit (an atexit hook made
 // with it): it waits for a handler that runs right now to return (unless
@@ -129,9 +132,11 @@ public:
 private:
     CurlRequestProcessor(const CurlProcessorSettings& settings, Timeouts* sharedTimeouts);
     bool Submit(HttpMethod method, const Guid& requestUID, const ResponseHandler& handler, const ImmutableString& url,
-                const Body& body, const HeaderList& headers, const char* contentType);
+                const Body& body, const HeaderList& headers, const Configuration& configuration,
+                const char* contentType);
     bool SubmitForm(HttpMethod method, const Guid& requestUID, const ResponseHandler& handler,
-                    const ImmutableString& url, const FormList& form, const HeaderList& headers);
+                    const ImmutableString& url, const FormList& form, const HeaderList& headers,
+                    const Configuration& configuration);
     static void StoreTimeouts(Timeouts& timeouts, std::chrono::milliseconds connectTimeout,
                               std::chrono::seconds stallTime);
     static void StopProcessWideAtExit();

@@ -10,6 +10,7 @@
 
 #include "foundation/core/Redaction.h"
 #include "foundation/net/CurlFailureText.h"
+#include "foundation/net/ResponseBodySink.h"
 
 namespace tolmonet {
 namespace http {
@@ -93,13 +94,16 @@ const char* MethodName(HttpMethod method)
 
 CurlTransfer::CurlTransfer(const Guid& requestUID, const ResponseHandler& handler, HttpMethod method,
                            const ImmutableString& url, const RequestProcessor::Body& body, const HeaderList& headers,
-                           const char* contentType, const CurlTransferTimeouts& timeouts)
+                           const char* contentType, const CurlTransferTimeouts& timeouts,
+                           const Configuration& configuration)
     : mRequestUID(requestUID),
       mHandler(handler),
       mMethod(method),
       mUrl(url.c_str(), url.size()),
       mBody(body),
       mTimeouts(timeouts),
+      mMaxBody(configuration.mMaxResponseBody),
+      mBodySink(configuration.mBodySink),
       mResponseBody(new std::vector<unsigned char>)
 {
     const bool hasBody = method == HttpMethod_PUT || method == HttpMethod_POST || method == HttpMethod_PATCH;
@@ -207,29 +211,66 @@ void CurlTransfer::AddHeaderLine(const char* data, size_t length)
     const char* end = data + length;
     while (value < end && IsBlank(*value)) ++value;
 
-    if (name == "CONTENT-LENGTH" && mMethod != HttpMethod_HEAD) {
-        const unsigned long long announced = std::strtoull(std::string(value, end).c_str(), nullptr, 10);
-        mResponseBody->reserve(static_cast<size_t>(std::min<unsigned long long>(announced, kMaxBodyReserve)));
-    }
+    if (name == "CONTENT-LENGTH" && mMethod != HttpMethod_HEAD)
+        mAnnouncedBody = std::strtoull(std::string(value, end).c_str(), nullptr, 10);
     mResponseHeaders.emplace(ImmutableString::CreateDynamic(name),
                              ImmutableString::CreateDynamic(std::string(value, end)));
 }
 
 size_t CurlTransfer::OnBody(char* data, size_t size, size_t count, void* self)
 {
-    CurlTransfer* transfer = static_cast<CurlTransfer*>(self);
     const size_t length = size * count;
-    try {
-        transfer->mResponseBody->insert(transfer->mResponseBody->end(), data, data + length);
-    } catch (const std::bad_alloc&) {
-        transfer->mOutOfMemory = true;
-        return 0;  // ends the transfer
+    return static_cast<CurlTransfer*>(self)->TakeBody(data, length) ? length : 0;  // 0 ends the transfer
+}
+
+bool CurlTransfer::TakeBody(const char* data, size_t length)
+{
+    if (mBodySink && !mSinkAsked) {
+        long status = 0;
+        curl_easy_getinfo(mEasy, CURLINFO_RESPONSE_CODE, &status);
+        mSinkAsked = true;
+        try {
+            mStreaming = mBodySink->Accepts(status);
+        } catch (const std::exception&) {
+            mSinkRefused = true;
+            return false;
+        }
     }
-    return length;
+    // Stopped as soon as it passes the bound, not once it is whole: a server
+    // must not be able to make us hold more than the request accepts. The
+    // large bound of a streamed body never applies to one held in memory.
+    const std::uint64_t bound =
+        mStreaming || !mBodySink ? mMaxBody : std::min<std::uint64_t>(mMaxBody, kDefaultMaxResponseBody);
+    if (length > bound - mBodyBytes) {
+        mTooLarge = true;
+        std::vector<unsigned char>().swap(*mResponseBody);
+        return false;
+    }
+    mBodyBytes += length;
+    if (mStreaming) {
+        try {
+            mSinkRefused = !mBodySink->Write(reinterpret_cast<const unsigned char*>(data), length);
+        } catch (const std::exception&) {
+            mSinkRefused = true;
+        }
+        return !mSinkRefused;
+    }
+    try {
+        if (mResponseBody->empty())
+            mResponseBody->reserve(
+                static_cast<size_t>(std::min<std::uint64_t>({mAnnouncedBody, kMaxBodyReserve, mMaxBody})));
+        mResponseBody->insert(mResponseBody->end(), data, data + length);
+    } catch (const std::bad_alloc&) {
+        mOutOfMemory = true;
+        return false;
+    }
+    return true;
 }
 
 boost::shared_ptr<Response> CurlTransfer::MakeResponse(CURLcode result)
 {
+    if (mTooLarge) return MakeFailureResponse(UTF8String(kResponseTooLargeText));
+    if (mSinkRefused) return MakeFailureResponse(UTF8String(kBodySinkRefusedText));
     if (mOutOfMemory) return MakeFailureResponse(UTF8String("Out of memory while receiving the response"));
     if (result != CURLE_OK) return MakeFailureResponse(DescribeCurlFailure(mEasy, result, mErrorText));
     long status = 0;

@@ -4,6 +4,7 @@
 // Made on the thread that calls a verb; from then on touched only by the
 // network thread, apart from mCancelled.
 
+#include <cstdint>
 #include <memory>
 #include <string>
 #include <vector>
@@ -41,10 +42,12 @@ struct CurlTransferTimeouts {
 class CurlTransfer {
 public:
     // `contentType` is sent when the headers name none; null sends no
-    // Content-Type at all rather than libcurl's form default.
+    // Content-Type at all rather than libcurl's form default. Of the
+    // configuration, mMaxResponseBody and mBodySink count: an answer whose
+    // body passes the bound is stopped as soon as it does.
     CurlTransfer(const Guid& requestUID, const ResponseHandler& handler, HttpMethod method, const ImmutableString& url,
                  const RequestProcessor::Body& body, const HeaderList& headers, const char* contentType,
-                 const CurlTransferTimeouts& timeouts);
+                 const CurlTransferTimeouts& timeouts, const Configuration& configuration);
     ~CurlTransfer();
     CurlTransfer(const CurlTransfer&) = delete;
     CurlTransfer& operator=(const CurlTransfer&) = delete;
@@ -74,6 +77,8 @@ public:
 private:
     static size_t OnHeader(char* data, size_t size, size_t count, void* self);
     static size_t OnBody(char* data, size_t size, size_t count, void* self);
+    // False: the transfer is to stop.
+    bool TakeBody(const char* data, size_t length);
     void AddHeaderLine(const char* data, size_t length);
 
     const Guid mRequestUID;
@@ -83,12 +88,20 @@ private:
     const RequestProcessor::Body mBody;
     curl_slist* mRequestHeaders = nullptr;
     const CurlTransferTimeouts mTimeouts;
+    const std::uint64_t mMaxBody;
+    const boost::shared_ptr<ResponseBodySink> mBodySink;
 
     CURL* mEasy = nullptr;
     char mErrorText[CURL_ERROR_SIZE];
     HeaderList mResponseHeaders;
     boost::shared_ptr<std::vector<unsigned char> > mResponseBody;
+    std::uint64_t mBodyBytes = 0;      // taken so far, gathered or streamed
+    std::uint64_t mAnnouncedBody = 0;  // Content-Length, 0 if none
+    bool mSinkAsked = false;
+    bool mStreaming = false;  // the body goes to mBodySink
     bool mOutOfMemory = false;
+    bool mTooLarge = false;     // the answer passed mMaxBody
+    bool mSinkRefused = false;  // mBodySink said no
 };
 
 }  // namespace http

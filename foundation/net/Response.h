@@ -13,12 +13,23 @@
 #include "foundation/net/RecycledMemory.h"
 
 namespace tolmonet {
+namespace http {
+class ResponseBodySink;  // ResponseBodySink.h
+}
 
 using StatusCode = std::int32_t;
 
 // Status of a response that no server sent: no connection, a time-out,
 // a cancelled request, or a failure the library made itself.
 constexpr StatusCode kStatusNoResponse = -100;
+
+// The most bytes an answer's body may have unless a request asks for more:
+// every answer that is read whole (JSON above all) stays within it.
+constexpr std::uint64_t kDefaultMaxResponseBody = std::uint64_t(64) << 20;
+
+// Body of the kStatusNoResponse response to a request whose answer grew past
+// its Configuration's mMaxResponseBody: the transfer was stopped there.
+extern const char kResponseTooLargeText[];
 
 // Header name to value. Names compare by content; where a name occurs more
 // than once, the entry that sorts last among them is the one used.
@@ -46,8 +57,14 @@ struct Response {
     UTF8String BodyText() const;
 };
 
+// Whether the request was stopped because its answer passed its
+// mMaxResponseBody. No server can send this: its status is
+// kStatusNoResponse and its body is kResponseTooLargeText.
+bool IsResponseTooLarge(const Response& response);
+
 // Per-request options. Callers start from the default; the authorising layer
-// sets mAuthorized. The other fields are carried and not interpreted.
+// sets mAuthorized. A processor reads mMaxResponseBody and mBodySink; the
+// other fields are carried and not interpreted.
 struct Configuration {
     boost::shared_ptr<void> mExtension;
     bool mAuthorized = false;
@@ -56,6 +73,18 @@ struct Configuration {
     UTF8String mProxy;
     UTF8String mUserAgent;
     UTF8String mCAFile;
+    // The bound on the answer's body. An answer that passes it is stopped
+    // while it arrives, its bytes are dropped, and the handler gets status
+    // kStatusNoResponse with kResponseTooLargeText. It travels with the
+    // request, so the verbs keep their signatures: a download raises it to
+    // its own limit, everything else keeps the default.
+    std::uint64_t mMaxResponseBody = kDefaultMaxResponseBody;
+    // Null: the body comes in the Response. Else the body of an answer the
+    // sink accepts streams into it as it arrives (still bounded by
+    // mMaxResponseBody), and the Response carries none; the body of one it
+    // declines comes in the Response, bounded by kDefaultMaxResponseBody at
+    // most.
+    boost::shared_ptr<http::ResponseBodySink> mBodySink;
 };
 
 namespace http {

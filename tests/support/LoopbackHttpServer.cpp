@@ -1,5 +1,6 @@
 #include "support/LoopbackHttpServer.h"
 
+#include <algorithm>
 #include <cctype>
 #include <cerrno>
 #include <cstdlib>
@@ -104,7 +105,7 @@ std::string ResponseHead(const HttpAnswer& answer)
 {
     std::string head = "HTTP/1.1 " + std::to_string(answer.mStatus) + " " + ReasonPhrase(answer.mStatus) + "\r\n";
     for (const auto& header : answer.mHeaders) head += header.first + ": " + header.second + "\r\n";
-    head += "Content-Length: " + std::to_string(answer.mBody.size()) + "\r\n\r\n";
+    head += "Content-Length: " + std::to_string(answer.mBody.size() + answer.mFillBytes) + "\r\n\r\n";
     return head;
 }
 
@@ -151,6 +152,32 @@ LoopbackHttpServer::~LoopbackHttpServer()
 std::string LoopbackHttpServer::Url(const std::string& target) const
 {
     return "http://127.0.0.1:" + std::to_string(mPort) + target;
+}
+
+size_t LoopbackHttpServer::BodyBytesSent() const
+{
+    std::lock_guard<std::mutex> lock(mMutex);
+    return mBodyBytesSent;
+}
+
+void LoopbackHttpServer::CountBodyBytes(size_t count)
+{
+    std::lock_guard<std::mutex> lock(mMutex);
+    mBodyBytesSent += count;
+}
+
+bool LoopbackHttpServer::SendAnswer(int connection, const std::string& head, const HttpAnswer& answer)
+{
+    if (!SendAll(connection, head + answer.mBody)) return false;
+    CountBodyBytes(answer.mBody.size());
+    const std::string chunk(65536, answer.mFill);
+    for (size_t left = answer.mFillBytes; left > 0;) {
+        const size_t part = std::min(left, chunk.size());
+        if (!SendAll(connection, chunk.substr(0, part))) return false;
+        CountBodyBytes(part);
+        left -= part;
+    }
+    return true;
 }
 
 size_t LoopbackHttpServer::RequestsReceived() const
@@ -214,13 +241,13 @@ void LoopbackHttpServer::Serve(int connection)
             break;
         }
         const std::string head = ResponseHead(answer);
-        const std::string body = request.mMethod == "HEAD" ? std::string() : answer.mBody;
         if (answer.mFault != HttpAnswer::Fault_None) {
+            const std::string body = request.mMethod == "HEAD" ? std::string() : answer.mBody;
             SendAll(connection, head + body.substr(0, body.size() / 2));
             if (answer.mFault == HttpAnswer::Fault_StallMidBody) WaitForClose(connection);
             break;
         }
-        if (!SendAll(connection, head + body)) break;
+        if (request.mMethod == "HEAD" ? !SendAll(connection, head) : !SendAnswer(connection, head, answer)) break;
         if (strcasecmp(request.Header("Connection").c_str(), "close") == 0) break;
     }
     {

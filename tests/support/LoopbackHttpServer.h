@@ -39,6 +39,10 @@ struct HttpAnswer {
     int mStatus = 200;
     HttpHeaders mHeaders;  // Content-Length is added
     std::string mBody;     // not sent for HEAD
+    // Sent after mBody, made as it goes out: a body larger than a test
+    // would want to hold. Counted in Content-Length.
+    size_t mFillBytes = 0;
+    char mFill = ' ';
     Fault mFault = Fault_None;
 };
 
@@ -58,6 +62,9 @@ public:
     std::string Url(const std::string& target) const;
 
     size_t RequestsReceived() const;
+    // Bytes of answer bodies handed to the network so far, over all
+    // connections: less than was scripted when a client hung up early.
+    size_t BodyBytesSent() const;
     // Waits until `count` requests have arrived, at most `bound`; true if they did.
     bool WaitForRequests(size_t count, std::chrono::milliseconds bound) const;
 
@@ -66,6 +73,9 @@ private:
     void Serve(int connection);
     // Blocks until the peer or the server's stop closes the connection.
     void WaitForClose(int connection);
+    // Sends a normal answer, counting its body; false if the peer left.
+    bool SendAnswer(int connection, const std::string& head, const HttpAnswer& answer);
+    void CountBodyBytes(size_t count);
 
     const Handler mHandler;
     int mListener = -1;
@@ -73,6 +83,7 @@ private:
     mutable std::mutex mMutex;
     mutable std::condition_variable mArrived;
     size_t mRequests = 0;               // guarded by mMutex
+    size_t mBodyBytesSent = 0;          // guarded by mMutex
     std::set<int> mConnections;         // guarded by mMutex
     bool mStopping = false;             // guarded by mMutex
     std::vector<std::thread> mThreads;  // guarded by mMutex

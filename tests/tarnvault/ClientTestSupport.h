@@ -62,6 +62,17 @@ public:
         std::lock_guard<std::mutex> lock(mMutex);
         mAnswers.push_back(answer);
     }
+    // `prefix` and then `fillBytes` spaces, made as they go out.
+    void ScriptLarge(const std::string& prefix, size_t fillBytes, int status = 200)
+    {
+        HttpAnswer answer;
+        answer.mStatus = status;
+        answer.mBody = prefix;
+        answer.mFillBytes = fillBytes;
+        std::lock_guard<std::mutex> lock(mMutex);
+        mAnswers.push_back(answer);
+    }
+    size_t BodyBytesSent() const { return mServer.BodyBytesSent(); }
     std::vector<HttpRequest> Requests() const
     {
         std::lock_guard<std::mutex> lock(mMutex);

@@ -88,14 +88,25 @@ TEST_F(ClientTest, SearchFailures)
     }
 }
 
-TEST_F(ClientTest, OversizedSearchAnswerIsRefusedUnparsed)
+TEST_F(ClientTest, JSONAnswerPastItsBoundIsStoppedWhileItArrives)
 {
-    mService.Script(200, "[" + std::string(std::size_t(64) << 20, ' ') + "]");
-    Outcome outcome;
-    mClient->SearchAsync(outcome.Assets(), outcome.Error(), SearchQuery(), Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_FALSE(outcome.Succeeded());
-    EXPECT_EQ(outcome.ErrorText(), "_HandleSearch: JSON answer of 67108866 bytes is larger than 64 MiB");
+    // Twice the bound: what a hostile server could send without end.
+    const size_t fill = size_t(128) << 20;
+    Outcome search, header;
+    mService.ScriptLarge("[", fill);
+    mClient->SearchAsync(search.Assets(), search.Error(), SearchQuery(), Guid::CreateUnique());
+    ASSERT_TRUE(search.Wait());
+    EXPECT_LT(mService.BodyBytesSent(), fill);
+    mService.ScriptLarge("{", fill);
+    mClient->HeaderAsync(header.Asset(), header.Error(), "i1", false, Guid::CreateUnique());
+    ASSERT_TRUE(header.Wait());
+    EXPECT_LT(mService.BodyBytesSent(), 2 * fill);
+
+    EXPECT_FALSE(search.Succeeded());
+    EXPECT_EQ(search.Status(), -100);
+    EXPECT_EQ(search.ErrorText(), "_HandleSearch: JSON answer is larger than 64 MiB");
+    EXPECT_FALSE(header.Succeeded());
+    EXPECT_EQ(header.ErrorText(), "_HandleHeader: JSON answer is larger than 64 MiB");
 }
 
 TEST_F(ClientTest, SearchOneGivesTheAssetNullOrTooMany)

@@ -1,5 +1,7 @@
 // Upload (search, deletes, post, metadata) and conditional download.
 
+#include <set>
+
 #include "ClientTestSupport.h"
 
 using namespace tvtest;
@@ -216,4 +218,62 @@ TEST_F(TransferTest, DownloadCutOffMidBodyFailsWithoutTouchingTheFile)
     EXPECT_EQ(outcome.Status(), -100);
     EXPECT_FALSE(outcome.ErrorText().empty());
     EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "old");
+}
+
+TEST_F(TransferTest, DownloadReachingItsLimitFailsAndRemovesItsFile)
+{
+    EXPECT_EQ(mClient->DownloadSizeLimit(), std::uint64_t(1) << 32);
+    const size_t limit = size_t(1) << 20;
+    mClient->SetDownloadSizeLimit(limit);
+    WriteFileBytes(mDir / "f.txt", "old");
+
+    // Far past the limit: stopped while it arrives.
+    mService.ScriptLarge("", size_t(64) << 20);
+    Outcome over;
+    mClient->DownloadAsync(over.Downloaded(), over.Error(), MakeItem("i1"), FileAt(mDir / "f.txt.temp"), "",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(over.Wait());
+    EXPECT_LT(mService.BodyBytesSent(), size_t(64) << 20);
+    // At the limit exactly, and a byte below it.
+    mService.ScriptLarge("", limit);
+    Outcome at;
+    mClient->DownloadAsync(at.Downloaded(), at.Error(), MakeItem("i1"), FileAt(mDir / "f.txt.temp"), "",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(at.Wait());
+    mService.ScriptLarge("", limit - 1);
+    Outcome below;
+    mClient->DownloadAsync(below.Downloaded(), below.Error(), MakeItem("i1"), FileAt(mDir / "g.txt.temp"), "",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(below.Wait());
+
+    for (const Outcome* refused : {&over, &at}) {
+        EXPECT_FALSE(refused->Succeeded());
+        EXPECT_EQ(refused->Status(), -100);
+        EXPECT_EQ(refused->ErrorText(), "Data size beyond the limitation!");
+    }
+    // Neither the refused files nor what streamed into them before the stop.
+    std::set<std::string> names;
+    for (const auto& entry : std::filesystem::directory_iterator(mDir.Path())) names.insert(entry.path().filename());
+    EXPECT_EQ(names, (std::set<std::string>{"f.txt", "g.txt.temp"}));
+    EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "old");
+    ASSERT_TRUE(below.Succeeded());
+    EXPECT_EQ(below.DownloadSeen().mContentSize, limit - 1);
+    EXPECT_EQ(ReadFileBytes(mDir / "g.txt.temp"), std::string(limit - 1, ' '));
+}
+
+TEST_F(TransferTest, DownloadRefusedWithAHugeTextIsStoppedAtTheJSONBound)
+{
+    // The download's own limit is for content; the text of a refusal is held
+    // in memory, so it keeps the bound of every other answer.
+    const size_t huge = size_t(128) << 20;
+    mService.ScriptLarge("", huge, 404);
+    Outcome refused;
+    mClient->DownloadAsync(refused.Downloaded(), refused.Error(), MakeItem("i1"), FileAt(mDir / "f.txt.temp"), "",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(refused.Wait());
+    EXPECT_FALSE(refused.Succeeded());
+    const std::string text = refused.ErrorText();
+    EXPECT_TRUE(text == "Data size beyond the limitation!") << text.size() << " bytes: " << text.substr(0, 60);
+    EXPECT_LT(mService.BodyBytesSent(), huge);
+    EXPECT_FALSE(std::filesystem::exists(mDir / "f.txt.temp"));
 }

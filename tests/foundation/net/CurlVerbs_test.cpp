@@ -11,6 +11,7 @@
 #include "foundation/core/Trace.h"
 #include "foundation/net/CurlRequestProcessor.h"
 #include "foundation/net/HeaderConstants.h"
+#include "foundation/net/ResponseBodySink.h"
 #include "support/LoopbackHttpServer.h"
 #include "support/ResponseRecorder.h"
 
@@ -49,6 +50,20 @@ std::string HeaderValue(const Response& response, const char* name)
 {
     return HeaderValue(response, ImmutableString::CreateDynamic(name));
 }
+
+// Keeps what a 200 sends; refuses the bytes when told to.
+class RecordingSink : public ResponseBodySink {
+public:
+    explicit RecordingSink(bool refuse = false) : mRefuse(refuse) {}
+    bool Accepts(long status) override { return status == 200; }
+    bool Write(const unsigned char* data, std::size_t size) override
+    {
+        mBytes.append(reinterpret_cast<const char*>(data), size);
+        return !mRefuse;
+    }
+    const bool mRefuse;
+    std::string mBytes;
+};
 
 class CurlVerbsTest : public ::testing::Test {
 protected:
@@ -158,6 +173,44 @@ TEST_F(CurlVerbsTest, FourMebibytesTravelBothWaysIntact)
     ASSERT_TRUE(response->body);
     ASSERT_EQ(response->body->Size(), bytes->size());
     EXPECT_TRUE(std::equal(bytes->begin(), bytes->end(), response->body->Data()));
+}
+
+TEST_F(CurlVerbsTest, AnswerIsBoundedOrStreamedAsTheRequestAsks)
+{
+    const std::string body(1000, 'b');
+    const auto send = [&](const char* target, std::uint64_t bound, const boost::shared_ptr<RecordingSink>& sink) {
+        Configuration configuration;
+        configuration.mMaxResponseBody = bound;
+        configuration.mBodySink = sink;
+        EXPECT_TRUE(mProcessor->PUT(Guid::CreateUnique(), mRecorder.Handler(), Url(target), Bytes(body), HeaderList(),
+                                    configuration));
+        return Next();
+    };
+    EXPECT_EQ(send("/at", 1000, nullptr)->BodyText().ToStdString(), body);
+    const boost::shared_ptr<Response> past = send("/past", 999, nullptr);
+    EXPECT_EQ(past->status, kStatusNoResponse);
+    EXPECT_EQ(past->BodyText().ToStdString(), kResponseTooLargeText);
+    EXPECT_TRUE(IsResponseTooLarge(*past));
+
+    // A sink takes the body of the answers it accepts, and the bound still holds.
+    const auto taking = boost::make_shared<RecordingSink>();
+    const auto declining = boost::make_shared<RecordingSink>();
+    const auto bounded = boost::make_shared<RecordingSink>();
+    const auto refusing = boost::make_shared<RecordingSink>(true);
+    const boost::shared_ptr<Response> streamed = send("/ok", kDefaultMaxResponseBody, taking);
+    const boost::shared_ptr<Response> notFound = send("/status/404", kDefaultMaxResponseBody, declining);
+    const boost::shared_ptr<Response> stopped = send("/ok", 999, bounded);
+    const boost::shared_ptr<Response> refused = send("/ok", kDefaultMaxResponseBody, refusing);
+    EXPECT_EQ(streamed->status, 200);
+    EXPECT_FALSE(streamed->body);
+    EXPECT_EQ(taking->mBytes, body);
+    EXPECT_EQ(notFound->status, 404);
+    EXPECT_EQ(notFound->BodyText().ToStdString(), body);
+    EXPECT_TRUE(declining->mBytes.empty());
+    EXPECT_TRUE(IsResponseTooLarge(*stopped));
+    EXPECT_TRUE(bounded->mBytes.empty());
+    EXPECT_EQ(refused->status, kStatusNoResponse);
+    EXPECT_EQ(refused->BodyText().ToStdString(), kBodySinkRefusedText);
 }
 
 TEST_F(CurlVerbsTest, TraceLinesShowNeitherTheAuthorizationNorTheQuery)
