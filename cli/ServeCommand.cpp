@@ -16,7 +16,8 @@ namespace {
 
 const char kServeUsage[] =
     "usage: tolmonetsync serve --data DIR [--listen HOST:PORT] [--user NAME:PASSWORD[:EMAIL]]...\n"
-    "         [--token NAME:TOKEN]... [--token-ttl SECONDS] [--denied-user NAME]... [--cert FILE --key FILE]\n";
+    "         [--token NAME:TOKEN]... [--token-ttl SECONDS] [--denied-user NAME]... [--cert FILE --key FILE]\n"
+    "         [--max-upload BYTES]\n";
 const char kServeHelp[] =
     "\n"
     "Runs the local asset service (under /api) and identity service (under /ovra) in the foreground until SIGINT or "
@@ -30,6 +31,7 @@ const char kServeHelp[] =
     "  --denied-user NAME  the user's sign-in is refused (access denied) even with the right password\n"
     "  --cert FILE --key FILE   serve HTTPS with this certificate (chain) and private key, both PEM;\n"
     "                      clients that do not trust its issuer take --ca-file FILE\n"
+    "  --max-upload BYTES  uploads larger than this are refused with 413 (default 1073741824, 1 GiB)\n"
     "The identity service is under /ovra. The first line on stdout is \"listening on http://HOST:PORT\"\n"
     "(https with a certificate).\n";
 
@@ -53,6 +55,8 @@ server::LocalServiceOptions ParseServe(GlobalOptions& globals, const std::vector
             options.mCertificateFile = value();
         } else if (option == "--key") {
             options.mPrivateKeyFile = value();
+        } else if (option == "--max-upload") {
+            options.mMaxUploadBytes = server::ParseBytesArgument(value());
         } else if (option == "--token") {
             // serve's own --token (NAME:TOKEN) comes before the global one.
             options.mTokens.push_back(server::ParseTokenArgument(value()));
