@@ -5,7 +5,6 @@
 #include <array>
 #include <chrono>
 #include <cstring>
-#include <stdexcept>
 
 #include <arpa/inet.h>
 #include <netinet/in.h>
