@@ -20,7 +20,7 @@ namespace {
 const char kServeUsage[] =
     "usage: tolmonetsync serve --data DIR [--listen HOST:PORT] [--users-file FILE] [--tokens-file FILE]\n"
     "         [--user NAME:PASSWORD[:EMAIL]]... [--token NAME:TOKEN]... [--token-ttl SECONDS]\n"
-    "         [--denied-user NAME]... [--cert FILE --key FILE]\n";
+    "         [--denied-user NAME]... [--cert FILE --key FILE] [--max-upload BYTES]\n";
 const char kServeHelp[] =
     "\n"
     "Runs the local asset service (under /api) and identity service (under /ovra) in the foreground until SIGINT or "
@@ -39,6 +39,7 @@ const char kServeHelp[] =
     "  --denied-user NAME  the user's sign-in is refused (access denied) even with the right password\n"
     "  --cert FILE --key FILE   serve HTTPS with this certificate (chain) and private key, both PEM;\n"
     "                      clients that do not trust its issuer take --ca-file FILE\n"
+    "  --max-upload BYTES  uploads larger than this are refused with 413 (default 1073741824, 1 GiB)\n"
     "The identity service is under /ovra. The first line on stdout is \"listening on http://HOST:PORT\"\n"
     "(https with a certificate).\n";
 
@@ -90,6 +91,8 @@ ServeArguments ParseServe(GlobalOptions& globals, const std::vector<std::string>
             options.mCertificateFile = value();
         } else if (option == "--key") {
             options.mPrivateKeyFile = value();
+        } else if (option == "--max-upload") {
+            options.mMaxUploadBytes = server::ParseBytesArgument(value());
         } else if (option == "--token") {
             // serve's own --token (NAME:TOKEN) comes before the global one.
             options.mTokens.push_back(server::ParseTokenArgument(value()));

@@ -80,8 +80,10 @@ void Upload(Exchange& exchange)
     const std::string name = Required(exchange, "name");
     if (name.empty()) throw StoreFailure(400, "an upload needs a name");
     const std::vector<std::string> collections = ParseUploadCollections(Required(exchange, "collections"));
-    const AssetRecord item = exchange.mAssets.Upload(
-        exchange.mUser, collections, name, exchange.mRequest.get_header_value("Content-Type"), exchange.mRequest.body);
+    const std::string type = exchange.mRequest.get_header_value("Content-Type");
+    const AssetRecord item =
+        exchange.mUpload ? exchange.mAssets.Upload(exchange.mUser, collections, name, type, *exchange.mUpload)
+                         : exchange.mAssets.Upload(exchange.mUser, collections, name, type, exchange.mRequest.body);
     exchange.Header("Location", exchange.Location(false, item.mId));
     exchange.Header("ETag", item.mEtag);
     exchange.Json(201, AssetText(item, exchange.mStyle));

@@ -65,6 +65,9 @@ public:
     void Delete(std::int64_t owner, const std::string& id, bool recursive);
     AssetRecord Upload(std::int64_t owner, const std::vector<std::string>& collectionIds, const std::string& name,
                        const std::string& contentType, const std::string& bytes);
+    // The same with bytes already received; they are kept under the new id.
+    AssetRecord Upload(std::int64_t owner, const std::vector<std::string>& collectionIds, const std::string& name,
+                       const std::string& contentType, ContentFiles::Incoming& content);
     // Removes content files that no item names: what a crash between the
     // write of the bytes and the commit of their metadata leaves. At start only.
     std::size_t RemoveUnreferencedContent();

@@ -98,6 +98,14 @@ void AssetStore::Delete(std::int64_t owner, const std::string& id, bool recursiv
 AssetRecord AssetStore::Upload(std::int64_t owner, const std::vector<std::string>& collectionIds,
                                const std::string& name, const std::string& contentType, const std::string& bytes)
 {
+    ContentFiles::Incoming content(mContent);
+    content.Append(bytes.data(), bytes.size());
+    return Upload(owner, collectionIds, name, contentType, content);
+}
+
+AssetRecord AssetStore::Upload(std::int64_t owner, const std::vector<std::string>& collectionIds,
+                               const std::string& name, const std::string& contentType, ContentFiles::Incoming& content)
+{
     if (IsCollectionMediaType(contentType)) throw StoreFailure(400, "a collection's media type is no content type");
     if (collectionIds.empty()) throw StoreFailure(400, "an upload needs a collection");
     {
@@ -108,10 +116,10 @@ AssetRecord AssetStore::Upload(std::int64_t owner, const std::vector<std::string
     record.mId = RandomHex(16);
     record.mMediaType = contentType.empty() ? std::string(kMediaDefaultContent) : contentType;
     record.mName = name;
-    record.mSize = static_cast<std::int64_t>(bytes.size());
+    record.mSize = static_cast<std::int64_t>(content.Size());
     record.mEtag = NewEtag();
     // Bytes first, durable: the metadata that names them commits only after.
-    mContent.Write(record.mId, bytes);
+    content.Keep(record.mId);
     try {
         std::lock_guard<std::mutex> writer(mDatabase.WriteLock());
         Database::Lease db = mDatabase.Acquire();

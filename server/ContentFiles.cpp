@@ -59,37 +59,66 @@ std::string ContentFiles::PathOf(const std::string& id) const
     return mDirectory + "/" + id;
 }
 
-void ContentFiles::Write(const std::string& id, const std::string& bytes)
+ContentFiles::Incoming::Incoming(ContentFiles& files)
+    : mFiles(files), mTemporary(files.mDirectory + "/" + kTemporaryPrefix + "XXXXXX")
 {
-    std::string temporary = mDirectory + "/" + kTemporaryPrefix + id + ".XXXXXX";
-    const int fd = ::mkstemp(&temporary[0]);
-    if (fd < 0) Fail("cannot create", temporary);
+    mFd = ::mkstemp(&mTemporary[0]);
+    if (mFd < 0) Fail("cannot create", mTemporary);
+}
+
+ContentFiles::Incoming::~Incoming()
+{
+    Discard();
+}
+
+void ContentFiles::Incoming::Discard()
+{
+    if (mFd < 0) return;
+    ::close(mFd);
+    mFd = -1;
+    ::unlink(mTemporary.c_str());
+}
+
+void ContentFiles::Incoming::Append(const char* data, std::size_t size)
+{
+    if (mFd < 0) throw std::runtime_error("content already kept or discarded");
     std::size_t written = 0;
-    while (written < bytes.size()) {
-        const ssize_t n = ::write(fd, bytes.data() + written, bytes.size() - written);
+    while (written < size) {
+        const ssize_t n = ::write(mFd, data + written, size - written);
         if (n < 0) {
             if (errno == EINTR) continue;
             const int saved = errno;
-            ::close(fd);
-            ::unlink(temporary.c_str());
+            Discard();
             errno = saved;
-            Fail("cannot write", temporary);
+            Fail("cannot write", mTemporary);
         }
         written += static_cast<std::size_t>(n);
     }
-    if (::fsync(fd) != 0 || ::close(fd) != 0) {
+    mSize += size;
+}
+
+void ContentFiles::Incoming::Keep(const std::string& id)
+{
+    if (mFd < 0) throw std::runtime_error("content already kept or discarded");
+    const int fd = mFd;
+    mFd = -1;
+    const bool synced = ::fsync(fd) == 0;
+    const int syncError = errno;
+    const bool closed = ::close(fd) == 0;
+    if (!synced) errno = syncError;
+    if (!synced || !closed) {
         const int saved = errno;
-        ::unlink(temporary.c_str());
+        ::unlink(mTemporary.c_str());
         errno = saved;
-        Fail("cannot sync", temporary);
+        Fail("cannot sync", mTemporary);
     }
-    if (::rename(temporary.c_str(), PathOf(id).c_str()) != 0) {
+    if (::rename(mTemporary.c_str(), mFiles.PathOf(id).c_str()) != 0) {
         const int saved = errno;
-        ::unlink(temporary.c_str());
+        ::unlink(mTemporary.c_str());
         errno = saved;
-        Fail("cannot rename", temporary);
+        Fail("cannot rename", mTemporary);
     }
-    SyncDirectory(mDirectory);
+    SyncDirectory(mFiles.mDirectory);
 }
 
 std::string ContentFiles::Read(const std::string& id) const

@@ -1,12 +1,13 @@
 #pragma once
 // Content bytes as one file per item under <data>/content. A write lands in
 // a temporary sibling that is synced and renamed, and the directory is
-// synced after the rename: once Write returns, the bytes survive a crash,
+// synced after the rename: once Incoming::Keep returns, the bytes survive a crash,
 // and a crash before that leaves no file under the item's name.
 //
-// Threads: any. Errors: Write and Read throw std::runtime_error with the
-// system's message; Remove ignores a missing file.
+// Threads: any. Errors: Read and Incoming throw std::runtime_error
+// with the system's message; Remove ignores a missing file.
 
+#include <cstdint>
 #include <string>
 #include <vector>
 
@@ -15,10 +16,33 @@ namespace server {
 
 class ContentFiles {
 public:
+    // Content arriving in pieces, as an upload's body does: it goes to a
+    // temporary file, and Keep makes it durable under an item's id. Until
+    // then (a refused or broken upload) the destructor removes it.
+    class Incoming {
+    public:
+        explicit Incoming(ContentFiles& files);
+        ~Incoming();
+        Incoming(const Incoming&) = delete;
+        Incoming& operator=(const Incoming&) = delete;
+
+        void Append(const char* data, std::size_t size);
+        std::uint64_t Size() const { return mSize; }
+        // Syncs the bytes, renames them to the id and syncs the directory.
+        void Keep(const std::string& id);
+
+    private:
+        void Discard();
+
+        ContentFiles& mFiles;
+        std::string mTemporary;
+        int mFd = -1;
+        std::uint64_t mSize = 0;
+    };
+
     // Makes the directory; removes temporaries a crash may have left.
     explicit ContentFiles(const std::string& dataDirectory);
 
-    void Write(const std::string& id, const std::string& bytes);
     std::string Read(const std::string& id) const;
     void Remove(const std::string& id);
     // Every item id that has a file, temporaries left out.

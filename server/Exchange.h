@@ -9,6 +9,7 @@
 #include <httplib.h>
 
 #include "server/AnswerStyle.h"
+#include "server/ContentFiles.h"
 
 namespace tolmonetsync {
 namespace server {
@@ -23,6 +24,8 @@ struct Exchange {
     AnswerStyle mStyle;                // as it was when the request arrived
     AssetStore& mAssets;
     int mPort = 0;  // the service's own port, for absolute URLs
+    // An upload's body, received into a content file; null for other requests.
+    ContentFiles::Incoming* mUpload = nullptr;
 
     // The query value, or empty; present tells whether the key was there.
     std::string Query(const char* key, bool* present = nullptr) const;

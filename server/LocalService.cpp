@@ -12,6 +12,7 @@
 #include "server/ContentFiles.h"
 #include "server/DataDirectoryLock.h"
 #include "server/Database.h"
+#include "server/GracefulServer.h"
 #include "server/IdentityRoutes.h"
 #include "server/InternalError.h"
 #include "server/Router.h"
@@ -50,6 +51,10 @@ LocalService::LocalService(const LocalServiceOptions& options) : mOptions(option
     mThrottle = std::make_unique<SignInThrottle>(mOptions.mSignInDelays);
     mIdentityRouter =
         std::make_unique<Router>(IdentityRoutes(*mSessions, *mAccounts, *mThrottle, mOptions.mDeniedUsers));
+    mGate = std::make_unique<BodyGate>(
+        *mContent, mOptions.mMaxUploadBytes, [this](const httplib::Request& request) { return Admit(request); },
+        [this](const httplib::Request& request, httplib::Response& response, const Admission& admission,
+               ContentFiles::Incoming* upload) { Answer(request, response, admission, upload); });
     mAssets->RemoveUnreferencedContent();
     for (const ServiceUser& user : mOptions.mUsers) mAccounts->SetUser(user.mName, user.mPassword, user.mEmail);
     for (const ServiceToken& token : mOptions.mTokens) {
@@ -68,13 +73,13 @@ void LocalService::Start()
     std::unique_ptr<httplib::Server> server;
     if (Secure()) {
         auto secure =
-            std::make_unique<httplib::SSLServer>(mOptions.mCertificateFile.c_str(), mOptions.mPrivateKeyFile.c_str());
+            std::make_unique<GracefulSslServer>(mOptions.mCertificateFile.c_str(), mOptions.mPrivateKeyFile.c_str());
         if (!secure->is_valid())
             throw std::runtime_error("cannot serve HTTPS with the certificate " + mOptions.mCertificateFile +
                                      " and the key " + mOptions.mPrivateKeyFile);
         server = std::move(secure);
     } else {
-        server = std::make_unique<httplib::Server>();
+        server = std::make_unique<GracefulServer>();
     }
     const auto workers = static_cast<std::size_t>(mOptions.mWorkers);
     const auto maxConnections = static_cast<std::size_t>(mOptions.mMaxConnections);
@@ -91,20 +96,7 @@ void LocalService::Start()
     // (a client reconnects on loopback at once), so that many idle clients
     // never starve busy ones and a stop never waits long for one.
     server->set_keep_alive_timeout(1);
-    // Faults apply once the body is read, so an answer never leaves unread
-    // bytes on a kept-alive connection.
-    const auto handler = [this](const httplib::Request& request, httplib::Response& response) {
-        const std::size_t question = request.target.find('?');
-        const std::string query = question == std::string::npos ? std::string() : request.target.substr(question + 1);
-        const boost::optional<FaultRule> fault = mFaults.Match(request.method, request.path, query);
-        if (fault && ApplyFault(*fault, request, response)) return;
-        Serve(request, response);
-    };
-    server->Get(".*", handler);
-    server->Post(".*", handler);
-    server->Put(".*", handler);
-    server->Delete(".*", handler);
-    server->Patch(".*", handler);
+    mGate->Install(*server);
     int port = mOptions.mPort;
     if (port == 0) {
         port = server->bind_to_any_port(mOptions.mHost.c_str());
@@ -165,29 +157,40 @@ AnswerStyle LocalService::GetAnswerStyle() const
     return mStyle;
 }
 
-void LocalService::Serve(const httplib::Request& request, httplib::Response& response)
+Admission LocalService::Admit(const httplib::Request& request) const
 {
-    Exchange exchange{request, response, {}, 0, GetAnswerStyle(), *mAssets, mPort};
-    if (request.path.compare(0, 6, "/ovra/") == 0) {
-        try {
-            mIdentityRouter->Dispatch(exchange);
-        } catch (const std::exception& failure) {
-            AnswerInternalError(request, response, failure.what());
-        }
-        return;
-    }
+    // The identity service has its own sign-in.
+    if (request.path.compare(0, 6, "/ovra/") == 0) return Admission();
     if (request.path.compare(0, 5, "/api/") != 0 && request.path != "/api") {
-        exchange.Text(404, "no such resource " + request.path);
-        return;
+        return Admission{404, "no such resource " + request.path, 0};
     }
+    const boost::optional<std::int64_t> user = mAccounts->UserForToken(BearerToken(request));
+    if (!user) return Admission{401, "missing or unknown access token", 0};
+    return Admission{0, std::string(), *user};
+}
+
+void LocalService::Answer(const httplib::Request& request, httplib::Response& response, const Admission& admission,
+                          ContentFiles::Incoming* upload)
+{
+    // Faults apply once the body is read, so an answer never leaves unread
+    // bytes on a kept-alive connection.
+    const std::size_t question = request.target.find('?');
+    const std::string query = question == std::string::npos ? std::string() : request.target.substr(question + 1);
+    const boost::optional<FaultRule> fault = mFaults.Match(request.method, request.path, query);
+    if (fault && ApplyFault(*fault, request, response)) return;
+    Serve(request, response, admission.mUser, upload);
+}
+
+void LocalService::Serve(const httplib::Request& request, httplib::Response& response, std::int64_t user,
+                         ContentFiles::Incoming* upload)
+{
+    Exchange exchange{request, response, {}, user, GetAnswerStyle(), *mAssets, mPort, upload};
     try {
-        const boost::optional<std::int64_t> user = mAccounts->UserForToken(BearerToken(request));
-        if (!user) {
-            exchange.Text(401, "missing or unknown access token");
-            return;
+        if (request.path.compare(0, 6, "/ovra/") == 0) {
+            mIdentityRouter->Dispatch(exchange);
+        } else {
+            mRouter->Dispatch(exchange);
         }
-        exchange.mUser = *user;
-        mRouter->Dispatch(exchange);
     } catch (const StoreFailure& failure) {
         exchange.Text(failure.Status(), failure.what());
     } catch (const std::exception& failure) {

@@ -27,6 +27,7 @@
 #include <httplib.h>
 
 #include "server/AnswerStyle.h"
+#include "server/BodyGate.h"
 #include "server/FaultHooks.h"
 #include "server/SignInThrottle.h"
 
@@ -73,6 +74,8 @@ struct LocalServiceOptions {
     // files), else plain HTTP.
     std::string mCertificateFile;
     std::string mPrivateKeyFile;
+    // Uploads over this many bytes are refused with 413 (1 GiB).
+    std::uint64_t mMaxUploadBytes = std::uint64_t(1) << 30;
 };
 
 class LocalService {
@@ -107,7 +110,13 @@ public:
     ContentFiles& Content() { return *mContent; }
 
 private:
-    void Serve(const httplib::Request& request, httplib::Response& response);
+    // Who may send this request, from its headers alone.
+    Admission Admit(const httplib::Request& request) const;
+    // With the body read: a fault, or the route's answer.
+    void Answer(const httplib::Request& request, httplib::Response& response, const Admission& admission,
+                ContentFiles::Incoming* upload);
+    void Serve(const httplib::Request& request, httplib::Response& response, std::int64_t user,
+               ContentFiles::Incoming* upload);
     // Handled means the fault is the whole answer.
     bool ApplyFault(const FaultRule& rule, const httplib::Request& request, httplib::Response& response);
 
@@ -121,6 +130,7 @@ private:
     std::unique_ptr<Sessions> mSessions;
     std::unique_ptr<SignInThrottle> mThrottle;
     std::unique_ptr<Router> mIdentityRouter;
+    std::unique_ptr<BodyGate> mGate;
     std::unique_ptr<httplib::Server> mServer;
     std::thread mThread;
     int mPort = 0;

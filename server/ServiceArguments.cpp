@@ -68,5 +68,17 @@ std::int64_t ParseSecondsArgument(const std::string& text)
     return seconds;
 }
 
+std::uint64_t ParseBytesArgument(const std::string& text)
+{
+    std::uint64_t bytes = 0;
+    for (char c : text) {
+        if (c < '0' || c > '9' || bytes > (std::uint64_t(1) << 60))
+            throw std::invalid_argument("expected a number of bytes");
+        bytes = bytes * 10 + static_cast<std::uint64_t>(c - '0');
+    }
+    if (bytes < 1) throw std::invalid_argument("expected a number of bytes, at least 1");
+    return bytes;
+}
+
 }  // namespace server
 }  // namespace tolmonetsync

@@ -1,6 +1,6 @@
 #pragma once
 // The service's command-line values: "--user NAME:PASSWORD[:EMAIL]",
-// "--token NAME:TOKEN" and "--listen HOST:PORT". Each throws
+// "--token NAME:TOKEN", "--listen HOST:PORT" and the numbers. Each throws
 // std::invalid_argument with a one-line reason for a value it cannot take.
 
 #include <cstdint>
@@ -19,6 +19,8 @@ ServiceToken ParseTokenArgument(const std::string& text);
 void ParseListenArgument(const std::string& text, LocalServiceOptions& options);
 // A whole number of seconds, at least 1.
 std::int64_t ParseSecondsArgument(const std::string& text);
+// A whole number of bytes, at least 1.
+std::uint64_t ParseBytesArgument(const std::string& text);
 
 }  // namespace server
 }  // namespace tolmonetsync

@@ -40,6 +40,7 @@ public:
     // "http://127.0.0.1:PORT" ("https" when serving with a certificate)
     const std::string& Base() const { return mBase; }
     std::string ApiUrl() const { return mBase + "/api"; }
+    pid_t Pid() const { return mPid; }
     // Sends SIGTERM and gives the exit status.
     int Stop();
 

@@ -225,5 +225,42 @@ INSTANTIATE_TEST_SUITE_P(Styles, ClientAgreementTest,
                                            Style(server::IdForm_ApiPath, false, server::HeaderCase_Upper, false, false),
                                            Style(server::IdForm_UrlOnly, true, server::HeaderCase_Usual, true, true)));
 
+// A service that takes uploads of 1 MiB at most.
+class UploadLimitTest : public ClientAgreementTest {
+protected:
+    tolmonetsync::server::LocalServiceOptions Options() const override
+    {
+        tolmonetsync::server::LocalServiceOptions options = ClientAgreementTest::Options();
+        options.mMaxUploadBytes = 1 << 20;
+        return options;
+    }
+};
+
+TEST_P(UploadLimitTest, AnUploadOverTheLimitReachesTheLibraryAsThe413)
+{
+    Call root;
+    ASSERT_FALSE(mClient->GetRootAsync(root.CollectionDone(), root.Error(), Guid::CreateUnique()).IsNil());
+    ASSERT_TRUE(root.Succeeded()) << root.Status();
+    auto rootCollection = boost::dynamic_pointer_cast<Collection>(root.Asset());
+    ASSERT_TRUE(rootCollection);
+    const ImmutableString type = ImmutableString::CreateStatic("application/octet-stream");
+
+    // Not a connection reset (-100): the service reads 1 MiB of it, answers and closes gracefully.
+    Call tooLarge;
+    mClient->UploadAsync(tooLarge.ItemDone(), tooLarge.Error(), rootCollection, Source(std::string(2 << 20, 'x')), type,
+                         u"big.bin", Guid::CreateUnique());
+    EXPECT_FALSE(tooLarge.Succeeded());
+    EXPECT_EQ(413, tooLarge.Status());
+    EXPECT_EQ(0u, mService->Content().TemporaryCount());
+
+    Call fits;
+    mClient->UploadAsync(fits.ItemDone(), fits.Error(), rootCollection, Source(std::string(1 << 20, 'y')), type,
+                         u"fits.bin", Guid::CreateUnique());
+    ASSERT_TRUE(fits.Succeeded()) << fits.Status();
+    EXPECT_EQ(1 << 20, boost::dynamic_pointer_cast<Item>(fits.Asset())->mSize);
+}
+
+INSTANTIATE_TEST_SUITE_P(OneStyle, UploadLimitTest, ::testing::Values(AnswerStyle()));
+
 }  // namespace
 }  // namespace servertest

@@ -52,5 +52,12 @@ TEST(ServiceArguments, ListenOnLoopbackOnly)
     EXPECT_THROW(ParseListenArgument("8080", options), std::invalid_argument);
 }
 
+TEST(ServiceArguments, UploadLimitIsAWholePositiveNumberOfBytes)
+{
+    EXPECT_EQ(1073741824u, ParseBytesArgument("1073741824"));
+    for (const char* bad : {"", "0", "-5", "1e9", "1 MiB", "99999999999999999999999"})
+        EXPECT_THROW(ParseBytesArgument(bad), std::invalid_argument) << bad;
+}
+
 }  // namespace
 }  // namespace servertest

@@ -44,7 +44,7 @@ protected:
     std::vector<std::string> Ids(const Reply& reply);
     std::vector<boost::shared_ptr<tolmonetsync::AssetBase> > Assets(const Reply& reply);
 
-    tolmonetsync::server::LocalServiceOptions Options() const;
+    virtual tolmonetsync::server::LocalServiceOptions Options() const;
 
     testsupport::TempDir mData;
     std::unique_ptr<tolmonetsync::server::LocalService> mService;
