@@ -138,6 +138,7 @@ void BodyGate::WithoutBody(const httplib::Request& request, httplib::Response& r
 void BodyGate::WithBody(const httplib::Request& request, httplib::Response& response,
                         const httplib::ContentReader& reader) const
 {
+    StartReadingBody();
     try {
         const Admission admission = mAdmit(request);
         const std::uint64_t limit = LimitFor(request);

@@ -19,6 +19,12 @@ namespace {
 
 // Set by a handler, read by the loop of the same worker thread.
 thread_local bool tCloseAfterAnswer = false;
+// The request line and headers are read before any handler can judge the
+// sender, and the library gathers each line whole: bound what one request's
+// head may take, so that memory never grows with what an unknown client sends.
+const std::size_t kMaxHeadBytes = 64 * 1024;
+thread_local std::size_t tHeadBytes = 0;
+thread_local bool tReadingBody = false;
 
 const int kIdleSliceMs = 50;  // how often an idle connection looks for a stop
 const int kDrainMs = 1000;    // how long a closing connection still reads
@@ -85,6 +91,7 @@ public:
             mEnd = static_cast<std::size_t>(n);
         }
         const std::size_t n = std::min(size, mEnd - mBegin);
+        if (!tReadingBody && (tHeadBytes += n) > kMaxHeadBytes) return -1;
         std::memcpy(ptr, mBuffer.data() + mBegin, n);
         mBegin += n;
         return static_cast<ssize_t>(n);
@@ -176,6 +183,8 @@ bool RunConnection(ConnectionStream& stream, const std::atomic<socket_t>& listen
     bool ok = false;
     for (std::size_t left = keepAliveCount; left > 0 && stream.WaitForRequest(listener); --left) {
         bool closed = false;
+        tHeadBytes = 0;
+        tReadingBody = false;
         ok = process(stream, left == 1, closed);
         if (!ok || closed || tCloseAfterAnswer) break;
     }
@@ -194,6 +203,11 @@ void SetSocketTimeouts(int fd, int readMs, int writeMs)
 }
 
 }  // namespace
+
+void StartReadingBody()
+{
+    tReadingBody = true;
+}
 
 void CloseAfterAnswer(httplib::Response& response)
 {

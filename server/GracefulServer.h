@@ -18,6 +18,11 @@
 namespace tolmonetsync {
 namespace server {
 
+// A request's line and headers may take 64 KiB; past that the connection
+// ends without an answer. A handler calls StartReadingBody before it reads a
+// body, which has limits of its own.
+void StartReadingBody();
+
 // Marks the connection whose request this thread is handling, and adds
 // "Connection: close" to the answer.
 void CloseAfterAnswer(httplib::Response& response);

@@ -31,19 +31,24 @@ struct IssuedTokens {
 
 class Sessions {
 public:
+    // A session (its refresh and device tokens) that neither signs in nor
+    // refreshes for this long ends, with its access tokens.
+    static const std::int64_t kSessionIdleSeconds = 30 * 24 * 3600;
+
     // Access tokens live `accessTtlSeconds` (0: an hour).
     Sessions(Database& database, Accounts& accounts, std::int64_t accessTtlSeconds);
 
     // None for an unknown user or a wrong password.
     boost::optional<IssuedTokens> SignIn(const std::string& name, const std::string& password);
-    // None for a refresh token that is unknown or was rotated away.
+    // None for a refresh token that is unknown, was rotated away, or whose
+    // session went unused for kSessionIdleSeconds.
     boost::optional<IssuedTokens> Refresh(const std::string& refreshToken);
     // Ends the session of that device token; false if there was none.
     bool Invalidate(const std::string& deviceToken);
 
 private:
-    // Deletes expired access tokens and their links to sessions; the
-    // caller holds the write lock.
+    // Deletes expired access tokens, idle sessions with their tokens, and
+    // links to either; the caller holds the write lock.
     void PurgeExpired(Connection& db);
     std::string GrantAccess(Connection& db, std::int64_t user, const std::string& deviceHash);
 

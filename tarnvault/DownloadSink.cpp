@@ -36,7 +36,9 @@ void DownloadSink::WriteBlock(const unsigned char* data, std::size_t size)
 {
     if (!mStream) {
         mFile.Create(false);
-        mStream.reset(new tolmocore::filesupport::OPlatformByteStream(mFile, 0));
+        // Private while it arrives: the swap gives it the mode of the file it
+        // replaces, or a new file's default.
+        mStream.reset(new tolmocore::filesupport::OPlatformByteStream(mFile, 0, 0600));
     }
     // Bodies may pass the block call's 32-bit size; so can one Append.
     while (size > 0) {

@@ -19,6 +19,23 @@ namespace {
 
 constexpr unsigned int kCopyBlockSize = 64 * 1024;
 
+// The process's umask, read without changing it (umask(2) would, for a moment,
+// for every thread). The kernel reports it since 4.7; older ones get the
+// common 022.
+mode_t CurrentUmask()
+{
+    if (FILE* status = std::fopen("/proc/self/status", "re")) {
+        char line[256];
+        unsigned int mask = 0;
+        bool found = false;
+        while (!found && std::fgets(line, sizeof line, status))
+            found = std::sscanf(line, "Umask: %o", &mask) == 1;
+        std::fclose(status);
+        if (found) return static_cast<mode_t>(mask & 0777);
+    }
+    return 022;
+}
+
 }  // namespace
 
 File::File() = default;
@@ -86,6 +103,9 @@ void File::PrepareToReplace(const File& target) const
             errno != EPERM)
             result = -1;
         if (result == 0) result = ops->Fchmod(fd, old.st_mode & 07777);
+    } else {
+        // Downloads arrive private; a new file gets what any new file gets.
+        result = ops->Fchmod(fd, 0666 & ~CurrentUmask());
     }
     if (result == 0 && ops->Fsync(fd) != 0 && errno != EINVAL) result = -1;
     const int error = errno;

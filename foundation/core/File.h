@@ -52,9 +52,8 @@ public:
     // Goes through FileOps (FileOps.h).
     void Rename(const UTF16String& newName);
     // Readies this file to be renamed over `target`: gives it the target's
-    // permission bits and, where the process may, its owner and group (a
-    // missing target leaves this file's own, which for a new file is the
-    // umask's default), then syncs it. Done before the rename, the file under
+    // permission bits and, where the process may, its owner and group (with
+    // no target, the umask's default for a new file), then syncs it. Done before the rename, the file under
     // the target's name is never more open than it was. Goes through FileOps;
     // a symbolic link in this file's place is refused. Throws on failure, a
     // refused change of owner (EPERM) aside.

@@ -1,7 +1,7 @@
 // Bodies the service must not hold: `tolmonetsync serve` as a process of its
 // own, sent bodies made on the fly, and its peak memory (VmHWM) read before
-// and after. A refused body is answered without being read; an accepted
-// upload goes to its file as it arrives.
+// and after. A refused body is answered without being read, a request head
+// is bounded, and an accepted upload goes to its file as it arrives.
 
 #include <algorithm>
 #include <cstdint>
@@ -9,6 +9,11 @@
 #include <filesystem>
 #include <fstream>
 #include <string>
+
+#include <arpa/inet.h>
+#include <netinet/in.h>
+#include <sys/socket.h>
+#include <unistd.h>
 
 #include <curl/curl.h>
 #include <gtest/gtest.h>
@@ -71,6 +76,29 @@ Sent PostGenerated(const std::string& url, const std::string& token, std::uint64
     return sent;
 }
 
+// Sends a request line that never ends, `size` bytes of it; gives how many
+// the service took before it closed the connection.
+std::uint64_t SendEndlessRequestLine(const std::string& apiUrl, std::uint64_t size)
+{
+    const std::size_t colon = apiUrl.rfind(':');
+    sockaddr_in address{};
+    address.sin_family = AF_INET;
+    address.sin_port = htons(static_cast<std::uint16_t>(std::stoi(apiUrl.substr(colon + 1))));
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    const int fd = ::socket(AF_INET, SOCK_STREAM, 0);
+    EXPECT_EQ(0, ::connect(fd, reinterpret_cast<const sockaddr*>(&address), sizeof address));
+    std::string chunk = "GET /api/";
+    chunk.resize(64 * 1024, 'a');
+    std::uint64_t sent = 0;
+    while (sent < size) {
+        const ssize_t n = ::send(fd, chunk.data(), chunk.size(), MSG_NOSIGNAL);
+        if (n <= 0) break;
+        sent += static_cast<std::uint64_t>(n);
+    }
+    ::close(fd);
+    return sent;
+}
+
 long PeakKiB(pid_t pid)
 {
     std::ifstream status("/proc/" + std::to_string(pid) + "/status");
@@ -123,7 +151,12 @@ TEST_F(ServedBodyTest, RefusedBodiesAreAnsweredWithoutBeingHeld)
     EXPECT_LT(PeakKiB(mServed.Pid()) - before, kPeakSlackKiB);
     EXPECT_EQ(0u, ContentFiles("incoming."));
 
-    // Still serving, and nothing was kept of either.
+    // A head that never ends is cut off long before it could fill memory.
+    before = PeakKiB(mServed.Pid());
+    EXPECT_LT(SendEndlessRequestLine(mServed.ApiUrl(), 256 * kMiB), 256 * kMiB);
+    EXPECT_LT(PeakKiB(mServed.Pid()) - before, kPeakSlackKiB);
+
+    // Still serving, and nothing was kept of any of them.
     ServiceClient client(mServed.ApiUrl(), kToken);
     const Reply found = client.Send("POST", "/search?q=" + Quote("{\"name\": \"big.bin\"}"));
     EXPECT_EQ(200, found.mStatus);

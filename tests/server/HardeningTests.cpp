@@ -6,6 +6,8 @@
 
 #include <sys/stat.h>
 
+#include <boost/json.hpp>
+
 #include "ServiceFixture.h"
 #include "server/Accounts.h"
 #include "server/ContentFiles.h"
@@ -135,6 +137,40 @@ TEST_F(SignInTest, ExpiredTokensArePurgedOnSignInAndAtStartUp)
     mService.reset();
     mService = std::make_unique<LocalService>(options);
     EXPECT_EQ(0, rows("stale-two"));
+}
+
+TEST_F(SignInTest, ASessionUnusedForAMonthEndsWithItsTokens)
+{
+    ServiceClient identity(mService->IdentityServiceUrl(), "");
+    const auto signIn = [&identity] {
+        return boost::json::parse(identity.Send("POST", "/login/v1/device?username=ann&password=secret").mBody);
+    };
+    const auto refresh = [&identity](const boost::json::value& tokens) {
+        return identity
+            .Send("POST", "/token/v1?grant_type=refresh_token&refresh_token=" +
+                              Quote(boost::json::value_to<std::string>(tokens.at("refresh_token"))))
+            .mStatus;
+    };
+    const auto accessWorks = [this](const boost::json::value& tokens) {
+        ServiceClient client(mService->AssetServiceUrl(),
+                             boost::json::value_to<std::string>(tokens.at("access_token")));
+        return client.Send("GET", "/collections?name=app").mStatus == 200;
+    };
+    const boost::json::value idle = signIn();
+    const boost::json::value active = signIn();
+    {
+        tolmonetsync::server::Database database(mData.Path().string() + "/service.sqlite3", 1);
+        tolmonetsync::server::Database::Lease db = database.Acquire();
+        tolmonetsync::server::Statement(*db, "UPDATE sessions SET used = ?1 WHERE device_hash = ?2")
+            .Bind(1, std::int64_t(1))
+            .Bind(2, tolmonetsync::server::Sha256Hex(boost::json::value_to<std::string>(idle.at("device_token"))))
+            .Run();
+    }
+    EXPECT_EQ(400, refresh(idle));
+    signIn();  // purges
+    EXPECT_FALSE(accessWorks(idle));
+    EXPECT_TRUE(accessWorks(active));
+    EXPECT_EQ(200, refresh(active));
 }
 
 TEST_F(ServiceTest, AStorageFailureAnswersWithoutPathsOfTheMachine)

@@ -259,6 +259,9 @@ TEST_F(TransferTest, DownloadReachingItsLimitFailsAndRemovesItsFile)
     ASSERT_TRUE(below.Succeeded());
     EXPECT_EQ(below.DownloadSeen().mContentSize, limit - 1);
     EXPECT_EQ(ReadFileBytes(mDir / "g.txt.temp"), std::string(limit - 1, ' '));
+    // Nobody else's business until the swap gives it the mode it will keep.
+    EXPECT_EQ(std::filesystem::status(mDir / "g.txt.temp").permissions() & std::filesystem::perms::mask,
+              std::filesystem::perms::owner_read | std::filesystem::perms::owner_write);
 }
 
 TEST_F(TransferTest, DownloadRefusedWithAHugeTextIsStoppedAtTheJSONBound)
