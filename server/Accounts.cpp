@@ -125,6 +125,15 @@ void Accounts::GrantToken(const std::string& name, const std::string& token, std
         .Run();
 }
 
+void Accounts::ExpireTokensOf(const std::string& name)
+{
+    std::lock_guard<std::mutex> writer(mDatabase.WriteLock());
+    Database::Lease db = mDatabase.Acquire();
+    Statement(*db, "UPDATE tokens SET expires = 1 WHERE user_id = (SELECT id FROM users WHERE name = ?1)")
+        .Bind(1, name)
+        .Run();
+}
+
 boost::optional<std::int64_t> Accounts::UserForToken(const std::string& token)
 {
     if (token.empty()) return boost::none;

@@ -38,6 +38,9 @@ public:
     // A token for that user; ttlSeconds 0 never expires, and one below 0
     // has expired already (for tests of refusal).
     void GrantToken(const std::string& name, const std::string& token, std::int64_t ttlSeconds = 0);
+    // Ends every access token of that user now, as their lifetime would: for
+    // trying what a client does with an expired token without waiting.
+    void ExpireTokensOf(const std::string& name);
     // The user a token opens, if it is known and has not expired.
     boost::optional<std::int64_t> UserForToken(const std::string& token);
     boost::optional<UserInfo> User(std::int64_t user);

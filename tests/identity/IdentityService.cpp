@@ -47,13 +47,12 @@ private:
 
 }  // namespace
 
-IdentityService::IdentityService(std::int64_t tokenTtlSeconds)
+IdentityService::IdentityService()
 {
     server::LocalServiceOptions options;
     options.mDataDirectory = mData.Path().string();
     options.mUsers = {{"ann", "secret", "ann@example.test"}, {"bob", "secret", ""}};
     options.mDeniedUsers = {"bob"};
-    options.mTokenTtlSeconds = tokenTtlSeconds;
     mService.reset(new server::LocalService(options));
     mService->Start();
     SetOvraServiceURL(Text(mService->IdentityServiceUrl()));

@@ -27,7 +27,7 @@ struct Answered {
 // ann:secret may sign in; bob:secret is refused as a denied account.
 class IdentityService {
 public:
-    explicit IdentityService(std::int64_t tokenTtlSeconds = 0);
+    IdentityService();
     ~IdentityService();
 
     server::LocalService& Service() { return *mService; }

@@ -4,7 +4,6 @@
 
 #include <gtest/gtest.h>
 
-#include <thread>
 
 #include "IdentityService.h"
 #include "server/FaultHooks.h"
@@ -160,7 +159,7 @@ TEST(StoredSignIn, SurvivesANewClientObjectIsProvedAndForgottenOnLogout)
 TEST(StoredSignIn, AnExpiredTokenFailsUntilTheHostRefreshesIt)
 {
     testsupport::PrefDirScope prefs;
-    IdentityService service(1);
+    IdentityService service;
     const Answered signedIn = service.SignIn("ann", "secret");
     ASSERT_EQ(signedIn.Status(), 200);
     const auto client = service.Client();
@@ -169,7 +168,7 @@ TEST(StoredSignIn, AnExpiredTokenFailsUntilTheHostRefreshesIt)
               }),
               SyncServer_Connected);
 
-    std::this_thread::sleep_for(std::chrono::milliseconds(2100));
+    service.Service().GetAccounts().ExpireTokensOf("ann");
     EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return client->CheckConnection(report); }),
               SyncServer_ConnectionFailed);
     std::string refusal;
