@@ -5,6 +5,7 @@
 
 #include "server/Exchange.h"
 #include "server/GracefulServer.h"
+#include "server/InternalError.h"
 
 namespace tolmonetsync {
 namespace server {
@@ -130,8 +131,7 @@ void BodyGate::WithoutBody(const httplib::Request& request, httplib::Response& r
         }
         mAnswer(request, response, admission, nullptr);
     } catch (const std::exception& failure) {
-        response.status = 500;
-        response.set_content(OneLine(std::string("internal error: ") + failure.what()), "text/plain; charset=utf-8");
+        AnswerInternalError(request, response, failure.what());
     }
 }
 
@@ -171,7 +171,8 @@ void BodyGate::WithBody(const httplib::Request& request, httplib::Response& resp
         }
     } catch (const std::exception& failure) {
         // The body may be partly unread.
-        RefuseAndClose(response, 500, std::string("internal error: ") + failure.what());
+        AnswerInternalError(request, response, failure.what());
+        CloseAfterAnswer(response);
     }
 }
 
@@ -188,7 +189,8 @@ int BodyGate::Expect(const httplib::Request& request, httplib::Response& respons
             return 100;
         }
     } catch (const std::exception& failure) {
-        RefuseAndClose(response, 500, std::string("internal error: ") + failure.what());
+        AnswerInternalError(request, response, failure.what());
+        CloseAfterAnswer(response);
     }
     return response.status;
 }

@@ -8,6 +8,7 @@
 #include <boost/shared_ptr.hpp>
 
 #include "identity/OvraAuth.h"
+#include "server/Accounts.h"
 #include "server/LocalService.h"
 #include "support/TempDir.h"
 #include "tarnvault/Tarnvault.h"
