@@ -1,5 +1,5 @@
-// Whole syncs against the in-memory server, and the content checksum against
-// the xxh128sum command on the same file.
+// Whole syncs against the local service in this process over loopback, and
+// the content checksum against the xxh128sum command on the same file.
 //
 // Scale: prepare and pass over 1,000 and 10,000 files of one group should
 // cost about ten times as much, not a hundred: compare the two figures of
@@ -12,15 +12,66 @@
 #include <filesystem>
 #include <fstream>
 #include <mutex>
+#include <stdexcept>
 
-#include "support/InMemoryServer.h"
-#include "support/TempDir.h"
+#include "foundation/net/HeaderConstants.h"
+#include "server/LocalService.h"
 #include "sync/SyncFilesService.h"
+#include "tarnvault/Tarnvault.h"
 
 using namespace tolmonetsync;
 namespace fs = std::filesystem;
 
 namespace {
+
+const char kToken[] = "bench-token";
+
+// A directory of its own under /tmp, removed with the object.
+class ScratchDir {
+public:
+    ScratchDir()
+    {
+        char pattern[] = "/tmp/tolmonetsync-sync-bench-XXXXXX";
+        if (mkdtemp(pattern) == nullptr) throw std::runtime_error("mkdtemp failed");
+        mPath = pattern;
+    }
+    ~ScratchDir()
+    {
+        std::error_code ignored;
+        fs::remove_all(mPath, ignored);
+    }
+    const fs::path& Path() const { return mPath; }
+
+private:
+    fs::path mPath;
+};
+
+// The local service on a free port, with one user holding kToken.
+class Service {
+public:
+    Service()
+    {
+        server::LocalServiceOptions options;
+        options.mDataDirectory = mData.Path().string();
+        options.mTokens.push_back({"bench", kToken});
+        mService.reset(new server::LocalService(options));
+        mService->Start();
+    }
+    ~Service() { mService->Stop(); }
+
+    boost::shared_ptr<SyncServer> Client() const
+    {
+        ParameterList parameters;
+        parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(mService->AssetServiceUrl()));
+        parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, UTF8String("bench"));
+        parameters.emplace_back(tolmonet::kHEADER_COOKIE, UTF8String(kToken));
+        return boost::shared_ptr<SyncServer>(new tarnvault::Tarnvault(parameters));
+    }
+
+private:
+    ScratchDir mData;
+    std::unique_ptr<server::LocalService> mService;
+};
 
 class BenchCache final : public SyncCache {
 public:
@@ -37,7 +88,10 @@ private:
 
 class BenchService final : public SyncFilesService {
 public:
-    explicit BenchService(const boost::shared_ptr<SyncServer>& server) : SyncFilesService(ParameterList()), mServer(server) {}
+    explicit BenchService(const boost::shared_ptr<SyncServer>& server)
+        : SyncFilesService(ParameterList()), mServer(server)
+    {
+    }
     const boost::shared_ptr<SyncServer>& GetApi() const override { return mServer; }
     SyncServiceType GetType() const override { return SyncServiceType_Tarnvault; }
     boost::shared_ptr<SyncCache> CreateCache(const std::vector<SyncFile>& files, const std::vector<SyncDir>& dirs,
@@ -65,13 +119,14 @@ void SyncOnce(BenchService& service, benchmark::State& state)
     };
     service.PrepareSync(
         [&](const boost::shared_ptr<SyncCache>& cache) {
-            service.DoSync(cache,
-                           [&](int) {
-                               std::lock_guard<std::mutex> lock(mutex);
-                               finished = true;
-                               done.notify_all();
-                           },
-                           fail, SyncMode_TwoWay);
+            service.DoSync(
+                cache,
+                [&](int) {
+                    std::lock_guard<std::mutex> lock(mutex);
+                    finished = true;
+                    done.notify_all();
+                },
+                fail, SyncMode_TwoWay);
         },
         fail, ProgressCallback(), ItemToFileCallback());
     std::unique_lock<std::mutex> lock(mutex);
@@ -80,9 +135,9 @@ void SyncOnce(BenchService& service, benchmark::State& state)
 }
 
 struct Desk {
-    testsupport::TempDir mPrefs;
-    testsupport::TempDir mFiles;
-    boost::shared_ptr<testsupport::InMemoryServer> mServer = testsupport::InMemoryServer::Create();
+    ScratchDir mPrefs;
+    ScratchDir mFiles;
+    Service mServer;
     std::unique_ptr<BenchService> mService;
 
     explicit Desk(int count)
@@ -90,8 +145,7 @@ struct Desk {
         Dir::SetPrefDir(Dir(tolmocore::utility::ToUTF16(mPrefs.Path().string())));
         for (int i = 0; i < count; ++i)
             std::ofstream(mFiles.Path() / ("preset-" + std::to_string(i) + ".xmp")) << "content " << i;
-        mServer->mClientID = "bench";
-        mService.reset(new BenchService(mServer));
+        mService.reset(new BenchService(mServer.Client()));
         mService->RegisterSyncDirectory(SyncDir(Dir(tolmocore::utility::ToUTF16(mFiles.Path().string())), u".xmp",
                                                 u"Presets", ImmutableString::CreateStatic("text/xml"),
                                                 SyncMetadata_ModDate, 1 << 20));
@@ -124,7 +178,7 @@ void BM_Resync(benchmark::State& state)
 
 // The engine's checksum of a 64 MiB file, and the xxh128sum command on it.
 struct BigFile {
-    testsupport::TempDir mDir;
+    ScratchDir mDir;
     fs::path mPath = mDir.Path() / "big.bin";
     BigFile()
     {

@@ -32,12 +32,15 @@ LocalScenarioServer::LocalScenarioServer(const server::AnswerStyle& style)
     mOwner = mService->GetAccounts().EnsureUser("scenario");
 }
 
-LocalScenarioServer::~LocalScenarioServer() { mService->Stop(); }
+LocalScenarioServer::~LocalScenarioServer()
+{
+    mService->Stop();
+}
 
-boost::shared_ptr<SyncServer> LocalScenarioServer::Client()
+boost::shared_ptr<SyncServer> LocalScenarioServer::ClientOf(const std::string& assetServiceUrl)
 {
     ParameterList parameters;
-    parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(mService->AssetServiceUrl()));
+    parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(assetServiceUrl));
     parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, UTF8String(kClientId));
     parameters.emplace_back(tolmonet::kHEADER_COOKIE, UTF8String(kToken));
     return boost::shared_ptr<SyncServer>(new tarnvault::Tarnvault(parameters));
@@ -120,6 +123,9 @@ void LocalScenarioServer::RemoveItem(const std::string& group, const std::string
     if (!existing.empty()) mService->Assets().Delete(mOwner, existing, false);
 }
 
-void LocalScenarioServer::MakeGroup(const std::string& group) { Group(group, true); }
+void LocalScenarioServer::MakeGroup(const std::string& group)
+{
+    Group(group, true);
+}
 
 }  // namespace synctest

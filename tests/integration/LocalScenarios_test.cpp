@@ -1,23 +1,21 @@
 // The sync scenarios against the real client and the local service over
-// loopback: the same suite the in-memory server passes, once for each way the
-// service may spell its answers.
+// loopback, once for each way the service may spell its answers.
 
-#include "LocalScenarioServer.h"
 #include "SyncScenarios.h"
 
 namespace synctest {
 
 namespace {
 
-using tolmonetsync::server::AnswerStyle;
+using namespace tolmonetsync::server;
 
 struct NamedStyle {
     const char* mName;
     AnswerStyle mStyle;
 };
 
-NamedStyle Style(const char* name, tolmonetsync::server::IdForm ids, bool absoluteLocation,
-                 tolmonetsync::server::HeaderCase headers, bool sizeAsString, bool fractions)
+NamedStyle Style(const char* name, IdForm ids, bool absoluteLocation, HeaderCase headers, bool sizeAsString,
+                 bool fractions)
 {
     AnswerStyle style;
     style.mIdForm = ids;
@@ -29,30 +27,21 @@ NamedStyle Style(const char* name, tolmonetsync::server::IdForm ids, bool absolu
 }
 
 const NamedStyle kStyles[] = {
-    Style("Plain", tolmonetsync::server::IdForm_Plain, false, tolmonetsync::server::HeaderCase_Usual, false, true),
-    Style("PathIdsAbsoluteLocationLowerHeaders", tolmonetsync::server::IdForm_Path, true,
-          tolmonetsync::server::HeaderCase_Lower, true, false),
-    Style("UrlOnlyUpperHeaders", tolmonetsync::server::IdForm_UrlOnly, false, tolmonetsync::server::HeaderCase_Upper,
-          false, true),
+    Style("Plain", IdForm_Plain, false, HeaderCase_Usual, false, true),
+    Style("PathIdsAbsoluteLocationLowerHeaders", IdForm_Path, true, HeaderCase_Lower, true, false),
+    Style("UrlOnlyUpperHeaders", IdForm_UrlOnly, false, HeaderCase_Upper, false, true),
 };
 
-std::string StyleName(const ScenarioServerFactory&, std::size_t index) { return kStyles[index].mName; }
-
-std::vector<ScenarioServerFactory> Factories()
+std::vector<AnswerStyle> Styles()
 {
-    std::vector<ScenarioServerFactory> factories;
-    for (const NamedStyle& named : kStyles) {
-        const AnswerStyle style = named.mStyle;
-        factories.push_back([style] { return std::unique_ptr<ScenarioServer>(new LocalScenarioServer(style)); });
-    }
-    return factories;
+    std::vector<AnswerStyle> styles;
+    for (const NamedStyle& named : kStyles) styles.push_back(named.mStyle);
+    return styles;
 }
 
 }  // namespace
 
-INSTANTIATE_TEST_SUITE_P(LocalService, SyncScenarios, ::testing::ValuesIn(Factories()),
-                         [](const ::testing::TestParamInfo<ScenarioServerFactory>& info) {
-                             return StyleName(info.param, info.index);
-                         });
+INSTANTIATE_TEST_SUITE_P(LocalService, SyncScenarios, ::testing::ValuesIn(Styles()),
+                         [](const ::testing::TestParamInfo<AnswerStyle>& info) { return kStyles[info.index].mName; });
 
 }  // namespace synctest

@@ -16,7 +16,7 @@ using testsupport::WriteFileBytes;
 void SyncScenarios::SetUp()
 {
     fs::create_directories(mDesk.Path() / "Presets");
-    mServer = GetParam()();
+    mServer.reset(new LocalScenarioServer(GetParam()));
 }
 
 void SyncScenarios::WritePreset(const std::string& name, const std::string& bytes)
@@ -58,11 +58,11 @@ std::unique_ptr<SyncHarness> SyncScenarios::NewHost()
 {
     std::unique_ptr<SyncHarness> host(new SyncHarness(mServer->Client()));
     const ImmutableString xml = ImmutableString::CreateStatic("application/rdf+xml");
-    host->Service().RegisterSyncDirectory(SyncDir(DirAt(mDesk.Path() / "Presets"), u".xmp", u"Presets", xml,
-                                                  SyncMetadata_ModDate, 1 << 20));
+    host->Service().RegisterSyncDirectory(
+        SyncDir(DirAt(mDesk.Path() / "Presets"), u".xmp", u"Presets", xml, SyncMetadata_ModDate, 1 << 20));
     host->Service().RegisterSyncFile(SyncFile(FileAt(SettingsPath()), u"settings", u"Settings",
-                                              ImmutableString::CreateStatic("application/json"),
-                                              SyncMetadata_Checksum, 1 << 20));
+                                              ImmutableString::CreateStatic("application/json"), SyncMetadata_Checksum,
+                                              1 << 20));
     return host;
 }
 

@@ -1,13 +1,14 @@
 // A host that exits while a pass is in flight: the process ends cleanly, no
-// handler runs, and the cache file is byte for byte what it was.
+// handler runs, and the cache file is byte for byte what it was. The host is
+// a child process; the service it talks to runs in this one.
 
 #include <gtest/gtest.h>
 
-#include <cstdlib>
 #include <spawn.h>
 #include <sys/wait.h>
+#include <cstdlib>
 
-#include "InMemoryScenarioServer.h"
+#include "LocalScenarioServer.h"
 #include "SyncHarness.h"
 #include "SyncTestSupport.h"
 
@@ -21,17 +22,17 @@ extern char** environ;
 namespace {
 
 const char kChildVariable[] = "TOLMONETSYNC_EXIT_MID_PASS_DIR";
+const char kServiceVariable[] = "TOLMONETSYNC_EXIT_MID_PASS_SERVICE";
 
 // The child: a first full sync, then a pass over changed files, and exit
 // while its requests are still queued.
-[[noreturn]] void RunChild(const fs::path& work)
+[[noreturn]] void RunChild(const fs::path& work, const std::string& serviceUrl)
 {
     Dir::SetPrefDir(DirAt(work / "prefs"));
     fs::create_directories(work / "desk");
     for (int i = 0; i < 300; ++i) WriteFileBytes(work / "desk" / ("p" + std::to_string(i) + ".xmp"), "v1");
-    InMemoryScenarioServer server;
     auto newHost = [&] {
-        std::unique_ptr<SyncHarness> host(new SyncHarness(server.Client()));
+        std::unique_ptr<SyncHarness> host(new SyncHarness(LocalScenarioServer::ClientOf(serviceUrl)));
         host->Service().RegisterSyncDirectory(SyncDir(DirAt(work / "desk"), u".xmp", u"Presets",
                                                       ImmutableString::CreateStatic("text/xml"), SyncMetadata_Checksum,
                                                       1 << 20));
@@ -44,8 +45,8 @@ const char kChildVariable[] = "TOLMONETSYNC_EXIT_MID_PASS_DIR";
     std::unique_ptr<SyncHarness> host = newHost();
     const RunResult prepared = host->Prepare();
     if (!prepared.Ok()) std::_Exit(4);
-    host->Service().DoSync(prepared.mCache, [](int) { WriteFileBytes("/dev/null", ""); },
-                           [](const UTF16String&) {}, SyncMode_TwoWay);
+    host->Service().DoSync(
+        prepared.mCache, [](int) { WriteFileBytes("/dev/null", ""); }, [](const UTF16String&) {}, SyncMode_TwoWay);
     std::exit(0);
 }
 
@@ -53,13 +54,16 @@ const char kChildVariable[] = "TOLMONETSYNC_EXIT_MID_PASS_DIR";
 
 TEST(ExitMidPass, ProcessEndsCleanlyAndTheCacheFileIsUntouched)
 {
-    if (const char* dir = std::getenv(kChildVariable)) RunChild(dir);
+    if (const char* dir = std::getenv(kChildVariable)) RunChild(dir, std::getenv(kServiceVariable));
 
+    LocalScenarioServer server;
     testsupport::TempDir work;
     const std::string setting = std::string(kChildVariable) + "=" + work.Path().string();
+    const std::string service = std::string(kServiceVariable) + "=" + server.Service().AssetServiceUrl();
     std::vector<char*> env;
     for (char** entry = environ; *entry; ++entry) env.push_back(*entry);
     env.push_back(const_cast<char*>(setting.c_str()));
+    env.push_back(const_cast<char*>(service.c_str()));
     env.push_back(nullptr);
     std::string self = fs::read_symlink("/proc/self/exe").string();
     std::string filter = "--gtest_filter=ExitMidPass.*";
@@ -70,5 +74,6 @@ TEST(ExitMidPass, ProcessEndsCleanlyAndTheCacheFileIsUntouched)
     ASSERT_EQ(waitpid(child, &status, 0), child);
     ASSERT_TRUE(WIFEXITED(status)) << "the child did not exit normally: " << status;
     ASSERT_EQ(WEXITSTATUS(status), 0);
-    EXPECT_EQ(ReadFileBytes(work.Path() / "prefs" / "tolmonetsynccache.json"), ReadFileBytes(work.Path() / "before.json"));
+    EXPECT_EQ(ReadFileBytes(work.Path() / "prefs" / "tolmonetsynccache.json"),
+              ReadFileBytes(work.Path() / "before.json"));
 }

@@ -1,17 +1,16 @@
 #pragma once
-// The sync scenarios, written once against ScenarioServer and instantiated
-// for every server implementation:
-//   INSTANTIATE_TEST_SUITE_P(Name, SyncScenarios, ::testing::Values(factory));
+// The sync scenarios: whole syncs by the real client against the local
+// service, once for each answer style the test is given.
 
 #include <gtest/gtest.h>
 
-#include "ScenarioServer.h"
+#include "LocalScenarioServer.h"
 #include "SyncHarness.h"
 #include "SyncTestSupport.h"
 
 namespace synctest {
 
-class SyncScenarios : public ::testing::TestWithParam<ScenarioServerFactory> {
+class SyncScenarios : public ::testing::TestWithParam<tolmonetsync::server::AnswerStyle> {
 protected:
     void SetUp() override;
 
@@ -21,7 +20,7 @@ protected:
     std::filesystem::path SettingsPath() const { return mDesk.Path() / "settings.json"; }
     void WritePreset(const std::string& name, const std::string& bytes);
     std::string ReadLocal(const std::filesystem::path& path) const;
-    // Local presets by name; the same shape as ScenarioServer::Items.
+    // Local presets by name; the same shape as LocalScenarioServer::Items.
     std::map<std::string, std::string> LocalPresets() const;
     // Every file in this run's backup directories, by name.
     std::map<std::string, std::string> Backups() const;
@@ -33,7 +32,7 @@ protected:
 
     PrefDirScope mPrefs;
     testsupport::TempDir mDesk;
-    std::unique_ptr<ScenarioServer> mServer;
+    std::unique_ptr<LocalScenarioServer> mServer;
 };
 
 }  // namespace synctest
