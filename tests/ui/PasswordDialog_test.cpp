@@ -76,7 +76,7 @@ TEST_F(PasswordDialog, ShowsTheFieldsWithTheStartingValuesInAModalScope)
         EXPECT_FALSE(Link(box, "UserNameLinkHotTextButton"));
         EXPECT_FALSE(Link(box, "PasswordLinkHotTextButton"));
     }));
-    EXPECT_TRUE(run.Do([](UI_MessageBox& box) { EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_Cancel)); }));
+    EXPECT_TRUE(run.Do([](UI_MessageBox& box) { EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_Cancel)); }));
     EXPECT_FALSE(run.Finish());
     EXPECT_EQ(UI_NodeManager::GetModalScopeDepth(), 0);
 }
@@ -92,7 +92,7 @@ TEST_F(PasswordDialog, BothStartingValuesEnableOKAndAnAcceptingValidatorCloses)
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
         EXPECT_TRUE(OkEnabled(box));
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_OK));
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
     }));
     EXPECT_TRUE(run.Finish());
     EXPECT_EQ(calls, 1);
@@ -108,14 +108,14 @@ TEST_F(PasswordDialog, OneEmptyValueDisablesOKUntilBothHoldText)
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
         EXPECT_FALSE(OkEnabled(box));
-        EXPECT_FALSE(box.SimulateButtonPress(kDialogResponse_OK));  // cannot be pressed
-        Edit(box, "PasswordTextEdit")->SimulateTyping(UTF16String(u"s"));
+        EXPECT_FALSE(box.HandleButtonClick(kDialogResponse_OK));  // cannot be pressed
+        SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"s"));
         EXPECT_TRUE(OkEnabled(box));
-        Edit(box, "UserNameTextEdit")->SimulateTyping(UTF16String());
+        SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String());
         EXPECT_FALSE(OkEnabled(box));
-        Edit(box, "UserNameTextEdit")->SimulateTyping(UTF16String(u"bob"));
+        SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String(u"bob"));
         EXPECT_TRUE(OkEnabled(box));
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_OK));
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
     }));
     EXPECT_TRUE(run.Finish());
     EXPECT_EQ(N(run.Arguments().userName), "bob");
@@ -129,7 +129,7 @@ TEST_F(PasswordDialog, AValidatorsRefusalShowsItsErrorAndKeepsTheDialogOpen)
     arguments.validator = refusing.Make();
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_OK));
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
         EXPECT_EQ(N(MessageText(box)), "Wrong password.");
         ASSERT_EQ(refusing.asked.size(), 1u);
         EXPECT_EQ(N(refusing.asked[0].first), "ann");
@@ -146,16 +146,16 @@ TEST_F(PasswordDialog, TypingAfterARefusalPutsTheFirstMessageBack)
     arguments.validator = refusing.Make();
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
-        box.SimulateButtonPress(kDialogResponse_OK);
+        box.HandleButtonClick(kDialogResponse_OK);
         // A change that is not the user's edit leaves the error.
-        Edit(box, "PasswordTextEdit")->SimulateInteractiveChange(kInteractiveChange_None);
+        Edit(box, "PasswordTextEdit")->HandleUserChange(kInteractiveChange_None);
         EXPECT_EQ(N(MessageText(box)), "Wrong password.");
-        Edit(box, "PasswordTextEdit")->SimulateTyping(UTF16String(u"secret2"));
+        SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"secret2"));
         EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
         // And the next refusal shows again.
-        box.SimulateButtonPress(kDialogResponse_OK);
+        box.HandleButtonClick(kDialogResponse_OK);
         EXPECT_EQ(N(MessageText(box)), "Wrong password.");
-        Edit(box, "UserNameTextEdit")->SimulateTyping(UTF16String(u"an"));
+        SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String(u"an"));
         EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
     }));
 }
@@ -167,8 +167,8 @@ TEST_F(PasswordDialog, ASecondOKWithoutAChangeKeepsTheFirstError)
     arguments.validator = refusing.Make();
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
-        box.SimulateButtonPress(kDialogResponse_OK);
-        box.SimulateButtonPress(kDialogResponse_OK);
+        box.HandleButtonClick(kDialogResponse_OK);
+        box.HandleButtonClick(kDialogResponse_OK);
         EXPECT_EQ(refusing.asked.size(), 2u);
         EXPECT_EQ(N(MessageText(box)), "first refusal");
     }));
@@ -180,7 +180,7 @@ TEST_F(PasswordDialog, ARefusalWithoutATextBlanksTheMessage)
     arguments.validator = Validator([](const UTF16String&, const UTF16String&, UTF16String&) { return false; });
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        box.SimulateButtonPress(kDialogResponse_OK);
+        box.HandleButtonClick(kDialogResponse_OK);
         EXPECT_TRUE(MessageText(box).empty());
     }));
 }
@@ -191,9 +191,9 @@ TEST_F(PasswordDialog, TheTypedValuesComeBackAlsoOnCancel)
     arguments.validator = Validator([](const UTF16String&, const UTF16String&, UTF16String&) { return true; });
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        Edit(box, "UserNameTextEdit")->SimulateTyping(UTF16String(u"carla"));
-        Edit(box, "PasswordTextEdit")->SimulateTyping(UTF16String(u"hunter2"));
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_Cancel));
+        SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String(u"carla"));
+        SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"hunter2"));
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_Cancel));
     }));
     EXPECT_FALSE(run.Finish());
     EXPECT_EQ(N(run.Arguments().userName), "carla");
@@ -206,13 +206,13 @@ TEST_F(PasswordDialog, WithoutAValidatorOKNeverCloses)
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
         EXPECT_TRUE(OkEnabled(box));
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_OK));
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
         EXPECT_TRUE(MessageText(box).empty());  // the empty error
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_OK));
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
     }));
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
         EXPECT_TRUE(box.IsInModalLoop());
-        box.SimulateButtonPress(kDialogResponse_Cancel);
+        box.HandleButtonClick(kDialogResponse_Cancel);
     }));
     EXPECT_FALSE(run.Finish());
 }
@@ -223,8 +223,8 @@ TEST_F(PasswordDialog, ClosingTheWindowReturnsFalseWithTheValues)
     arguments.validator = Validator([](const UTF16String&, const UTF16String&, UTF16String&) { return true; });
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        Edit(box, "PasswordTextEdit")->SimulateTyping(UTF16String(u"typed"));
-        box.SimulateUserClose();
+        SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"typed"));
+        box.HandleCloseBox();
     }));
     EXPECT_FALSE(run.Finish());
     EXPECT_EQ(N(run.Arguments().password), "typed");
@@ -349,7 +349,7 @@ TEST_F(PasswordDialogLayout, ALinkWithoutAURLOpensNothing)
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
         const auto link = Link(box, "UserNameLinkHotTextButton");
         ASSERT_TRUE(link);
-        EXPECT_TRUE(link->SimulateClick());
+        EXPECT_TRUE(link->HandleUserChange(kInteractiveChange_Click));
         EXPECT_TRUE(box.IsInModalLoop());
     }));
     EXPECT_TRUE(opener.Opened().empty());
@@ -364,10 +364,14 @@ TEST_F(PasswordDialogLayout, ALinkWithAURLOpensItsOwnURL)
     arguments.passwordLinkText = UTF16String(u"Forgot your password?");
     arguments.passwordLinkURL = UTF16String(u"https://id.example.test/reset");
     DialogRun run(arguments);
-    ASSERT_TRUE(run.Do([](UI_MessageBox& box) { Link(box, "PasswordLinkHotTextButton")->SimulateClick(); }));
+    ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
+        Link(box, "PasswordLinkHotTextButton")->HandleUserChange(kInteractiveChange_Click);
+    }));
     ASSERT_EQ(opener.Opened().size(), 1u);
     EXPECT_EQ(N(opener.Opened()[0]), "https://id.example.test/reset");
-    ASSERT_TRUE(run.Do([](UI_MessageBox& box) { Link(box, "UserNameLinkHotTextButton")->SimulateClick(); }));
+    ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
+        Link(box, "UserNameLinkHotTextButton")->HandleUserChange(kInteractiveChange_Click);
+    }));
     ASSERT_EQ(opener.Opened().size(), 2u);
     EXPECT_EQ(N(opener.Opened()[1]), "http://id.example.test/new");
 }

@@ -1,4 +1,4 @@
-#include "foundation/tessel/TesselScriptedExtension.h"
+#include "support/TesselScriptedExtension.h"
 
 #include "foundation/tessel/TesselHost.h"
 
