@@ -39,7 +39,6 @@ void Tell(const ModalLoops::Observer& observer, OS_Dialog& dialog, ModalLoopEven
 
 int ModalLoops::Run(OS_Dialog& dialog)
 {
-    dialog.UI_PrepareModal();
     Register& reg = TheRegister();
     Frame frame{&dialog, {}};
     std::unique_lock<std::mutex> lock(reg.mutex);

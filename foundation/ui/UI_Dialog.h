@@ -59,11 +59,6 @@ public:
     int GetResponse() const { return mResponse.load(); }
     void SetResponse(int response) { mResponse.store(response); }
 
-protected:
-    // Called by RunModal on the loop's thread before the loop starts, for
-    // windows that arrange their content at that point.
-    virtual void UI_PrepareModal() {}
-
 private:
     friend class ModalLoops;
 
