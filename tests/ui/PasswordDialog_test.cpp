@@ -122,56 +122,35 @@ TEST_F(PasswordDialog, OneEmptyValueDisablesOKUntilBothHoldText)
     EXPECT_EQ(N(run.Arguments().password), "s");
 }
 
-TEST_F(PasswordDialog, AValidatorsRefusalShowsItsErrorAndKeepsTheDialogOpen)
-{
-    RefusingValidator refusing{{UTF16String(u"Wrong password.")}, {}};
-    DialogArguments arguments = Filled();
-    arguments.validator = refusing.Make();
-    DialogRun run(arguments);
-    ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
-        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
-        EXPECT_EQ(N(MessageText(box)), "Wrong password.");
-        ASSERT_EQ(refusing.asked.size(), 1u);
-        EXPECT_EQ(N(refusing.asked[0].first), "ann");
-        EXPECT_EQ(N(refusing.asked[0].second), "secret");
-    }));
-    // Still open: the loop runs the next action.
-    EXPECT_TRUE(run.Do([](UI_MessageBox& box) { EXPECT_TRUE(box.IsInModalLoop()); }));
-}
-
-TEST_F(PasswordDialog, TypingAfterARefusalPutsTheFirstMessageBack)
-{
-    RefusingValidator refusing{{UTF16String(u"Wrong password.")}, {}};
-    DialogArguments arguments = Filled();
-    arguments.validator = refusing.Make();
-    DialogRun run(arguments);
-    ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
-        box.HandleButtonClick(kDialogResponse_OK);
-        // A change that is not the user's edit leaves the error.
-        Edit(box, "PasswordTextEdit")->HandleUserChange(kInteractiveChange_None);
-        EXPECT_EQ(N(MessageText(box)), "Wrong password.");
-        SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"secret2"));
-        EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
-        // And the next refusal shows again.
-        box.HandleButtonClick(kDialogResponse_OK);
-        EXPECT_EQ(N(MessageText(box)), "Wrong password.");
-        SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String(u"an"));
-        EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
-    }));
-}
-
-TEST_F(PasswordDialog, ASecondOKWithoutAChangeKeepsTheFirstError)
+TEST_F(PasswordDialog, ARefusalShowsItsErrorUntilTheUserTypesAndKeepsTheDialogOpen)
 {
     RefusingValidator refusing{{UTF16String(u"first refusal"), UTF16String(u"second refusal")}, {}};
     DialogArguments arguments = Filled();
     arguments.validator = refusing.Make();
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
-        box.HandleButtonClick(kDialogResponse_OK);
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
+        EXPECT_EQ(N(MessageText(box)), "first refusal");
+        ASSERT_EQ(refusing.asked.size(), 1u);
+        EXPECT_EQ(N(refusing.asked[0].first), "ann");
+        EXPECT_EQ(N(refusing.asked[0].second), "secret");
+        // A second OK without a change keeps the first error.
         box.HandleButtonClick(kDialogResponse_OK);
         EXPECT_EQ(refusing.asked.size(), 2u);
         EXPECT_EQ(N(MessageText(box)), "first refusal");
+        // A change that is not the user's edit leaves the error; typing puts the message back.
+        Edit(box, "PasswordTextEdit")->HandleUserChange(kInteractiveChange_None);
+        EXPECT_EQ(N(MessageText(box)), "first refusal");
+        SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"secret2"));
+        EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
+        // And the next refusal shows again, until the user name changes.
+        box.HandleButtonClick(kDialogResponse_OK);
+        EXPECT_EQ(N(MessageText(box)), "second refusal");
+        SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String(u"an"));
+        EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
     }));
+    // Still open: the loop runs the next action.
+    EXPECT_TRUE(run.Do([](UI_MessageBox& box) { EXPECT_TRUE(box.IsInModalLoop()); }));
 }
 
 TEST_F(PasswordDialog, ARefusalWithoutATextBlanksTheMessage)
@@ -185,19 +164,24 @@ TEST_F(PasswordDialog, ARefusalWithoutATextBlanksTheMessage)
     }));
 }
 
-TEST_F(PasswordDialog, TheTypedValuesComeBackAlsoOnCancel)
+TEST_F(PasswordDialog, CancelAndTheCloseBoxReturnFalseWithTheTypedValues)
 {
-    DialogArguments arguments = Filled();
-    arguments.validator = Validator([](const UTF16String&, const UTF16String&, UTF16String&) { return true; });
-    DialogRun run(arguments);
-    ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String(u"carla"));
-        SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"hunter2"));
-        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_Cancel));
-    }));
-    EXPECT_FALSE(run.Finish());
-    EXPECT_EQ(N(run.Arguments().userName), "carla");
-    EXPECT_EQ(N(run.Arguments().password), "hunter2");
+    for (const bool closeBox : {false, true}) {
+        DialogArguments arguments = Filled();
+        arguments.validator = Validator([](const UTF16String&, const UTF16String&, UTF16String&) { return true; });
+        DialogRun run(arguments);
+        ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
+            SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String(u"carla"));
+            SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"hunter2"));
+            if (closeBox)
+                box.HandleCloseBox();
+            else
+                EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_Cancel));
+        }));
+        EXPECT_FALSE(run.Finish()) << closeBox;
+        EXPECT_EQ(N(run.Arguments().userName), "carla");
+        EXPECT_EQ(N(run.Arguments().password), "hunter2");
+    }
 }
 
 TEST_F(PasswordDialog, WithoutAValidatorOKNeverCloses)
@@ -215,19 +199,6 @@ TEST_F(PasswordDialog, WithoutAValidatorOKNeverCloses)
         box.HandleButtonClick(kDialogResponse_Cancel);
     }));
     EXPECT_FALSE(run.Finish());
-}
-
-TEST_F(PasswordDialog, ClosingTheWindowReturnsFalseWithTheValues)
-{
-    DialogArguments arguments = Filled();
-    arguments.validator = Validator([](const UTF16String&, const UTF16String&, UTF16String&) { return true; });
-    DialogRun run(arguments);
-    ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"typed"));
-        box.HandleCloseBox();
-    }));
-    EXPECT_FALSE(run.Finish());
-    EXPECT_EQ(N(run.Arguments().password), "typed");
 }
 
 TEST_F(PasswordDialog, AMessageCallbackGoesToTheBoxAndChangesTheIcon)
