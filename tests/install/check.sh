@@ -18,7 +18,7 @@ test_only_headers=$(find "$prefix/include" \( -name '*Scripted*' -o -name '*Auto
 [ -z "$test_only_headers" ] || { echo "test-only headers installed:"; echo "$test_only_headers"; exit 1; }
 library=$(find "$prefix/lib" -name 'libtolmonetsync.so*' -type f | head -n 1)
 [ -n "$library" ] || { echo "no installed library"; exit 1; }
-test_only_names='ScriptedExtension|ExtensionScript|Simulate[A-Z]|WaitForModalDialog|RunInModalLoop|ModalLoopDepth|GetDrawCount|GetSetLocalRectCount|GetSizeChangedCount|FlushHost|SendHostEvent|TesselHost::Flush|FileOpsRecorder|InMemoryServer|InMemoryTree'
+test_only_names='ScriptedExtension|ExtensionScript|Simulate[A-Z]|WaitForModalDialog|RunInModalLoop|WaitForModalLoopDepth|GetDrawCount|GetSetLocalRectCount|GetSizeChangedCount|FlushHost|SendHostEvent|TesselHost::Flush|FileOpsRecorder|InMemoryServer|InMemoryTree'
 found=$(nm -DC "$library" | grep -E "$test_only_names" || true)
 [ -z "$found" ] || { echo "test-only names in the installed library:"; echo "$found" | head -n 20; exit 1; }
 echo "nothing test-only installed"

@@ -142,13 +142,6 @@ bool RunInModalLoop(const boost::function<void()>& action, int milliseconds)
     return true;
 }
 
-int ModalLoopDepth()
-{
-    Tracker& tracker = TheTracker();
-    std::lock_guard<std::mutex> lock(tracker.mutex);
-    return static_cast<int>(tracker.frames.size());
-}
-
 bool WaitForModalLoopDepth(int depth, int milliseconds)
 {
     Tracker& tracker = TheTracker();

@@ -24,8 +24,6 @@ boost::intrusive_ptr<UI_Dialog> WaitForModalDialog(int milliseconds);
 // `action` must not throw.
 bool RunInModalLoop(const boost::function<void()>& action, int milliseconds);
 
-// How many modal loops run now.
-int ModalLoopDepth();
 // Waits until at least `depth` modal loops run (a nested dialog has come up);
 // false on time-out.
 bool WaitForModalLoopDepth(int depth, int milliseconds);
