@@ -1,62 +1,52 @@
 #include "cli/MigrationNotice.h"
 
-#include <cstdlib>
-
-#include "foundation/core/Trace.h"
+#include "foundation/core/Strings.h"
+#include "tarnvault/Tarnvault.h"
 
 namespace tolmonetsync {
 namespace cli {
 
 namespace {
 
-const char kStartLine[] = "Starting migration from ";
-const char kNameField[] = "name: '";
+boost::shared_ptr<tarnvault::Tarnvault> ClientOf(const boost::shared_ptr<SyncFilesService>& service)
+{
+    return boost::dynamic_pointer_cast<tarnvault::Tarnvault>(service->GetApi());
+}
 
 }  // namespace
 
-MigrationNotice::MigrationNotice(const std::string& userTraceSpec) : mHeard(std::make_shared<Heard>())
+MigrationNotice::MigrationNotice(const boost::shared_ptr<SyncFilesService>& service)
+    : mService(service), mHeard(std::make_shared<Heard>())
 {
-    using namespace tolmocore::debug;
-    const char* environment = std::getenv("TOLMONETSYNC_TRACE");
-    std::string spec = userTraceSpec.empty() && environment != nullptr ? environment : userTraceSpec;
-    if (spec.empty()) {
-        // Nobody asked for a trace: the lines go to the listener alone.
-        SetTraceFile("/dev/null");
-        mSilenced = true;
-    }
-    SetTraceSpec(spec.empty() ? "Tarnvault:8" : spec + ",Tarnvault:8");
+    const boost::shared_ptr<tarnvault::Tarnvault> client = ClientOf(mService);
+    if (!client) return;
+    // The callback runs on the completion thread and may outlive this object
+    // by a handler still in flight: it holds what it writes.
     const std::shared_ptr<Heard> heard = mHeard;
-    SetTraceListener([heard](const std::string& line) {
-        const std::size_t start = line.find(kStartLine);
-        if (start == std::string::npos) return;
-        const std::size_t name = line.find(kNameField, start);
-        if (name == std::string::npos) return;
-        const std::size_t begin = name + sizeof kNameField - 1;
-        const std::size_t end = line.find('\'', begin);
+    client->SetMigrationStartedCallback([heard](const UTF16String& version, const UTF16String& rootName) {
         std::lock_guard<std::mutex> lock(heard->mMutex);
-        if (heard->mFrom.empty()) heard->mFrom = line.substr(begin, end == std::string::npos ? end : end - begin);
+        if (!heard->mVersion.empty()) return;
+        heard->mVersion = tolmocore::utility::ToNarrow(version);
+        heard->mRootName = tolmocore::utility::ToNarrow(rootName);
     });
 }
 
 MigrationNotice::~MigrationNotice()
 {
-    tolmocore::debug::SetTraceListener(tolmocore::debug::TraceListener());
-    if (mSilenced) {
-        tolmocore::debug::SetTraceSpec("");
-        tolmocore::debug::SetTraceFile("");
-    }
+    const boost::shared_ptr<tarnvault::Tarnvault> client = ClientOf(mService);
+    if (client) client->SetMigrationStartedCallback(tarnvault::Tarnvault::MigrationStartedCallback());
 }
 
-std::string MigrationNotice::From() const
+std::string MigrationNotice::FromVersion() const
 {
     std::lock_guard<std::mutex> lock(mHeard->mMutex);
-    return mHeard->mFrom;
+    return mHeard->mVersion;
 }
 
-std::string VersionOfRootName(const std::string& name)
+std::string MigrationNotice::FromRootName() const
 {
-    const std::size_t underscore = name.rfind('_');
-    return underscore == std::string::npos ? name : name.substr(underscore + 1);
+    std::lock_guard<std::mutex> lock(mHeard->mMutex);
+    return mHeard->mRootName;
 }
 
 }  // namespace cli

@@ -1,39 +1,43 @@
 #pragma once
 // Tells the command when the client started copying an earlier host
-// version's preferences. The client says so only in its trace, so this
-// listens to the trace for the length of one sync.
+// version's preferences, through the client's migration callback, for the
+// length of one sync.
 
 #include <memory>
 #include <mutex>
 #include <string>
 
+#include <boost/shared_ptr.hpp>
+
 namespace tolmonetsync {
+
+class SyncFilesService;
+
 namespace cli {
 
 class MigrationNotice {
 public:
-    // Starts listening; `userTraceSpec` is what the person asked to trace
-    // (empty: nothing, so the listened lines go nowhere else).
-    explicit MigrationNotice(const std::string& userTraceSpec);
+    // Starts listening to the client of `service`; hears nothing from a
+    // service of another kind.
+    explicit MigrationNotice(const boost::shared_ptr<SyncFilesService>& service);
     ~MigrationNotice();
     MigrationNotice(const MigrationNotice&) = delete;
     MigrationNotice& operator=(const MigrationNotice&) = delete;
 
-    // The name of the earlier preferences root a migration started from;
-    // empty if none started.
-    std::string From() const;
+    // The earlier version a migration started from and its preferences
+    // root's name; empty if none started.
+    std::string FromVersion() const;
+    std::string FromRootName() const;
 
 private:
     struct Heard {
         std::mutex mMutex;
-        std::string mFrom;
+        std::string mVersion;
+        std::string mRootName;
     };
+    boost::shared_ptr<SyncFilesService> mService;
     std::shared_ptr<Heard> mHeard;
-    bool mSilenced = false;
 };
-
-// The version at the end of a preferences root's name ("Co_App_8.0" gives "8.0").
-std::string VersionOfRootName(const std::string& name);
 
 }  // namespace cli
 }  // namespace tolmonetsync

@@ -85,7 +85,6 @@ int RunSync(GlobalOptions globals, const std::vector<std::string>& arguments)
     job.mClientId = globals.mClientId;
     job.mToken = globals.mToken;
     job.mAutoLogin = globals.mAutoLogin;
-    job.mTraceSpec = globals.mTrace;
     const Output output = globals.mJson ? Output::Json : globals.mQuiet ? Output::Quiet : Output::Text;
     return RunSyncJob(job, output, std::cout, std::cerr);
 }

@@ -90,10 +90,9 @@ public:
         if (mOutput == Output::Text) PrintPlan(mOut, preview);
         if (mOutput == Output::Json) mJson["plan"] = PlanToJson(preview);
     }
-    void Migrated(const std::string& oldRootName, const boost::shared_ptr<SyncCache>& cache,
+    void Migrated(const std::string& version, const std::string& oldRootName, const boost::shared_ptr<SyncCache>& cache,
                   const std::vector<SyncDecision>& plan)
     {
-        const std::string version = VersionOfRootName(oldRootName);
         SyncPreview after;
         after.mMode = mMode;
         after.mCache = cache;
@@ -228,7 +227,7 @@ int RunSyncJob(const SyncJob& job, Output output, std::ostream& out, std::ostrea
 
     // Preparing may make the preferences root and copy an earlier version's into it.
     std::unique_ptr<MigrationNotice> notice;
-    if (!job.mMigrate.empty()) notice.reset(new MigrationNotice(job.mTraceSpec));
+    if (!job.mMigrate.empty()) notice.reset(new MigrationNotice(service));
     const RunOutcome prepared =
         RunPrepare(*service, ProgressCallback(), [&] { bar.Draw("preparing", service->Progress()); });
     if (!prepared.mStarted)
@@ -239,7 +238,8 @@ int RunSyncJob(const SyncJob& job, Output output, std::ostream& out, std::ostrea
     std::vector<SyncDecision> plan;
     for (const CachedSyncFile& record : cache->mFiles) plan.push_back(DecideRecord(*cache, record, job.mMode));
     // A migration filled the new root after the preview: show the plan again.
-    if (notice && !notice->From().empty()) report.Migrated(notice->From(), cache, plan);
+    if (notice && !notice->FromVersion().empty())
+        report.Migrated(notice->FromVersion(), notice->FromRootName(), cache, plan);
     notice.reset();
     const std::size_t removals = job.mMode == SyncMode_ServerWins ? ServerWinsRemovals(*cache, job.mDirs).size() : 0;
 

@@ -18,7 +18,6 @@ struct SyncJob {
     std::string mToken;  // empty without mAutoLogin: the stored sign-in, proved first
     bool mAutoLogin = false;
     std::vector<std::string> mMigrate;  // "major", "previous-major"
-    std::string mTraceSpec;             // what the person asked to trace
     std::vector<SyncDir> mDirs;
     std::vector<SyncFile> mFiles;
     SyncMode mMode = SyncMode_TwoWay;

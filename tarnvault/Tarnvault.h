@@ -9,9 +9,11 @@
 
 #include <atomic>
 #include <cstdint>
+#include <mutex>
 #include <vector>
 
 #include <boost/enable_shared_from_this.hpp>
+#include <boost/function.hpp>
 #include <boost/shared_ptr.hpp>
 #include <boost/weak_ptr.hpp>
 
@@ -166,6 +168,18 @@ public:
     void SetDownloadSizeLimit(std::uint64_t bytes);
     std::uint64_t DownloadSizeLimit() const { return mDownloadSizeLimit.load(); }
 
+    // Told when PrepareSync's migration finds the earlier version's
+    // preferences root and starts copying it into the new one: with that
+    // version ("8.0") and the old root's name. Called once per migration, on
+    // the completion thread, before the first copy request; not called when
+    // there is nothing to copy. An empty function (the default) tells no one.
+    // A setter rather than a trace line, so that a host can rely on it; any
+    // thread, counts from the next migration.
+    using MigrationStartedCallback =
+        boost::function<void(const UTF16String& fromVersion, const UTF16String& fromRootName)>;
+    void SetMigrationStartedCallback(const MigrationStartedCallback& callback);
+    MigrationStartedCallback GetMigrationStartedCallback() const;
+
 private:
     // Signs in from TOLMONETSYNC_USERNAME and TOLMONETSYNC_PASSWORD, or reuses
     // the process's earlier environment sign-in once the service accepts it.
@@ -198,6 +212,8 @@ private:
     boost::shared_ptr<Collection> mRootCollection;  // guarded by ChildrenMutex
     bool mAutoLogin = false;
     std::atomic<std::uint64_t> mDownloadSizeLimit{kMaxDownloadSize};
+    mutable std::mutex mMigrationStartedMutex;  // guards mMigrationStarted
+    MigrationStartedCallback mMigrationStarted;
 };
 
 // The sync service of the asset service: owns one client for its life.

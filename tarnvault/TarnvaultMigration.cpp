@@ -105,10 +105,12 @@ void _HandleMigrationPref_GetPrefRoot(const boost::weak_ptr<Tarnvault>& self, co
     }
     const boost::shared_ptr<Collection> oldRoot = boost::static_pointer_cast<Collection>(assets.front());
     TOLMO_TRACE("Tarnvault", 8, "Starting migration from " << oldRoot << " to " << newPrefRoot);
+    const Tarnvault::MigrationStartedCallback started = client->GetMigrationStartedCallback();
+    if (started) started(previousVersion, oldRoot->mName);
     const SuccessCallback deliver = boost::bind(&_HandleMigrationPref_IgnoreErrors, success, newPrefRoot, _1);
-    const Guid sent = client->CopyAsync(deliver, boost::bind(&_HandleMigrationPref_IgnoreErrors, success, newPrefRoot, _1),
-                                        oldRoot, newPrefRoot, guid,
-                                        boost::bind(&_HandleMigrationPref_Rename, previousVersion, _1));
+    const Guid sent =
+        client->CopyAsync(deliver, boost::bind(&_HandleMigrationPref_IgnoreErrors, success, newPrefRoot, _1), oldRoot,
+                          newPrefRoot, guid, boost::bind(&_HandleMigrationPref_Rename, previousVersion, _1));
     if (sent.IsNil()) success(guid, newPrefRoot);
 }
 
@@ -183,6 +185,18 @@ bool DecideMigration(const boost::shared_ptr<Tarnvault>& client, const boost::sh
     return true;
 }
 
+void Tarnvault::SetMigrationStartedCallback(const MigrationStartedCallback& callback)
+{
+    std::lock_guard<std::mutex> lock(mMigrationStartedMutex);
+    mMigrationStarted = callback;
+}
+
+Tarnvault::MigrationStartedCallback Tarnvault::GetMigrationStartedCallback() const
+{
+    std::lock_guard<std::mutex> lock(mMigrationStartedMutex);
+    return mMigrationStarted;
+}
+
 Guid Tarnvault::GetRootForCinderalOldClientIDAsync(const CollectionCallback& success, const ErrorCallback& error,
                                                    const Guid& requestUID)
 {
@@ -192,12 +206,13 @@ Guid Tarnvault::GetRootForCinderalOldClientIDAsync(const CollectionCallback& suc
     pairs.push_back(std::make_pair(kName, kCinderalClientIDForPellucid.ToUTF8String()));
     const UTF8String url = mServerURL + "/collections?" + tolmonet::QuoteURL(pairs);
     TOLMO_TRACE("Tarnvault", 8,
-                "GetRoot" << ", name: <obfuscated>"
-                          << ", url: " << RedactedForTrace(url) << ", requestUID: " << requestUID);
+                "GetRoot"
+                    << ", name: <obfuscated>"
+                    << ", url: " << RedactedForTrace(url) << ", requestUID: " << requestUID);
     const tolmonet::http::ResponseHandler handler =
         boost::bind(&Tarnvault::_HandleGetRoot, shared_from_this(), success, error, false, _1, _2);
-    const bool taken = mProcessor->GET(requestUID, handler, ImmutableString::CreateDynamic(url),
-                                       tolmonet::HeaderList(), tolmonet::Configuration());
+    const bool taken = mProcessor->GET(requestUID, handler, ImmutableString::CreateDynamic(url), tolmonet::HeaderList(),
+                                       tolmonet::Configuration());
     return Sent(taken, requestUID);
 }
 

@@ -2,7 +2,6 @@
 
 #include <exception>
 
-#include "foundation/core/Threads.h"
 #include "foundation/core/Trace.h"
 
 namespace ruvex {
@@ -119,14 +118,6 @@ bool TesselHost::OnHostThread() const
 {
     std::lock_guard<std::mutex> lock(mMutex);
     return mThread.joinable() && std::this_thread::get_id() == mThreadId;
-}
-
-bool TesselHost::Flush(int milliseconds)
-{
-    if (OnHostThread()) return false;
-    const boost::shared_ptr<tolmocore::threads::Gate> ran(new tolmocore::threads::Gate(false));
-    Post([ran] { ran->Open(); });
-    return ran->PassThrough(milliseconds);
 }
 
 boost::shared_ptr<TesselExtension> TesselHost::Find(const std::string& extensionId)

@@ -35,9 +35,6 @@ public:
     // Runs `task` on the host's thread once `delay` has passed; tasks due at
     // the same time run in the order posted. Any thread.
     void Post(Task task, std::chrono::milliseconds delay = std::chrono::milliseconds(0));
-    // Waits until every task due now has run. False on time-out, or when
-    // called on the host's thread (where it would wait for itself).
-    bool Flush(int milliseconds);
     bool OnHostThread() const;
 
     int Load(const std::string& extensionId);

@@ -1,7 +1,6 @@
 #pragma once
-// A grid of layouts: each column as wide as its widest cell, each row as high
-// as its highest, with fixed spacing between rows and between columns. Cells
-// may stay empty.
+// A grid of layouts, row by row, with its spacing between rows and between
+// columns. Cells may stay empty.
 
 #include <vector>
 
@@ -21,11 +20,6 @@ public:
     int GetColumnCount() const { return mColumns; }
     float GetRowSpacing() const { return mRowSpacing; }
     float GetColumnSpacing() const { return mColumnSpacing; }
-    float GetColumnWidth(int column) const;
-    float GetRowHeight(int row) const;
-
-    PointT<float> GetSize() const override;
-    void Place(const RectT<float>& area) override;
 
 private:
     int mRows;

@@ -18,15 +18,15 @@ enum ExtraSpace {
 
 class LayoutJoiner : public Layout {
 public:
-    LayoutJoiner(const LayoutPtr& first, const LayoutPtr& second, LayoutPlacement placement, ExtraSpace extraSpace);
+    LayoutJoiner(const LayoutPtr& first, const LayoutPtr& second, LayoutPlacement placement, ExtraSpace extraSpace)
+        : mFirst(first), mSecond(second), mPlacement(placement), mExtraSpace(extraSpace)
+    {
+    }
 
     const LayoutPtr& GetFirst() const { return mFirst; }
     const LayoutPtr& GetSecond() const { return mSecond; }
     LayoutPlacement GetPlacement() const { return mPlacement; }
     ExtraSpace GetExtraSpace() const { return mExtraSpace; }
-
-    PointT<float> GetSize() const override;
-    void Place(const RectT<float>& area) override;
 
 private:
     LayoutPtr mFirst;

@@ -1,26 +1,39 @@
 #pragma once
-// The process-wide register of running modal loops, behind OS_Dialog and
-// UI_Automation.h. One mutex guards the register, the queues of posted
-// actions and each window's close flag; one condition variable wakes both
-// the loops and the threads that wait on them.
+// The process-wide register of running modal loops, behind OS_Dialog. One
+// mutex guards the register, the queues of posted tasks and each window's
+// close flag; one condition variable wakes the loops.
 
 #include <boost/function.hpp>
-#include <boost/intrusive_ptr.hpp>
 
 namespace tolmoui {
 
 class OS_Dialog;
-class UI_Dialog;
+
+enum ModalLoopEvent {
+    ModalLoopEvent_Started,  // on the loop's thread, before its first task
+    ModalLoopEvent_Closing,  // on the thread of PostClose, once per posted close
+    ModalLoopEvent_Ended,    // on the loop's thread, after its last task
+};
 
 class ModalLoops {
 public:
     static int Run(OS_Dialog& dialog);
     static void PostClose(OS_Dialog& dialog);
     static bool IsInLoop(const OS_Dialog& dialog);
-    static boost::intrusive_ptr<UI_Dialog> WaitForDialog(int milliseconds);
-    static bool RunAction(const boost::function<void()>& action, int milliseconds);
-    static int Depth();
-    static bool WaitForDepth(int depth, int milliseconds);
+
+    // Hands `task` to the innermost modal loop of `dialog`: it runs on the
+    // loop's thread, inside the loop, after the tasks posted before it; this
+    // is how another thread reaches a window. Tasks posted before the loop
+    // sees its close still run. False if `dialog` runs no loop; the task then
+    // never runs. Any thread. A task must not throw.
+    static bool Post(OS_Dialog& dialog, const boost::function<void()>& task);
+
+    // One observer of every loop of the process, for accessibility and
+    // automation layers that must know which window is modal. Called without
+    // the register's lock held, so it may call Post and PostClose. An empty
+    // function removes it. Any thread; set it while no loop runs.
+    using Observer = boost::function<void(OS_Dialog& dialog, ModalLoopEvent event)>;
+    static void SetObserver(const Observer& observer);
 };
 
 }  // namespace tolmoui

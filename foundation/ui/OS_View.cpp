@@ -4,7 +4,6 @@ namespace tolmoui {
 
 void OS_View::UI_SetLocalRect(const RectT<int>& rect)
 {
-    ++mSetCount;
     UI_SetLocalRectF(RectT<float>{static_cast<float>(rect.left), static_cast<float>(rect.top),
                                   static_cast<float>(rect.right), static_cast<float>(rect.bottom)});
 }

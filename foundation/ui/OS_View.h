@@ -14,14 +14,9 @@ public:
     // rectangle of the node follows it.
     void UI_SetLocalRect(const RectT<int>& rect);
     RectT<int> UI_GetLocalRect() const;
-    // How often UI_SetLocalRect was called, for tests.
-    int UI_GetSetLocalRectCount() const { return mSetCount; }
 
     // The view itself, with its rectangle in window coordinates.
     void UI_GetOSControlClipRects(ClipRectList& list) override;
-
-private:
-    int mSetCount = 0;
 };
 
 }  // namespace tolmoui

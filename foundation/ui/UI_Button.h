@@ -17,7 +17,7 @@ public:
     bool IsDefault() const { return mDefault; }
 
     // Tells the button's listeners of a press.
-    void NotifyPressed() { SimulateInteractiveChange(kInteractiveChange_Click); }
+    void NotifyPressed() { HandleUserChange(kInteractiveChange_Click); }
 
 private:
     int mResponse;

@@ -12,7 +12,7 @@ void UI_ControlView::SendChanged()
     for (const auto& handler : handlers) handler(&message);
 }
 
-bool UI_InteractiveControlView::SimulateInteractiveChange(int changeMessage)
+bool UI_InteractiveControlView::HandleUserChange(int changeMessage)
 {
     if (IsDisabled()) return false;
     boost::intrusive_ptr<UI_InteractiveControlView> keep(this);

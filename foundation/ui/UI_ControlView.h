@@ -16,8 +16,7 @@ class UI_ControlView : public UI_Node {
 public:
     using ChangeHandler = boost::function<void(const UI_ControlMessage*)>;
 
-    // A disabled control takes no user input: presses, typing and clicks
-    // simulated on it do nothing.
+    // A disabled control takes no user input (HandleUserChange refuses it).
     void SetDisabled(bool disabled) { mDisabled = disabled; }
     bool IsDisabled() const { return mDisabled; }
 
@@ -43,10 +42,11 @@ public:
         mInteractiveHandlers.push_back(handler);
     }
 
-    // Automation: sends an interactive change with `changeMessage` (0 for one
-    // that changes nothing) and then the plain change. A disabled control
-    // takes no input: false, and nothing is sent. On the UI thread.
-    bool SimulateInteractiveChange(int changeMessage);
+    // What the platform control calls when the user changed it: the
+    // interactive handlers hear `changeMessage` (0 for a change of nothing),
+    // then the plain ones. A disabled control takes no input: false, and
+    // nothing is sent. On the UI thread.
+    bool HandleUserChange(int changeMessage);
 
 private:
     std::vector<InteractiveChangeHandler> mInteractiveHandlers;

@@ -52,13 +52,13 @@ void UI_Dialog::SetOkButton(const boost::intrusive_ptr<UI_Button>& button)
     mOkButton = button;
 }
 
-void UI_Dialog::SimulateUserClose()
+void UI_Dialog::HandleCloseBox()
 {
     SetResponse(kDialogResponse_Cancel);
     UI_PostClose();
 }
 
-bool UI_Dialog::SimulateButtonPress(int response)
+bool UI_Dialog::HandleButtonClick(int response)
 {
     const boost::intrusive_ptr<UI_Button> button = FindButton(response);
     if (!button || button->IsDisabled()) return false;

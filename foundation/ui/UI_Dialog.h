@@ -2,7 +2,7 @@
 // Windows that run modally.
 //
 // OS_Dialog is the platform window: its modal loop runs on the thread that
-// calls RunModal and executes actions posted to it (UI_Automation.h) until the
+// calls RunModal and executes tasks posted to it (ModalLoops::Post) until the
 // window is closed. PostClose may come from any thread; everything else
 // belongs to the loop's thread.
 //
@@ -45,12 +45,11 @@ public:
     void Center();
     PointT<float> GetScreenPosition() const { return mScreenPosition; }
 
-    // Runs the modal loop on the calling thread: posted actions run in the
-    // order posted, until PostClose. Actions posted before the close was seen
+    // Runs the modal loop on the calling thread: posted tasks run in the
+    // order posted, until PostClose. Tasks posted before the close was seen
     // still run. A PostClose that came while no loop ran ends the next loop at
     // once. Returns GetResponse(). Hides the window when it ends. Nested loops
-    // (a modal window opened from inside an action) are fine; the innermost
-    // one receives posted actions.
+    // (a modal window opened from inside a task) are fine.
     int RunModal();
     // Ends the modal loop. Any thread.
     void PostClose();
@@ -59,11 +58,6 @@ public:
     // The response of the last loop; changed by buttons and SetResponse. Any thread.
     int GetResponse() const { return mResponse.load(); }
     void SetResponse(int response) { mResponse.store(response); }
-
-protected:
-    // Called by RunModal on the loop's thread before the loop starts, for
-    // windows that arrange their content at that point.
-    virtual void UI_PrepareModal() {}
 
 private:
     friend class ModalLoops;
@@ -112,14 +106,15 @@ public:
     int GetStyle() const { return mStyle; }
     int GetFlags() const { return mFlags; }
 
-    // Automation, on the loop's thread (from inside RunInModalLoop).
-    // The window's close box: the response becomes Cancel and UI_PostClose runs.
-    void SimulateUserClose();
-    // Presses the button of `response`. A missing or disabled button
-    // cannot be pressed: false. The OK button asks the OK hook first and stays
-    // open if it refuses; otherwise the response is set and UI_PostClose runs.
-    // True if the button was pressed.
-    bool SimulateButtonPress(int response);
+    // What the platform window calls on the loop's thread when the user acts.
+    // The close box: the response becomes Cancel and UI_PostClose runs.
+    void HandleCloseBox();
+    // A click on the button of `response`. A missing or disabled button takes
+    // no click: false. The button's listeners hear of the press; the OK
+    // button then asks the OK hook and the dialog stays open if it refuses;
+    // otherwise the response is set and UI_PostClose runs. True if the button
+    // took the click.
+    bool HandleButtonClick(int response);
 
 private:
     const SupplierInterface* mSupplier;

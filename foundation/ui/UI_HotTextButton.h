@@ -12,10 +12,6 @@ public:
     void SetText(const UTF16String& text) { mText = text; }
     const UTF16String& GetText() const { return mText; }
 
-    // Automation: the user clicks the link. Its listeners hear of it (the
-    // interactive ones with a non-zero change code). False if it is disabled.
-    bool SimulateClick() { return SimulateInteractiveChange(kInteractiveChange_Click); }
-
 private:
     UTF16String mText;
 };

@@ -1,12 +1,14 @@
 #pragma once
-// Layouts: a tree of objects that work out how much room a group of nodes
-// needs and then place the nodes. They stay readable after placing, so a
-// test can see the shape a dialog asked for.
+// Layouts: the tree of objects in which a dialog describes how its nodes sit
+// (a grid, spacers, nodes of a given size) and hands them to its window. The
+// headless UI keeps the description as given and computes no sizes or
+// places, so the tree can be read back as the dialog built it.
 //
-// Ownership: layouts are shared; a layout holds the nodes it places. UI thread.
+// Ownership: layouts are shared; a layout holds the nodes it describes. UI thread.
+
+#include <vector>
 
 #include <boost/shared_ptr.hpp>
-#include <vector>
 
 #include "foundation/ui/UI_Geometry.h"
 #include "foundation/ui/UI_Node.h"
@@ -23,36 +25,28 @@ enum LayoutAlign {
 class Layout {
 public:
     virtual ~Layout() = default;
-    // The width and height that the layout needs.
-    virtual PointT<float> GetSize() const = 0;
-    // Places the nodes inside `area`, in the coordinates of their container.
-    virtual void Place(const RectT<float>& area) = 0;
-    // The one node this layout places, looking through spacers; null for a
+    // The one node this layout describes, looking through spacers; null for a
     // layout of several nodes or of none.
     virtual UI_Node* GetNode() const { return nullptr; }
 };
 
 using LayoutPtr = boost::shared_ptr<Layout>;
 
-// The offset that `align` gives a length of `used` inside `room`.
-float AlignedOffset(LayoutAlign align, float room, float used);
-
 // Empty room on one side of an inner layout (which may be null: the spacer
-// alone). Along the spacer's axis, room beyond what is needed goes to the
-// inner layout by `align`.
+// alone); along the spacer's axis the inner layout sits by `align`.
 class Spacer : public Layout {
 public:
     enum Side { Side_Left, Side_Right, Side_Top, Side_Bottom };
 
-    Spacer(Side side, float amount, const LayoutPtr& inner, LayoutAlign align);
+    Spacer(Side side, float amount, const LayoutPtr& inner, LayoutAlign align)
+        : mSide(side), mAmount(amount), mInner(inner), mAlign(align)
+    {
+    }
 
     Side GetSide() const { return mSide; }
     float GetAmount() const { return mAmount; }
     const LayoutPtr& GetInner() const { return mInner; }
     LayoutAlign GetAlign() const { return mAlign; }
-
-    PointT<float> GetSize() const override;
-    void Place(const RectT<float>& area) override;
     UI_Node* GetNode() const override { return mInner ? mInner->GetNode() : nullptr; }
 
 private:
@@ -94,15 +88,12 @@ public:
     }
 };
 
-// Layouts stacked top to bottom, each as wide as the widest; where a window
-// hangs the caller's layouts between its own parts.
+// Layouts stacked top to bottom; where a window takes the caller's layouts
+// between its own parts.
 class LayoutDecorator : public Layout {
 public:
-    void AddLayout(const LayoutPtr& layout);
+    void AddLayout(const LayoutPtr& layout) { mLayouts.push_back(layout); }
     const std::vector<LayoutPtr>& GetLayouts() const { return mLayouts; }
-
-    PointT<float> GetSize() const override;
-    void Place(const RectT<float>& area) override;
 
 private:
     std::vector<LayoutPtr> mLayouts;

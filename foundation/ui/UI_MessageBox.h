@@ -1,7 +1,7 @@
 #pragma once
 // A modal message box: a message, the caller's layouts below it (through the
 // pre-button layout decorator, with its nodes in the content container), and
-// a row of buttons.
+// its buttons. Headless, it has no size and places nothing.
 
 #include <boost/function.hpp>
 #include <boost/shared_ptr.hpp>
@@ -25,14 +25,10 @@ public:
 
     // Room above and below a row of the box's content.
     static constexpr float kRowSpacingAboveAndBelow = 8;
-    // Margin around the box's content.
-    static constexpr float kMargin = 20;
-    static constexpr float kButtonWidth = 80;
-    static constexpr float kButtonHeight = 20;
 
-    // `defaultButton` is the response of the default button. `width` is the
-    // least width of the message (0: the box's own), `height` the least height
-    // of the box. `icon`, `options` and `messageCallback` are kept for the
+    // `defaultButton` is the response of the default button. `width` and
+    // `height`, the least size of the message and of the box, mean nothing
+    // headless. `icon`, `options` and `messageCallback` are kept for the
     // caller; the headless box draws no icon and sends the callback nothing.
     UI_MessageBox(const SupplierInterface* supplier, const UTF16String& title, const UTF16String& message, int buttons,
                   int defaultButton, int icon, UI_Node* parent, int options, float width, float height,
@@ -41,27 +37,18 @@ public:
     boost::intrusive_ptr<UI_StaticText> GetMessageStaticText() const { return mMessage; }
     // The button of `response`; null if the box has none.
     boost::intrusive_ptr<UI_Button> GetSpecificButton(int response) const { return FindButton(response); }
-    // The caller's layouts, placed between the message and the buttons.
+    // The caller's layouts, to go between the message and the buttons.
     LayoutDecorator& GetPreButtonLayoutDecorator() { return mPreButtonLayouts; }
 
     int GetButtonSet() const { return mButtonSet; }
     int GetIcon() const { return mIcon; }
     const boost::shared_ptr<MessageCallback>& GetMessageCallback() const { return mMessageCallback; }
 
-    // Works out the box's size and places the message, the decorator's
-    // layouts and the buttons. RunModal does it before the loop starts.
-    void LayoutContent();
-
-protected:
-    void UI_PrepareModal() override { LayoutContent(); }
-
 private:
     boost::intrusive_ptr<UI_StaticText> mMessage;
     LayoutDecorator mPreButtonLayouts;
     int mButtonSet;
     int mIcon;
-    float mMessageWidth;
-    float mLeastHeight;
     boost::shared_ptr<MessageCallback> mMessageCallback;
 };
 

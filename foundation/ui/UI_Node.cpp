@@ -51,10 +51,7 @@ RectT<int> UI_Node::UI_LocalToGlobal(const RectT<int>& rect) const
     return RectT<int>{rect.left + x, rect.top + y, rect.right + x, rect.bottom + y};
 }
 
-void UI_Node::UI_Draw()
-{
-    ++mDrawCount;
-}
+void UI_Node::UI_Draw() {}
 
 void UI_Node::UI_SizeChanged() {}
 

@@ -8,8 +8,8 @@
 // the container clears when it lets the child go.
 //
 // Threads: apart from the counts, a node belongs to the thread that runs its
-// window's modal loop. Tests read and change nodes from inside that loop
-// (RunInModalLoop in UI_Automation.h) or after it has ended.
+// window's modal loop. Other threads reach nodes through tasks posted to
+// that loop (ModalLoops::Post) or after it has ended.
 
 #include <atomic>
 #include <utility>
@@ -53,9 +53,8 @@ public:
     // integers. A node in no window counts as its own window.
     RectT<int> UI_LocalToGlobal(const RectT<int>& rect) const;
 
-    // The headless draw only counts.
+    // Headless: draws nothing; nodes with native parts override it.
     virtual void UI_Draw();
-    int UI_GetDrawCount() const { return mDrawCount; }
 
     // Called after the size changed; nodes that arrange children override it.
     virtual void UI_SizeChanged();
@@ -92,7 +91,6 @@ private:
     bool mShown = true;
     bool mHasFocus = false;
     int mFocusReason = 0;
-    int mDrawCount = 0;
 };
 
 class UI_Container : public UI_Node {

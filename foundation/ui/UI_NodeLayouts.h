@@ -1,7 +1,6 @@
 #pragma once
-// Layouts of one node each: any node at a fixed size, a static text sized by
-// its text, and a link sized by its text. Each places its node at the left of
-// its area and, vertically, by its alignment.
+// Layouts of one node each: any node at a fixed size, a static text, and a
+// link; each with its vertical alignment.
 
 #include <boost/intrusive_ptr.hpp>
 
@@ -11,19 +10,15 @@
 
 namespace tolmoui {
 
-// What the headless UI takes a character and a line of text to need.
-constexpr float kTextCharWidth = 7;
-constexpr float kTextLineHeight = 16;
-
 class UI_NodeLayout : public Layout {
 public:
-    UI_NodeLayout(const boost::intrusive_ptr<UI_Node>& node, const PointT<float>& size, LayoutAlign vertical);
+    UI_NodeLayout(const boost::intrusive_ptr<UI_Node>& node, const PointT<float>& size, LayoutAlign vertical)
+        : mNode(node), mSize(size), mVertical(vertical)
+    {
+    }
 
     const PointT<float>& GetFixedSize() const { return mSize; }
     LayoutAlign GetVerticalAlign() const { return mVertical; }
-
-    PointT<float> GetSize() const override { return mSize; }
-    void Place(const RectT<float>& area) override;
     UI_Node* GetNode() const override { return mNode.get(); }
 
 private:
@@ -32,17 +27,16 @@ private:
     LayoutAlign mVertical;
 };
 
-// `point` is the width (0: as wide as the text) and the least height. A
-// multi-line text wraps at that width.
+// `point` is the width (0: as wide as the text) and the least height.
 class UI_TextLayout : public Layout {
 public:
-    UI_TextLayout(const boost::intrusive_ptr<UI_StaticText>& text, const PointT<float>& point, LayoutAlign vertical);
+    UI_TextLayout(const boost::intrusive_ptr<UI_StaticText>& text, const PointT<float>& point, LayoutAlign vertical)
+        : mText(text), mPoint(point), mVertical(vertical)
+    {
+    }
 
     const PointT<float>& GetPoint() const { return mPoint; }
     LayoutAlign GetVerticalAlign() const { return mVertical; }
-
-    PointT<float> GetSize() const override;
-    void Place(const RectT<float>& area) override;
     UI_Node* GetNode() const override { return mText.get(); }
 
 private:
@@ -55,13 +49,13 @@ private:
 class UI_HotTextButtonLayout : public Layout {
 public:
     UI_HotTextButtonLayout(const boost::intrusive_ptr<UI_HotTextButton>& button, const PointT<float>& point,
-                           LayoutAlign vertical);
+                           LayoutAlign vertical)
+        : mButton(button), mPoint(point), mVertical(vertical)
+    {
+    }
 
     const PointT<float>& GetPoint() const { return mPoint; }
     LayoutAlign GetVerticalAlign() const { return mVertical; }
-
-    PointT<float> GetSize() const override;
-    void Place(const RectT<float>& area) override;
     UI_Node* GetNode() const override { return mButton.get(); }
 
 private:

@@ -1,5 +1,5 @@
 #pragma once
-// A container that draws with a supplier and rearranges on a change of size.
+// A container that draws with a supplier.
 
 #include "foundation/ui/SupplierInterface.h"
 #include "foundation/ui/UI_Node.h"
@@ -13,13 +13,8 @@ public:
 
     const SupplierInterface* GetSupplier() const { return mSupplier; }
 
-    // Counts, for tests; the headless view has nothing to rearrange.
-    void UI_SizeChanged() override;
-    int GetSizeChangedCount() const { return mSizeChangedCount; }
-
 private:
     const SupplierInterface* mSupplier;
-    int mSizeChangedCount = 0;
 };
 
 }  // namespace tolmoui

@@ -15,12 +15,4 @@ UTF16String UI_TextEdit::GetDisplayedText() const
     return UTF16String(mValue.size(), u'\u2022');
 }
 
-bool UI_TextEdit::SimulateTyping(const UTF16String& newValue)
-{
-    if (IsDisabled()) return false;
-    mValue = newValue;
-    mSelection = {mValue.size(), mValue.size()};
-    return SimulateInteractiveChange(kInteractiveChange_Edit);
-}
-
 }  // namespace tolmoui

@@ -35,11 +35,6 @@ public:
     // What the field shows: the text, or a bullet for each unit of a password.
     UTF16String GetDisplayedText() const;
 
-    // Automation: the user replaces the field's text with `newValue`. The
-    // interactive change handlers get a non-zero change code, then the plain
-    // ones run. False (and nothing changes) if the field is disabled.
-    bool SimulateTyping(const UTF16String& newValue);
-
 private:
     int mFlags;
     int mAlignment;

@@ -334,7 +334,7 @@ TEST_F(SyncCommand, MigrateCopiesTheEarlierVersionsPreferencesAndSaysFromWhich)
     EXPECT_TRUE(Contains(migrated.mOut, "version 1.0's (Tolmonet_tolmonetsync_1.0) were copied")) << migrated.mOut;
     EXPECT_TRUE(Contains(migrated.mOut, "download  Notes/a.txt: missing locally")) << migrated.mOut;
     EXPECT_EQ(mDesktop.Read("a.txt"), "a1");
-    EXPECT_TRUE(migrated.mErr.empty()) << migrated.mErr;  // the trace it listens to stays silent
+    EXPECT_TRUE(migrated.mErr.empty()) << migrated.mErr;  // nothing traced unasked
 
     // A later version crossing a major number looks for the last minor one (1.5) and finds none.
     Computer next(mRoot.Path(), "next");

@@ -10,6 +10,18 @@ prefix=$(mktemp -d)
 trap 'rm -rf "$prefix"' EXIT
 
 cmake --install "$build" --prefix "$prefix" >/dev/null
+
+# Nothing test-only ships: no header of the test kit and no symbol of the
+# scripted extensions, the UI automation or counters kept for tests.
+test_only_headers=$(find "$prefix/include" \( -name '*Scripted*' -o -name '*Automation*' -o -name '*Fake*' \
+  -o -name '*Recorder*' -o -name '*InMemory*' -o -path '*/support/*' -o -path '*/tests/*' \) -print)
+[ -z "$test_only_headers" ] || { echo "test-only headers installed:"; echo "$test_only_headers"; exit 1; }
+library=$(find "$prefix/lib" -name 'libtolmonetsync.so*' -type f | head -n 1)
+[ -n "$library" ] || { echo "no installed library"; exit 1; }
+test_only_names='ScriptedExtension|ExtensionScript|Simulate[A-Z]|WaitForModalDialog|RunInModalLoop|WaitForModalLoopDepth|GetDrawCount|GetSetLocalRectCount|GetSizeChangedCount|FlushHost|SendHostEvent|TesselHost::Flush|FileOpsRecorder|InMemoryServer|InMemoryTree'
+found=$(nm -DC "$library" | grep -E "$test_only_names" || true)
+[ -z "$found" ] || { echo "test-only names in the installed library:"; echo "$found" | head -n 20; exit 1; }
+echo "nothing test-only installed"
 cmake -S "$source/tests/install/consumer" -B "$prefix/consumer-build" -G Ninja \
   -DCMAKE_PREFIX_PATH="$prefix" -DCMAKE_CXX_FLAGS="$flags" >/dev/null
 cmake --build "$prefix/consumer-build" >/dev/null

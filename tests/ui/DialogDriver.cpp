@@ -2,7 +2,7 @@
 
 #include <gtest/gtest.h>
 
-#include "foundation/ui/UI_Automation.h"
+#include "support/UI_Automation.h"
 
 namespace uitest {
 
@@ -26,7 +26,7 @@ DialogRun::DialogRun(const DialogArguments& arguments) : mArguments(arguments)
 DialogRun::~DialogRun()
 {
     if (mThread.joinable()) {
-        Do([](UI_MessageBox& box) { box.SimulateUserClose(); });
+        Do([](UI_MessageBox& box) { box.HandleCloseBox(); });
         Finish();
     }
 }

@@ -15,6 +15,7 @@
 #include "foundation/ui/UI_MessageBox.h"
 #include "foundation/ui/UI_TextEdit.h"
 #include "identity/dialogs/SyncAuthenticationDialog.h"
+#include "support/UI_Automation.h"
 
 namespace uitest {
 

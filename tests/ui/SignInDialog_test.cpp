@@ -28,9 +28,9 @@ TEST_F(SignInDialog, TheRightPasswordSignsInAndTheClientReachesItsRoot)
     arguments.validator = SignInValidator(client);
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        Edit(box, "UserNameTextEdit")->SimulateTyping(UTF16String(u"ann"));
-        Edit(box, "PasswordTextEdit")->SimulateTyping(UTF16String(u"secret"));
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_OK));
+        SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String(u"ann"));
+        SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"secret"));
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
     }));
     EXPECT_TRUE(run.Finish());
     EXPECT_EQ(ToNarrow(run.Arguments().userName), "ann");
@@ -46,15 +46,15 @@ TEST_F(SignInDialog, AWrongPasswordShowsTheServicesTextAndTheNextTryGetsIn)
     arguments.validator = SignInValidator(client);
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        EXPECT_TRUE(box.SimulateButtonPress(kDialogResponse_OK));
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
         EXPECT_EQ(ToNarrow(MessageText(box)), kFailedText);
         EXPECT_TRUE(box.IsInModalLoop());
     }));
     EXPECT_EQ(idtest::RootStatus(client), 401);  // no token yet
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        Edit(box, "PasswordTextEdit")->SimulateTyping(UTF16String(u"secret"));
+        SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"secret"));
         EXPECT_EQ(ToNarrow(MessageText(box)), "Sign in with your Halvane ID.");
-        box.SimulateButtonPress(kDialogResponse_OK);
+        box.HandleButtonClick(kDialogResponse_OK);
     }));
     EXPECT_TRUE(run.Finish());
     EXPECT_EQ(idtest::RootStatus(client), 200);

@@ -122,7 +122,7 @@ bool CloseByHand()
 {
     const boost::intrusive_ptr<tolmoui::UI_Dialog> dialog = tolmoui::WaitForModalDialog(kWaitMs);
     if (!dialog) return false;
-    return tolmoui::RunInModalLoop([dialog] { dialog->SimulateUserClose(); }, kWaitMs);
+    return tolmoui::RunInModalLoop([dialog] { dialog->HandleCloseBox(); }, kWaitMs);
 }
 
 bool LauncherGoneAfter(const tessel::ScriptedExtension& extension, int unloadedEvents)

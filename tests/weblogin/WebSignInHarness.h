@@ -14,10 +14,10 @@
 #include <boost/shared_ptr.hpp>
 
 #include "IdentityService.h"
-#include "foundation/tessel/TesselScriptedExtension.h"
-#include "foundation/ui/UI_Automation.h"
 #include "identity/dialogs/MerrowLoginDialog.h"
 #include "identity/dialogs/MerrowLoginDialogImpl.h"
+#include "support/TesselScriptedExtension.h"
+#include "support/UI_Automation.h"
 #include "tarnvault/Tarnvault.h"
 
 namespace weblogin {

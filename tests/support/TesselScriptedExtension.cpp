@@ -1,5 +1,6 @@
-#include "foundation/tessel/TesselScriptedExtension.h"
+#include "support/TesselScriptedExtension.h"
 
+#include "foundation/core/Threads.h"
 #include "foundation/tessel/TesselHost.h"
 
 namespace tessel {
@@ -127,7 +128,11 @@ void SendHostEvent(const std::string& type, const boost::optional<std::string>& 
 
 bool FlushHost(int milliseconds)
 {
-    return TesselHost::Get().Flush(milliseconds);
+    // Tasks due at once run in the order posted: this one runs after them.
+    if (TesselHost::Get().OnHostThread()) return false;
+    const boost::shared_ptr<tolmocore::threads::Gate> ran(new tolmocore::threads::Gate(false));
+    TesselHost::Get().Post([ran] { ran->Open(); });
+    return ran->PassThrough(milliseconds);
 }
 
 void UnregisterExtension(const std::string& id)

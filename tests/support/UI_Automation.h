@@ -1,13 +1,15 @@
 #pragma once
-// Playing the user in tests. From any thread but the modal loop's own:
-// wait for a modal dialog, then run actions inside its loop, where the
-// Simulate... operations of dialogs and controls may be called and nodes read.
-// A time of -1 waits without limit.
+// Playing the user in tests. From any thread but the modal loop's own: wait
+// for a modal dialog, then run actions inside its loop, where the dialog's and
+// controls' Handle... entry points may be called and nodes read. Built on the
+// UI's modal-loop observer and ModalLoops::Post. A time of -1 waits without
+// limit.
 
 #include <boost/function.hpp>
 #include <boost/intrusive_ptr.hpp>
 
 #include "foundation/ui/UI_Dialog.h"
+#include "foundation/ui/UI_TextEdit.h"
 
 namespace tolmoui {
 
@@ -22,10 +24,12 @@ boost::intrusive_ptr<UI_Dialog> WaitForModalDialog(int milliseconds);
 // `action` must not throw.
 bool RunInModalLoop(const boost::function<void()>& action, int milliseconds);
 
-// How many modal loops run now.
-int ModalLoopDepth();
 // Waits until at least `depth` modal loops run (a nested dialog has come up);
 // false on time-out.
 bool WaitForModalLoopDepth(int depth, int milliseconds);
+
+// The user replaces the field's text with `newValue`, inside the loop. False
+// (and nothing changes) if the field is disabled.
+bool SimulateTyping(UI_TextEdit& edit, const UTF16String& newValue);
 
 }  // namespace tolmoui

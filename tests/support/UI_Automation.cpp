@@ -1,0 +1,159 @@
+#include "support/UI_Automation.h"
+
+#include <algorithm>
+#include <chrono>
+#include <condition_variable>
+#include <memory>
+#include <mutex>
+#include <set>
+#include <thread>
+#include <vector>
+
+#include "foundation/ui/ModalLoops.h"
+
+namespace tolmoui {
+
+namespace {
+
+struct LoopFrame {
+    OS_Dialog* dialog;
+    std::thread::id thread;
+    bool closing;
+};
+
+// What the observer has seen of the running loops; innermost last.
+struct Tracker {
+    std::mutex mutex;
+    std::condition_variable changed;
+    std::vector<LoopFrame> frames;
+    std::set<OS_Dialog*> closedBeforeLoop;  // a PostClose that ends the next loop at once
+};
+
+Tracker& TheTracker()
+{
+    static Tracker sTracker;
+    return sTracker;
+}
+
+std::vector<LoopFrame>::reverse_iterator Innermost(Tracker& tracker, OS_Dialog& dialog)
+{
+    return std::find_if(tracker.frames.rbegin(), tracker.frames.rend(),
+                        [&](const LoopFrame& frame) { return frame.dialog == &dialog; });
+}
+
+void Observe(OS_Dialog& dialog, ModalLoopEvent event)
+{
+    Tracker& tracker = TheTracker();
+    std::lock_guard<std::mutex> lock(tracker.mutex);
+    const auto frame = Innermost(tracker, dialog);
+    switch (event) {
+        case ModalLoopEvent_Started:
+            tracker.frames.push_back(
+                {&dialog, std::this_thread::get_id(), tracker.closedBeforeLoop.erase(&dialog) > 0});
+            break;
+        case ModalLoopEvent_Closing:
+            if (frame == tracker.frames.rend())
+                tracker.closedBeforeLoop.insert(&dialog);
+            else
+                frame->closing = true;
+            break;
+        case ModalLoopEvent_Ended:
+            if (frame != tracker.frames.rend()) tracker.frames.erase(std::next(frame).base());
+            break;
+    }
+    tracker.changed.notify_all();
+}
+
+// Installed before main, so that no loop of a test starts unseen.
+const bool sObserving = (ModalLoops::SetObserver(&Observe), true);
+
+using Clock = std::chrono::steady_clock;
+
+// Waits for `ready`; a negative time waits without limit.
+template <class Predicate>
+bool WaitFor(std::unique_lock<std::mutex>& lock, int milliseconds, Clock::time_point start, Predicate ready)
+{
+    Tracker& tracker = TheTracker();
+    if (milliseconds < 0) {
+        tracker.changed.wait(lock, ready);
+        return true;
+    }
+    return tracker.changed.wait_until(lock, start + std::chrono::milliseconds(milliseconds), ready);
+}
+
+struct PostedAction {
+    enum State { Waiting, Running, Done, Withdrawn };
+    State state = Waiting;
+};
+
+}  // namespace
+
+boost::intrusive_ptr<UI_Dialog> WaitForModalDialog(int milliseconds)
+{
+    (void)sObserving;
+    Tracker& tracker = TheTracker();
+    std::unique_lock<std::mutex> lock(tracker.mutex);
+    UI_Dialog* found = nullptr;
+    // A loop whose close is posted is ending: a test waiting for the next
+    // dialog must not get the one it has just closed.
+    auto open = [&] {
+        for (auto it = tracker.frames.rbegin(); it != tracker.frames.rend(); ++it) {
+            if (it->closing) continue;
+            found = dynamic_cast<UI_Dialog*>(it->dialog);
+            return found != nullptr;
+        }
+        return false;
+    };
+    if (!WaitFor(lock, milliseconds, Clock::now(), open)) return nullptr;
+    return boost::intrusive_ptr<UI_Dialog>(found);
+}
+
+bool RunInModalLoop(const boost::function<void()>& action, int milliseconds)
+{
+    const Clock::time_point start = Clock::now();
+    Tracker& tracker = TheTracker();
+    std::unique_lock<std::mutex> lock(tracker.mutex);
+    if (!tracker.frames.empty() && tracker.frames.back().thread == std::this_thread::get_id()) {
+        lock.unlock();
+        action();
+        return true;
+    }
+    if (!WaitFor(lock, milliseconds, start, [&] { return !tracker.frames.empty(); })) return false;
+    const auto posted = std::make_shared<PostedAction>();
+    const bool taken = ModalLoops::Post(*tracker.frames.back().dialog, [posted, action] {
+        Tracker& tracker = TheTracker();
+        {
+            std::lock_guard<std::mutex> lock(tracker.mutex);
+            if (posted->state == PostedAction::Withdrawn) return;
+            posted->state = PostedAction::Running;
+        }
+        action();
+        std::lock_guard<std::mutex> lock(tracker.mutex);
+        posted->state = PostedAction::Done;
+        tracker.changed.notify_all();
+    });
+    if (!taken) return false;
+    if (!WaitFor(lock, milliseconds, start, [&] { return posted->state != PostedAction::Waiting; })) {
+        // Not started in time: withdrawn, so that it never runs.
+        posted->state = PostedAction::Withdrawn;
+        return false;
+    }
+    tracker.changed.wait(lock, [&] { return posted->state == PostedAction::Done; });
+    return true;
+}
+
+bool WaitForModalLoopDepth(int depth, int milliseconds)
+{
+    Tracker& tracker = TheTracker();
+    std::unique_lock<std::mutex> lock(tracker.mutex);
+    return WaitFor(lock, milliseconds, Clock::now(), [&] { return static_cast<int>(tracker.frames.size()) >= depth; });
+}
+
+bool SimulateTyping(UI_TextEdit& edit, const UTF16String& newValue)
+{
+    if (edit.IsDisabled()) return false;
+    edit.SetValue(newValue, false);
+    return edit.HandleUserChange(kInteractiveChange_Edit);
+}
+
+}  // namespace tolmoui
