@@ -55,6 +55,14 @@ public:
             if (line.find(text) != std::string::npos) return true;
         return false;
     }
+    // The first line holding `text`; empty if none does.
+    std::string LineWith(const std::string& text)
+    {
+        std::lock_guard<std::mutex> lock(mMutex);
+        for (const std::string& line : mLines)
+            if (line.find(text) != std::string::npos) return line;
+        return std::string();
+    }
     std::size_t Count()
     {
         std::lock_guard<std::mutex> lock(mMutex);
