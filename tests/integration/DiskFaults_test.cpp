@@ -11,18 +11,14 @@
 #include <cstring>
 #include <filesystem>
 
-#include "LocalScenarioServer.h"
-#include "SyncHarness.h"
+#include "FolderSync.h"
 #include "support/FileOpsRecorder.h"
-#include "support/TestScopes.h"
 
 namespace synctest {
 
 namespace {
 
 namespace fs = std::filesystem;
-using Files = std::map<std::string, std::string>;
-using testsupport::ReadFileBytes;
 using testsupport::WriteFileBytes;
 
 struct DiskFault {
@@ -44,48 +40,7 @@ const DiskFault kDiskFaults[] = {
     {"directory not writable", "open", "", EACCES},
 };
 
-class DiskFaults : public ::testing::Test {
-protected:
-    fs::path Folder() const { return mDesk.Path() / "Presets"; }
-
-    RunResult Sync(SyncMode mode)
-    {
-        SyncHarness host(mServer.Client());
-        host.Service().RegisterSyncDirectory(SyncDir(Dir(tolmocore::utility::ToUTF16(Folder().string())), u".txt",
-                                                     u"Presets", ImmutableString::CreateStatic("text/plain"),
-                                                     SyncMetadata_ModDate, 1 << 20));
-        return host.Sync(mode);
-    }
-
-    // Every file of the folder by name, ".temp" files included.
-    Files Local() const
-    {
-        Files files;
-        for (const auto& entry : fs::directory_iterator(Folder()))
-            files[entry.path().filename().string()] = ReadFileBytes(entry.path());
-        return files;
-    }
-
-    // Every backed-up copy of a name, joined by "|".
-    Files Backups() const
-    {
-        Files saved;
-        const fs::path root = mPrefs.Path() / "SyncBackup";
-        if (!fs::exists(root)) return saved;
-        for (const auto& dir : fs::directory_iterator(root))
-            for (const auto& file : fs::directory_iterator(dir.path())) {
-                std::string& copies = saved[file.path().filename().string()];
-                copies += (copies.empty() ? "" : "|") + ReadFileBytes(file.path());
-            }
-        return saved;
-    }
-
-    std::string CacheFile() const { return ReadFileBytes(mPrefs.Path() / "tolmonetsynccache.json"); }
-
-    testsupport::PrefDirScope mPrefs;
-    testsupport::TempDir mDesk;
-    LocalScenarioServer mServer;
-};
+using DiskFaults = FolderSync;
 
 TEST_F(DiskFaults, AFailedWriteLosesNothingAndTheNextSyncConverges)
 {
