@@ -221,7 +221,7 @@ bool OvraConnection::GetUserInfoAndFetchToken(bool production, const UTF8String&
     // Without a handle there is nothing to fetch with, named user or not.
     if (ref == nullptr) {
         TOLMO_TRACE("OvraConnection", 1, "GetUserInfoAndFetchToken: the native library is not available");
-        fetchState = kFetchState_NotStarted;
+        fetchState.store(kFetchState_NotStarted, std::memory_order_release);
         return false;
     }
     UTF8String fetchedUser = user;
@@ -230,7 +230,7 @@ bool OvraConnection::GetUserInfoAndFetchToken(bool production, const UTF8String&
         if (lib.mFetchDefaultUserInfoForClientId == nullptr ||
             lib.mFetchDefaultUserInfoForClientId(ref, id.Chars(), &info) != 0) {
             TOLMO_TRACE("OvraConnection", 1, "GetUserInfoAndFetchToken: no default user");
-            fetchState = kFetchState_NotStarted;
+            fetchState.store(kFetchState_NotStarted, std::memory_order_release);
             return false;
         }
         fetchedUser = UserFromInfo(info);
@@ -240,7 +240,7 @@ bool OvraConnection::GetUserInfoAndFetchToken(bool production, const UTF8String&
         userID = fetchedUser;
     }
     if (lib.mFetchAccessToken == nullptr) {
-        fetchState = kFetchState_NotStarted;
+        fetchState.store(kFetchState_NotStarted, std::memory_order_release);
         return false;
     }
     // A refusal here leaves the state at "under way", as the library left it.
@@ -251,7 +251,7 @@ bool OvraConnection::GetUserInfoAndFetchToken(bool production, const UTF8String&
 void OvraConnection::ParseAccessTokenDetails(const char* text, bool success)
 {
     if (!success) {
-        fetchState = kFetchState_Failed;
+        fetchState.store(kFetchState_Failed, std::memory_order_release);
         return;
     }
     try {
@@ -262,7 +262,7 @@ void OvraConnection::ParseAccessTokenDetails(const char* text, bool success)
             accessToken = response.access_token;
             email = response.email;
         }
-        fetchState = kFetchState_Received;
+        fetchState.store(kFetchState_Received, std::memory_order_release);
     } catch (const std::exception& e) {
         TOLMO_TRACE("OvraConnection", 1, "ParseAccessTokenDetails error: " << e.what());
     }

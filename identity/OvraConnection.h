@@ -11,9 +11,14 @@
 //
 // Threads. Operations may be called from any thread, one at a time per object.
 // The library calls back on a thread of its own; a completion runs there, with
-// no lock of this object held, so it may start the next operation. The fetch
-// state and the user's fields are written on that thread and may be read from
-// any other through their getters.
+// no lock of this object held, so it may start the next operation.
+//
+// The fetch state and the user's fields are public, as hosts read them by
+// name. The library's thread writes userID, email and accessToken before it
+// stores 2, 3 or 4 into fetchState (a release store). A host reads the three
+// strings directly only after it has read one of those values from
+// fetchState, and before it starts the next fetch; the getters below may be
+// called at any time.
 //
 // Errors. Nothing here throws to the caller but boost::bad_weak_ptr (above)
 // and allocation failures. A missing library, or a missing function of it,
@@ -100,10 +105,17 @@ public:
     // The library's text for `argument`; empty on any failure.
     UTF8String FetchAccounts(bool production, const UTF8String& argument);
 
-    int GetFetchState() const { return fetchState.load(); }
+    int GetFetchState() const { return fetchState.load(std::memory_order_acquire); }
     UTF8String GetUserID() const;
     UTF8String GetEmail() const;
     UTF8String GetAccessToken() const;
+
+    // See "The fetch state and the user's fields" above: the strings are
+    // written before the release store of 2, 3 or 4, and read after it.
+    std::atomic<int> fetchState{kFetchState_None};
+    UTF8String userID;
+    UTF8String email;
+    UTF8String accessToken;
 
 private:
     using Context = boost::weak_ptr<OvraConnection>;
@@ -124,14 +136,11 @@ private:
     friend void FetchTokenCallback(OVRA_STATUS status, const char* text, void* context);
     friend void FetchContinueTokenCallback(OVRA_STATUS status, const char* text, void* context);
 
-    // mStateMutex guards mRef, mContext, userID, email and accessToken: the
-    // library's thread writes the fields while others read them.
+    // mStateMutex guards mRef and mContext, and the writes of userID, email
+    // and accessToken against this object's own readers (the getters and
+    // JumpToURL), which may run while a fetch is under way.
     mutable std::mutex mStateMutex;
     OVRA_Ref mRef = nullptr;
-    std::atomic<int> fetchState{kFetchState_None};
-    UTF8String userID;
-    UTF8String email;
-    UTF8String accessToken;
     Context* mContext = nullptr;  // handed to OVRA_createRef
     // mCompletionMutex guards completion and nothing else.
     OvraAsyncCompletionFunction completion;

@@ -134,6 +134,9 @@ bool SyncFilesService::DoSync(const boost::shared_ptr<SyncCache>& cache, const S
     for (std::size_t index = 0; index < cache->mFiles.size(); ++index) {
         CachedSyncFile& record = cache->mFiles[index];
         const SyncDecision decision = DecideRecord(*cache, record, mode);
+        // Server-wins forgets the tag of a locally changed file whether or not
+        // it downloads now: the saved cache must never vouch for that file.
+        if (decision.mDropCachedEtag) record.mCachedServerEtag.clear();
         switch (decision.mAction) {
         case SyncAction_Nothing:
             batch->Skip(index);
@@ -151,7 +154,6 @@ bool SyncFilesService::DoSync(const boost::shared_ptr<SyncCache>& cache, const S
             batch->Skip(index);
             break;
         case SyncAction_Download:
-            if (decision.mDropCachedEtag) record.mCachedServerEtag.clear();
             if (BatchSync::QueueDownload(batch, index, decision.mItem, cache, record).IsNil())
                 error(u"QueueDownload error");
             break;

@@ -195,7 +195,7 @@ void _HandleDownload(const File& file, const boost::shared_ptr<DownloadSink>& si
         TOLMO_TRACE("Tarnvault", 8,
                     "Download" << ", content-type: " << result.mContentType << ", content-size: "
                                << result.mContentSize << ", etag: " << result.mEtag
-                               << ", last_modified: " << result.mLastModified);
+                               << ", last_modified: " << result.mLastModified << ", requestUID: " << requestUID);
         sink->Close();
     } catch (const std::exception& e) {
         sink->Discard();

@@ -1,7 +1,10 @@
 #pragma once
 // Who the host is. The host (or the command line) sets these before it makes
 // a service; the library reads them for keychain domains, root names and the
-// default preference directory. Any thread may read; set before first use.
+// default preference directory. Any thread may read at any time. A setter
+// publishes a new value and never frees the old one, so a reference that a
+// getter gave stays valid and unchanged even if a setter runs later; the
+// getter called after that setter gives the new value.
 
 #include "foundation/core/Strings.h"
 

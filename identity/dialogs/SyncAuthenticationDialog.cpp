@@ -3,6 +3,7 @@
 #include <boost/make_shared.hpp>
 #include <boost/weak_ptr.hpp>
 
+#include "foundation/core/ThrowError.h"
 #include "foundation/ui/GridLayout.h"
 #include "foundation/ui/LayoutJoiner.h"
 #include "foundation/ui/UI_NodeLayouts.h"
@@ -18,15 +19,20 @@ namespace {
 const int kButtons = UI_MessageBox::kMessageBoxButton_OK | UI_MessageBox::kMessageBoxButton_Cancel;  // 0x801
 const int kPasswordEditFlags = kTextEditFlag_Password;                                               // 0x20
 
+const char kInvalidTypeConversion[] = "$$$/tolmocore/utility/Error/InvalidTypeConversion=Invalid type conversion.";
+
 // Controls keep their handlers for as long as they live, which a caller's
 // reference may make longer than the run: they reach the handler weakly.
+// The adapter takes any message and checks that it is the handler's kind.
 template <class Message>
 boost::function<void(const Message*)> Bind(const boost::shared_ptr<MessageBoxCallbackHandler>& handler,
                                            void (MessageBoxCallbackHandler::*member)(const Message*))
 {
     boost::weak_ptr<MessageBoxCallbackHandler> weak(handler);
-    return [weak, member](const Message* message) {
-        if (auto alive = weak.lock()) ((*alive).*member)(message);
+    return [weak, member](const tolmoui::ConstMessage* message) {
+        const Message* typed =
+            tolmocore::utility::NonOptionalDynamicCast<const Message>(message, kInvalidTypeConversion, 105, 21);
+        if (auto alive = weak.lock()) ((*alive).*member)(typed);
     };
 }
 

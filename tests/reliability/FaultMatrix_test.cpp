@@ -54,6 +54,7 @@ const Fault kFaults[] = {
     {"401", FaultAction_Status, 401, false},
     {"404", FaultAction_Status, 404, false},
     {"closed before an answer", FaultAction_CloseBeforeAnswer, 0, false},
+    {"cut in the middle of its body", FaultAction_CloseMidBody, 0, false},
     {"no answer until the stall time-out", FaultAction_Delay, 0, false},
     {"not JSON", FaultAction_NotJson, 0, true},
     {"JSON of the wrong shape", FaultAction_WrongShapeJson, 0, true},

@@ -55,6 +55,22 @@ public:
             if (line.find(text) != std::string::npos) return true;
         return false;
     }
+    // The first line holding `text`; empty if none does.
+    std::string LineWith(const std::string& text)
+    {
+        std::lock_guard<std::mutex> lock(mMutex);
+        for (const std::string& line : mLines)
+            if (line.find(text) != std::string::npos) return line;
+        return std::string();
+    }
+    // How many lines hold `text`.
+    std::size_t CountWith(const std::string& text)
+    {
+        std::lock_guard<std::mutex> lock(mMutex);
+        std::size_t count = 0;
+        for (const std::string& line : mLines) count += line.find(text) != std::string::npos ? 1 : 0;
+        return count;
+    }
     std::size_t Count()
     {
         std::lock_guard<std::mutex> lock(mMutex);

@@ -2,11 +2,13 @@
 
 #include <gtest/gtest.h>
 
+#include <thread>
 #include <vector>
 
 #include "foundation/core/HostConfig.h"
 #include "foundation/core/Localizer.h"
 #include "foundation/core/Opener.h"
+#include "foundation/core/ThrowError.h"
 
 using namespace tolmocore;
 
@@ -30,14 +32,45 @@ TEST(Localizer, InstalledTranslationWinsForItsKeyOnly)
     EXPECT_EQ(localizer.Localize("$$$/tolmonetsync/Login/Title=Sign In"), UTF16String(u"Sign In"));
 }
 
-TEST(HostConfig, ValuesSetByTheHostAreRead)
+TEST(HostConfig, AReferenceHeldByAReaderSurvivesALateSetter)
 {
-    config::SetCompanyName(UTF16String(u"Example Co"));
     config::SetClientName(UTF16String(u"Cinderal"));
-    config::SetClientInternalVersion(UTF16String(u"9.2"));
-    EXPECT_EQ(config::GetCompanyName(), UTF16String(u"Example Co"));
-    EXPECT_EQ(config::GetClientName(), UTF16String(u"Cinderal"));
-    EXPECT_EQ(config::GetClientInternalVersion(), UTF16String(u"9.2"));
+    const UTF16String& held = config::GetClientName();
+    // A reader on another thread copies the name while the host sets it again;
+    // under ThreadSanitizer a reference escaping a lock shows as a race.
+    std::thread reader([] {
+        for (int i = 0; i < 2000; ++i) {
+            const UTF16String copy = config::GetClientName();
+            ASSERT_TRUE(copy == UTF16String(u"Cinderal") || copy.size() == 40) << i;
+        }
+    });
+    for (int i = 0; i < 200; ++i) config::SetClientName(UTF16String(std::u16string(40, u'a' + i % 26)));
+    reader.join();
+    EXPECT_EQ(held, UTF16String(u"Cinderal"));
+    EXPECT_EQ(config::GetClientName(), UTF16String(std::u16string(40, u'a' + 199 % 26)));
+}
+
+TEST(ThrowError, AMessageOfTheWrongKindRaisesTheLocalisedConversionError)
+{
+    struct Message {
+        virtual ~Message() = default;
+    };
+    struct Click : Message {};
+    struct Edit : Message {};
+    const char kKey[] = "$$$/tolmocore/utility/Error/InvalidTypeConversion=Invalid type conversion.";
+    Click click;
+    const Message* message = &click;
+    EXPECT_EQ(utility::NonOptionalDynamicCast<const Click>(message, kKey, 105, 21), &click);
+    for (const Message* wrong : {static_cast<const Message*>(nullptr), message}) {
+        try {
+            utility::NonOptionalDynamicCast<const Edit>(wrong, kKey, 105, 21);
+            ADD_FAILURE() << "no error";
+        } catch (const utility::LocalizedError& e) {
+            EXPECT_STREQ(e.what(), "Invalid type conversion.");
+            EXPECT_EQ(e.Code(), 105u);
+            EXPECT_EQ(e.Detail(), 21);
+        }
+    }
 }
 
 class OpenerTest : public ::testing::Test {
