@@ -4,9 +4,7 @@
 
 #include <gtest/gtest.h>
 
-#include <chrono>
 #include <map>
-#include <thread>
 
 #include <boost/json/parse.hpp>
 
@@ -65,7 +63,6 @@ public:
     void Write(const std::string& name, const std::string& bytes) const { WriteFileBytes(mFolder / name, bytes); }
     std::string Read(const std::string& name) const { return ReadFileBytes(mFolder / name); }
     std::map<std::string, std::string> Folder() const { return Snapshot(mFolder); }
-    std::map<std::string, std::string> Backups() const { return Snapshot(mPref / "SyncBackup"); }
     fs::path CacheFile() const { return mPref / "tolmonetsynccache.json"; }
 
     fs::path mFolder;
@@ -94,7 +91,7 @@ protected:
     Computer mDesktop;
 };
 
-TEST_F(SyncCommand, ChangesOnBothSidesMeetAndTheReplacedFileIsBackedUp)
+TEST_F(SyncCommand, ChangesOnBothSidesMeetAndThePlanAndSummaryArePrinted)
 {
     mLaptop.Write("a.txt", "a1");
     mLaptop.Write("b.txt", "b1");
@@ -119,16 +116,6 @@ TEST_F(SyncCommand, ChangesOnBothSidesMeetAndTheReplacedFileIsBackedUp)
     EXPECT_TRUE(Contains(both.mOut, "uploaded 1, downloaded 1")) << both.mOut;
     EXPECT_EQ(mLaptop.Read("b.txt"), "b2 from the desktop");
     EXPECT_NE(ReadFileBytes(mLaptop.CacheFile()), cacheBefore);
-
-    // The laptop's old b.txt is in this run's backup directory.
-    bool backedUp = false;
-    for (const auto& backup : mLaptop.Backups()) backedUp |= backup.second == "b1";
-    EXPECT_TRUE(backedUp);
-
-    // The service holds both changes: a third computer gets them.
-    Computer fresh(mRoot.Path(), "fresh");
-    ASSERT_EQ(fresh.Sync(mService).mStatus, 0);
-    EXPECT_EQ(fresh.Folder(), mLaptop.Folder());
 }
 
 TEST_F(SyncCommand, DryRunChangesNothingAnywhere)
@@ -185,42 +172,6 @@ TEST_F(SyncCommand, GroupGuardRefusesUnlessPruneIsGiven)
     EXPECT_TRUE(Contains(gone.mOut, "create    server group Notes")) << gone.mOut;
 }
 
-TEST_F(SyncCommand, EachModeDecidesWhoWins)
-{
-    SyncBothComputers();
-    mDesktop.Write("a.txt", "a from the desktop");
-    ASSERT_EQ(mDesktop.Sync(mService).mStatus, 0);
-    mLaptop.Write("b.txt", "b from the laptop");
-    mLaptop.Write("extra.txt", "only here");
-
-    // Server wins: the server's a.txt comes down, the laptop's b.txt change is
-    // replaced and extra.txt (not on the server) removed, each backed up.
-    const Finished serverWins = mLaptop.Sync(mService, {"--mode", "server-wins"});
-    ASSERT_EQ(serverWins.mStatus, 0) << serverWins.mErr;
-    EXPECT_TRUE(Contains(serverWins.mOut, "remove    ")) << serverWins.mOut;
-    EXPECT_EQ(mLaptop.Read("a.txt"), "a from the desktop");
-    EXPECT_EQ(mLaptop.Read("b.txt"), "b1");
-    EXPECT_FALSE(fs::exists(mLaptop.mFolder / "extra.txt"));
-    std::map<std::string, int> backedUp;
-    for (const auto& backup : mLaptop.Backups()) ++backedUp[backup.second];
-    EXPECT_EQ(backedUp["b from the laptop"], 1);
-    EXPECT_EQ(backedUp["only here"], 1);
-
-    // Local wins: the laptop's state goes up over the desktop's change. The
-    // service's dates travel in whole seconds: a change within the second of
-    // the laptop's last sync would look like none, so wait for the next one.
-    std::this_thread::sleep_until(std::chrono::ceil<std::chrono::seconds>(std::chrono::system_clock::now()));
-    mDesktop.Write("a.txt", "a again from the desktop");
-    ASSERT_EQ(mDesktop.Sync(mService).mStatus, 0);
-    mLaptop.Write("b.txt", "b local wins");
-    const Finished localWins = mLaptop.Sync(mService, {"--mode", "local-wins"});
-    ASSERT_EQ(localWins.mStatus, 0) << localWins.mErr;
-    EXPECT_EQ(mLaptop.Read("a.txt"), "a from the desktop");
-    ASSERT_EQ(mDesktop.Sync(mService, {"--mode", "server-wins"}).mStatus, 0);
-    EXPECT_EQ(mDesktop.Read("b.txt"), "b local wins");
-    EXPECT_EQ(mDesktop.Read("a.txt"), "a from the desktop");
-}
-
 TEST_F(SyncCommand, JsonOutputParsesAndCountsWhatMoved)
 {
     mLaptop.Write("a.txt", "a1");
@@ -231,6 +182,15 @@ TEST_F(SyncCommand, JsonOutputParsesAndCountsWhatMoved)
     EXPECT_EQ(json.at("mode").as_string(), "two-way");
     EXPECT_EQ(json.at("plan").at("records").at(0).at("action").as_string(), "upload");
     EXPECT_EQ(json.at("result").at("uploaded").to_number<int>(), 1);
+
+    // --mode reaches the engine: server-wins plans to remove a file the server lacks.
+    mLaptop.Write("extra.txt", "only here");
+    const Finished serverWins = mLaptop.Sync(mService, {"--mode", "server-wins", "--dry-run", "--json"});
+    const boost::json::value planned = boost::json::parse(serverWins.mOut);
+    EXPECT_EQ(planned.at("mode").as_string(), "server-wins");
+    const auto& removals = planned.at("plan").at("localRemovals").as_array();
+    ASSERT_EQ(removals.size(), 1u) << serverWins.mOut;
+    EXPECT_EQ(removals[0].as_string(), (mLaptop.mFolder / "extra.txt").string());
 
     const Finished quiet = mLaptop.Sync(mService, {"-q"});
     EXPECT_EQ(quiet.mStatus, 0);

@@ -1,7 +1,7 @@
 // Load on the local service: sixteen users, each with a computer of their
 // own, sync their own two hundred files at the same moment, round after round
 // with changes, and then a second computer of each user brings the folder
-// back. Deleted files come back too, as two-way syncs bring them. Beside that, a load generator reads from the service.
+// back. Deleted files come back too, as two-way syncs bring them.
 // No request may fail and no file may be lost; the request rates are printed, not judged.
 
 #include <gtest/gtest.h>
@@ -11,7 +11,6 @@
 #include <cstdio>
 #include <map>
 #include <memory>
-#include <regex>
 #include <string>
 #include <vector>
 
@@ -193,33 +192,6 @@ TEST_F(ServiceLoad, SixteenUsersSyncTheirOwnFoldersAtOnceRoundAfterRoundAndLoseN
     for (std::size_t c = 0; c < mComputers.size(); ++c)
         EXPECT_TRUE(FolderContents(second[c].mFolder) == FolderContents(mComputers[c].mFolder))
             << mComputers[c].mUser << "'s second computer does not hold the folder";
-}
-
-// A load generator reads one item's metadata over 32 connections at once;
-// every answer must be a 200.
-TEST_F(ServiceLoad, ManyConnectionsReadingAtOnceGetNoErrors)
-{
-    const Computer& reader = mComputers.front();
-    TreeSeeder seed(*mService, reader.mUser);
-    const std::string item = seed.Item(seed.ClientRoot("tolmonetsync"), "read.txt", "read me\n", "text/plain");
-    const std::string url = mService->AssetServiceUrl() + "/assets/" + item + "/metadata";
-    const std::string command =
-        "wrk -t2 -c32 -d3s --latency -H 'Authorization: Bearer " + reader.mToken + "' '" + url + "' 2>&1";
-    FILE* pipe = ::popen(command.c_str(), "r");
-    ASSERT_NE(pipe, nullptr);
-    std::string output;
-    char buffer[4096];
-    while (std::fgets(buffer, sizeof(buffer), pipe)) output += buffer;
-    const int status = ::pclose(pipe);
-    ASSERT_EQ(status, 0) << "wrk could not run (./dev setup installs it):\n" << output;
-
-    std::smatch rate;
-    ASSERT_TRUE(std::regex_search(output, rate, std::regex("Requests/sec:\\s+([0-9.]+)"))) << output;
-    EXPECT_GT(std::stod(rate[1].str()), 0.0) << output;
-    EXPECT_EQ(output.find("Non-2xx"), std::string::npos) << output;
-    EXPECT_EQ(output.find("Socket errors"), std::string::npos) << output;
-    std::printf("wrk, 32 connections reading metadata: %s requests/s\n", rate[1].str().c_str());
-    std::printf("%s", output.c_str());
 }
 
 }  // namespace

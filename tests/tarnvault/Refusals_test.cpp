@@ -2,6 +2,7 @@
 // and no callback; a follow-up one ends the chain through the error callback.
 
 #include <atomic>
+#include <functional>
 
 #include "ClientTestSupport.h"
 
@@ -73,87 +74,100 @@ TEST_F(RefusalTest, RefusedFirstRequestsGiveANilIdentifierAndNoCallback)
     EXPECT_TRUE(client->SearchAsync(outcome.Assets(), outcome.Error(), SearchQuery(), id).IsNil());
     EXPECT_TRUE(client->HeaderAsync(outcome.Asset(), outcome.Error(), "x", true, id).IsNil());
     EXPECT_TRUE(client->GetRootAsync(outcome.CollectionDone(), outcome.Error(), id).IsNil());
-    EXPECT_TRUE(client->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), u"g",
-                                              kCollectionType_Collection, id)
-                    .IsNil());
+    EXPECT_TRUE(
+        client->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), u"g", kCollectionType_Collection, id)
+            .IsNil());
     EXPECT_TRUE(client->AddAsync(outcome.Success(), outcome.Error(), MakeCollection("C"), MakeItem("i"), id).IsNil());
     EXPECT_TRUE(client->DeleteAsync(outcome.Success(), outcome.Error(), MakeItem("i"), false, id).IsNil());
-    EXPECT_TRUE(client->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i"), File(u"/tmp/x"), "", id)
-                    .IsNil());
+    EXPECT_TRUE(
+        client->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i"), File(u"/tmp/x"), "", id).IsNil());
     outcome.LetGo();
     EXPECT_TRUE(outcome.WaitReleased());
     EXPECT_EQ(outcome.Calls(), 0);
     EXPECT_TRUE(mService.Requests().empty());
 }
 
-TEST_F(RefusalTest, RefusedHeaderAfterACreateIsReported)
-{
-    const auto client = ClientAccepting(1);
-    mService.Script(201, "", {{"Location", "/api/collections/n1"}});
-    Outcome outcome;
-    client->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), u"g", kCollectionType_Collection,
-                                  Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_EQ(outcome.ErrorText(), "CreateCollection Header failed");
-}
-
-TEST_F(RefusalTest, RefusedAddAfterACreateInAParentGivesANullResponse)
-{
-    const auto client = ClientAccepting(2);
-    mService.Script(201, "", {{"Location", "/api/collections/n1"}});
-    mService.Script(200, CollectionJSON("n1", "g"));
-    Outcome outcome;
-    client->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), MakeCollection("P"), u"g",
-                                  kCollectionType_Collection, Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_FALSE(outcome.Succeeded());
-    EXPECT_FALSE(outcome.Response());
-}
-
-TEST_F(RefusalTest, RefusedDeleteAfterASearchByNameGivesANullResponse)
-{
-    const auto client = ClientAccepting(1);
-    mService.Script(200, "[" + ItemJSON("i1", "a") + "]");
-    Outcome outcome;
-    client->DeleteAsync(outcome.Success(), outcome.Error(), MakeCollection("C"), u"a", false, Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_FALSE(outcome.Succeeded());
-    EXPECT_FALSE(outcome.Response());
-}
-
-TEST_F(RefusalTest, RefusedStepsOfAnUpload)
+// A refused follow-up ends the chain once, through the error callback: with
+// the step's own text, or with no response at all.
+TEST_F(RefusalTest, RefusedFollowUpRequestsEndTheChainThroughTheErrorCallback)
 {
     testsupport::TempDir dir;
     testsupport::WriteFileBytes(dir / "a.txt", "abc");
     const File file(tolmocore::utility::ToUTF16((dir / "a.txt").string()));
     const ImmutableString type = ImmutableString::CreateStatic("text/plain");
-
-    // The post after the search.
-    const auto postRefused = ClientAccepting(1);
-    mService.Script(200, "[]");
-    Outcome post;
-    postRefused->UploadAsync(post.ItemDone(), post.Error(), MakeCollection("C"), file, type, u"", Guid::CreateUnique());
-    ASSERT_TRUE(post.Wait());
-    EXPECT_FALSE(post.Succeeded());
-    EXPECT_FALSE(post.Response());
-
-    // The metadata request after the post.
-    const auto headerRefused = ClientAccepting(2);
-    mService.Script(200, "[]");
-    mService.Script(201, "", {{"Location", "/api/assets/n"}});
-    Outcome header;
-    headerRefused->UploadAsync(header.ItemDone(), header.Error(), MakeCollection("C"), file, type, u"",
-                               Guid::CreateUnique());
-    ASSERT_TRUE(header.Wait());
-    EXPECT_EQ(header.ErrorText(), "Upload Header failed");
-}
-
-TEST_F(RefusalTest, RefusedSearchForThePreferencesRootIsReported)
-{
-    const auto client = ClientAccepting(1);
-    mService.Script(200, "[" + CollectionJSON("root1", "client-1", kRootMedia) + "]");
-    Outcome outcome;
-    client->GetPreferencesRootAsync(outcome.CollectionDone(), outcome.Error(), Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_EQ(outcome.ErrorText(), "SearchAsync failed");
+    using Start = std::function<void(Tarnvault&, Outcome&)>;
+    const HttpHeaders created{{"Location", "/api/collections/n1"}};
+    struct Reply {
+        int mStatus;
+        std::string mBody;
+        HttpHeaders mHeaders;
+    };
+    const struct {
+        const char* mStep;
+        int mAccept;
+        std::vector<Reply> mReplies;
+        Start mStart;
+        const char* mError;  // null: no response reaches the callback
+    } cases[] = {
+        {"header after a create",
+         1,
+         {{201, "", created}},
+         [](Tarnvault& c, Outcome& o) {
+             c.CreateCollectionAsync(o.CollectionDone(), o.Error(), u"g", kCollectionType_Collection,
+                                     Guid::CreateUnique());
+         },
+         "CreateCollection Header failed"},
+        {"add after a create in a parent",
+         2,
+         {{201, "", created}, {200, CollectionJSON("n1", "g"), {}}},
+         [](Tarnvault& c, Outcome& o) {
+             c.CreateCollectionAsync(o.CollectionDone(), o.Error(), MakeCollection("P"), u"g",
+                                     kCollectionType_Collection, Guid::CreateUnique());
+         },
+         nullptr},
+        {"delete after a search by name",
+         1,
+         {{200, "[" + ItemJSON("i1", "a") + "]", {}}},
+         [](Tarnvault& c, Outcome& o) {
+             c.DeleteAsync(o.Success(), o.Error(), MakeCollection("C"), u"a", false, Guid::CreateUnique());
+         },
+         nullptr},
+        {"upload's post after its search",
+         1,
+         {{200, "[]", {}}},
+         [&](Tarnvault& c, Outcome& o) {
+             c.UploadAsync(o.ItemDone(), o.Error(), MakeCollection("C"), file, type, u"", Guid::CreateUnique());
+         },
+         nullptr},
+        {"upload's metadata after its post",
+         2,
+         {{200, "[]", {}}, {201, "", {{"Location", "/api/assets/n"}}}},
+         [&](Tarnvault& c, Outcome& o) {
+             c.UploadAsync(o.ItemDone(), o.Error(), MakeCollection("C"), file, type, u"", Guid::CreateUnique());
+         },
+         "Upload Header failed"},
+        {"preferences root's search",
+         1,
+         {{200, "[" + CollectionJSON("root1", "client-1", kRootMedia) + "]", {}}},
+         [](Tarnvault& c, Outcome& o) {
+             c.GetPreferencesRootAsync(o.CollectionDone(), o.Error(), Guid::CreateUnique());
+         },
+         "SearchAsync failed"},
+    };
+    for (const auto& refused : cases) {
+        SCOPED_TRACE(refused.mStep);
+        const auto client = ClientAccepting(refused.mAccept);
+        for (const Reply& reply : refused.mReplies) mService.Script(reply.mStatus, reply.mBody, reply.mHeaders);
+        Outcome outcome;
+        refused.mStart(*client, outcome);
+        ASSERT_TRUE(outcome.Wait());
+        outcome.LetGo();
+        ASSERT_TRUE(outcome.WaitReleased());
+        EXPECT_EQ(outcome.Calls(), 1);
+        EXPECT_FALSE(outcome.Succeeded());
+        if (refused.mError)
+            EXPECT_EQ(outcome.ErrorText(), refused.mError);
+        else
+            EXPECT_FALSE(outcome.Response());
+    }
 }
