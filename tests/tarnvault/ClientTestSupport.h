@@ -38,6 +38,20 @@ constexpr char kCollectionMedia[] = "application/vnd.halvane.tarnvault.collectio
 constexpr char kRootMedia[] = "application/vnd.halvane.tarnvault.collection.root";
 constexpr char kPreferencesMedia[] = "application/vnd.halvane.tarnvault.collection.preferences";
 
+inline std::string Decode(const std::string& text)
+{
+    std::string out;
+    for (size_t i = 0; i < text.size(); ++i) {
+        if (text[i] == '%' && i + 2 < text.size()) {
+            out += static_cast<char>(std::stoi(text.substr(i + 1, 2), nullptr, 16));
+            i += 2;
+        } else {
+            out += text[i];
+        }
+    }
+    return out;
+}
+
 // Answers from a queue, in order, and records every request. An unscripted
 // request gets 599.
 class ScriptedService {
@@ -78,10 +92,16 @@ public:
         std::lock_guard<std::mutex> lock(mMutex);
         return mRequests;
     }
-    HttpRequest Request(size_t index) const
+    // The first request of `method` whose decoded target starts with `target`
+    // and holds `part`; one with no method if nothing like it was asked for.
+    HttpRequest Find(const std::string& method, const std::string& target, const std::string& part = "") const
     {
-        const std::vector<HttpRequest> requests = Requests();
-        return index < requests.size() ? requests[index] : HttpRequest();
+        for (const HttpRequest& request : Requests()) {
+            const std::string decoded = Decode(request.mTarget);
+            if (request.mMethod == method && decoded.rfind(target, 0) == 0 && decoded.find(part) != std::string::npos)
+                return request;
+        }
+        return HttpRequest();
     }
     std::string ApiUrl() const { return mServer.Url("/api"); }
 
@@ -235,8 +255,8 @@ private:
     Snapshot Locked() const
     {
         std::lock_guard<std::mutex> lock(mState->mMutex);
-        return Snapshot{mState->mCalls,    mState->mSuccess, mState->mId,      mState->mResponse,
-                        mState->mAssets,   mState->mAsset,   mState->mDownload};
+        return Snapshot{mState->mCalls,  mState->mSuccess, mState->mId,      mState->mResponse,
+                        mState->mAssets, mState->mAsset,   mState->mDownload};
     }
 
     boost::shared_ptr<State> mState;
@@ -259,20 +279,6 @@ inline ParameterList Parameters(const std::string& url, const std::string& token
     parameters.push_back(std::make_pair(tolmonet::kHEADER_COOKIE, UTF8String(token)));
     parameters.push_back(std::make_pair(tolmonet::kHEADER_USER_AGENT, UTF8String(clientID)));
     return parameters;
-}
-
-inline std::string Decode(const std::string& text)
-{
-    std::string out;
-    for (size_t i = 0; i < text.size(); ++i) {
-        if (text[i] == '%' && i + 2 < text.size()) {
-            out += static_cast<char>(std::stoi(text.substr(i + 1, 2), nullptr, 16));
-            i += 2;
-        } else {
-            out += text[i];
-        }
-    }
-    return out;
 }
 
 // A collection or an item as the service describes it.

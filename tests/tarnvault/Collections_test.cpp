@@ -7,7 +7,10 @@ using namespace tvtest;
 
 namespace {
 
-HttpHeaders Location(const std::string& value) { return HttpHeaders{{"Location", value}}; }
+HttpHeaders Location(const std::string& value)
+{
+    return HttpHeaders{{"Location", value}};
+}
 
 }  // namespace
 
@@ -22,16 +25,13 @@ TEST_F(ClientTest, CreateWithoutParentPostsTheHeaderThenReadsIt)
               id);
     ASSERT_TRUE(outcome.Wait());
     ASSERT_EQ(mService.Requests().size(), 2u);
-    const HttpRequest create = mService.Request(0);
-    EXPECT_EQ(create.mMethod, "POST");
+    const HttpRequest create = mService.Find("POST", "/api/collections");
     EXPECT_EQ(create.mTarget, "/api/collections");
     EXPECT_EQ(create.Header("Content-Type"), "application/json");
     EXPECT_EQ(create.mBody,
               "{\"header\":{\"name\":\"Gr\xc3\xbcppe\",\"type\":\"application/vnd.halvane.tarnvault.collection\"}}");
     ExpectAuthorised(create, id);
-    EXPECT_EQ(mService.Request(1).mMethod, "GET");
-    EXPECT_EQ(mService.Request(1).mTarget, "/api/collections/new1/header");
-    ExpectAuthorised(mService.Request(1), id);
+    ExpectAuthorised(mService.Find("GET", "/api/collections/new1/header"), id);
     ASSERT_TRUE(outcome.Succeeded());
     EXPECT_EQ(outcome.Id(), id);
     EXPECT_EQ(outcome.AssetSeen()->mId, "new1");
@@ -44,7 +44,7 @@ TEST_F(ClientTest, CreateOfNoTypeSendsAnEmptyType)
     mClient->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), u"g", kCollectionType_None,
                                    Guid::CreateUnique());
     ASSERT_TRUE(outcome.Wait());
-    EXPECT_EQ(mService.Request(0).mBody, R"({"header":{"name":"g","type":""}})");
+    EXPECT_EQ(mService.Find("POST", "/api/collections").mBody, R"({"header":{"name":"g","type":""}})");
     EXPECT_EQ(outcome.Status(), 400);
 }
 
@@ -68,7 +68,7 @@ TEST_F(ClientTest, CreateFailures)
     mClient->CreateCollectionAsync(noId.CollectionDone(), noId.Error(), u"g", kCollectionType_Collection,
                                    Guid::CreateUnique());
     ASSERT_TRUE(noId.Wait());
-    EXPECT_EQ(mService.Request(2).mTarget, "/api/collections//header");
+    EXPECT_EQ(mService.Find("GET", "/api/collections//header").mMethod, "GET");
     EXPECT_EQ(noId.Status(), 404);
     EXPECT_EQ(noId.ErrorText(), "no such collection");
 
@@ -92,15 +92,13 @@ TEST_F(ClientTest, CreateInAParentIsCreateHeaderAndAddUnderANewIdentifier)
     mService.Script(200, "");
     Outcome outcome;
     const Guid given = Guid::CreateUnique();
-    const Guid chain =
-        mClient->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), parent, u"g",
-                                       kCollectionType_Collection, given);
+    const Guid chain = mClient->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), parent, u"g",
+                                                      kCollectionType_Collection, given);
     ASSERT_FALSE(chain.IsNil());
     EXPECT_NE(chain, given);
     ASSERT_TRUE(outcome.Wait());
     ASSERT_EQ(mService.Requests().size(), 3u);
-    const HttpRequest add = mService.Request(2);
-    EXPECT_EQ(add.mMethod, "PUT");
+    const HttpRequest add = mService.Find("PUT", "/api/collections/P/members");
     EXPECT_EQ(add.mTarget, "/api/collections/P/members");
     EXPECT_EQ(add.Header("Content-Type"), "application/json");
     EXPECT_EQ(add.mBody, R"(["/collections/new1"])");
@@ -145,11 +143,13 @@ TEST_F(ClientTest, AddSendsThePathOfItsKindAndAppendsTheSameObject)
     mClient->AddAsync(refused.Success(), refused.Error(), collection, MakeItem("i3"), Guid::CreateUnique());
     ASSERT_TRUE(refused.Wait());
 
-    EXPECT_EQ(mService.Request(0).mMethod, "PUT");
-    EXPECT_EQ(mService.Request(0).mTarget, "/api/collections/C/members");
-    EXPECT_EQ(mService.Request(0).mBody, R"(["/assets/i1"])");
-    ExpectAuthorised(mService.Request(0), id);
-    EXPECT_EQ(mService.Request(1).mBody, R"(["/collections/c2"])");
+    std::vector<std::string> bodies;
+    for (const HttpRequest& request : mService.Requests()) {
+        EXPECT_EQ(request.mMethod + " " + request.mTarget, "PUT /api/collections/C/members");
+        bodies.push_back(request.mBody);
+    }
+    EXPECT_EQ(bodies, (std::vector<std::string>{R"(["/assets/i1"])", R"(["/collections/c2"])", R"(["/assets/i3"])"}));
+    ExpectAuthorised(mService.Find("PUT", "/api/collections/C/members"), id);
     EXPECT_TRUE(first.Succeeded());
     EXPECT_EQ(first.Id(), id);
     EXPECT_FALSE(refused.Succeeded());
@@ -176,10 +176,8 @@ TEST_F(ClientTest, DeleteSendsRecursiveAndLeavesMembersAlone)
     mClient->DeleteAsync(missing.Success(), missing.Error(), item, false, Guid::CreateUnique());
     ASSERT_TRUE(missing.Wait());
 
-    EXPECT_EQ(mService.Request(0).mMethod, "DELETE");
-    EXPECT_EQ(mService.Request(0).mTarget, "/api/assets/i1?recursive=false");
-    ExpectAuthorised(mService.Request(0), id);
-    EXPECT_EQ(mService.Request(1).mTarget, "/api/collections/C?recursive=true");
+    ExpectAuthorised(mService.Find("DELETE", "/api/assets/i1?recursive=false"), id);
+    EXPECT_EQ(mService.Find("DELETE", "/api/collections/C?recursive=true").mMethod, "DELETE");
     EXPECT_TRUE(plain.Succeeded());
     EXPECT_TRUE(recursive.Succeeded());
     EXPECT_FALSE(missing.Succeeded());
@@ -196,10 +194,8 @@ TEST_F(ClientTest, DeleteByNameSearchesThenDeletesWhatItFound)
     EXPECT_EQ(mClient->DeleteAsync(outcome.Success(), outcome.Error(), MakeCollection("C"), u"a.txt", true, id), id);
     ASSERT_TRUE(outcome.Wait());
     ASSERT_EQ(mService.Requests().size(), 2u);
-    EXPECT_EQ(mService.Request(0).mMethod, "POST");
-    EXPECT_NE(Decode(mService.Request(0).mTarget).find(R"("name":"a.txt")"), std::string::npos);
-    EXPECT_EQ(mService.Request(1).mTarget, "/api/assets/i7?recursive=true");
-    ExpectAuthorised(mService.Request(1), id);
+    EXPECT_EQ(mService.Find("POST", "/api/search?", R"("name":"a.txt")").mMethod, "POST");
+    ExpectAuthorised(mService.Find("DELETE", "/api/assets/i7?recursive=true"), id);
     EXPECT_TRUE(outcome.Succeeded());
     EXPECT_EQ(outcome.Id(), id);
 }
@@ -238,7 +234,8 @@ TEST_F(ClientTest, FetchChildrenReplacesTheMembersOrLeavesThemEmpty)
     EXPECT_TRUE(fetched.Succeeded());
     ASSERT_EQ(collection->mChildren.size(), 2u);
     EXPECT_EQ(collection->mChildren[0]->mId, "i1");
-    EXPECT_NE(mService.Request(0).mTarget.find("&scope=%5b%22%2fcollections%2fC%22%5d"), std::string::npos);
+    EXPECT_NE(mService.Find("POST", "/api/search?").mTarget.find("&scope=%5b%22%2fcollections%2fC%22%5d"),
+              std::string::npos);
 
     mService.Script(500, "down");
     Outcome failed;

@@ -83,7 +83,7 @@ TEST(Configuration, AutoLoginWithAGivenTokenUsesTheToken)
     Outcome outcome;
     client->SearchAsync(outcome.Assets(), outcome.Error(), SearchQuery(), Guid::CreateUnique());
     ASSERT_TRUE(outcome.Wait());
-    EXPECT_EQ(service.Request(0).Header("Authorization"), "Bearer given");
+    EXPECT_EQ(service.Find("POST", "/api/search?").Header("Authorization"), "Bearer given");
 }
 
 TEST(Configuration, AnotherSetCookieValueTurnsAutoLoginOffAgain)

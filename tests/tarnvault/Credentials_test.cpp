@@ -49,7 +49,10 @@ OvraCredentials Credentials(const char* access, const char* refresh, const char*
     return credentials;
 }
 
-UTF16String Domain(const char16_t* kind) { return UTF16String(u"Co App 9.0 OVRA ") + kind; }
+UTF16String Domain(const char16_t* kind)
+{
+    return UTF16String(u"Co App 9.0 OVRA ") + kind;
+}
 
 class CredentialsTest : public ::testing::Test {
 protected:
@@ -81,8 +84,7 @@ TEST_F(CredentialsTest, SetCredentialsStoresThemAndProvesTheStoredToken)
     EXPECT_TRUE(mClient->SetCredentials(states.Callback(), Credentials("acc-1", "ref-1", "user-7")));
     ASSERT_TRUE(states.Wait());
     EXPECT_EQ(states.Seen(), StateList{SyncServer_Connected});
-    EXPECT_EQ(mService.Request(0).mTarget, "/api/collections?name=client-1");
-    EXPECT_EQ(mService.Request(0).Header("Authorization"), "Bearer acc-1");
+    EXPECT_EQ(mService.Find("GET", "/api/collections?name=client-1").Header("Authorization"), "Bearer acc-1");
     EXPECT_EQ(ReadFileBytes(mPrefs.Path() / "tarnvaultuser.txt"), R"({"mUserID":"user-7"})");
     EXPECT_EQ(tolmocore::Keychain::GetPassword(Domain(u"Access"), u"user-7"), UTF16String(u"acc-1"));
     EXPECT_EQ(tolmocore::Keychain::GetPassword(Domain(u"Refresh"), u"user-7"), UTF16String(u"ref-1"));
@@ -155,7 +157,7 @@ TEST_F(CredentialsTest, AStoredTokenMakesAClientWithoutOneUsable)
     Outcome outcome;
     mClient->SearchAsync(outcome.Assets(), outcome.Error(), SearchQuery(), Guid::CreateUnique());
     ASSERT_TRUE(outcome.Wait());
-    EXPECT_EQ(mService.Request(1).Header("Authorization"), "Bearer stored");
+    EXPECT_EQ(mService.Find("POST", "/api/search?").Header("Authorization"), "Bearer stored");
 }
 
 TEST_F(CredentialsTest, RejectedTokenFailsAndStaysStoredForTheNextCheck)

@@ -27,7 +27,11 @@ protected:
         mService.Script(200, CollectionJSON("pref1", "new", kPreferencesMedia));
         mService.Script(200, "");
     }
-    std::string SearchOf(size_t index) { return Decode(mService.Request(index).mTarget); }
+    // The decoded target of the first search holding `part`; empty if none.
+    std::string SearchFor(const std::string& part)
+    {
+        return Decode(mService.Find("POST", "/api/search?", part).mTarget);
+    }
 
     ScriptedService mService;
 };
@@ -85,14 +89,13 @@ TEST_F(MigrationTest, BothFormsOnAnX0VersionCopyTheX5TreeWithNamesRenamed)
 
     const auto requests = mService.Requests();
     ASSERT_EQ(requests.size(), 11u);
-    EXPECT_NE(SearchOf(5).find(R"("name":"A_B_8.5")"), std::string::npos);
-    EXPECT_NE(SearchOf(5).find(R"(scope=["/collections/root1"])"), std::string::npos);
-    EXPECT_NE(SearchOf(6).find(R"(scope=["/collections/old"])"), std::string::npos);
-    EXPECT_EQ(requests[7].mTarget, "/api/assets/i1");
-    EXPECT_EQ(Decode(requests[9].mTarget),
-              R"(/api/assets?name=theme_9.0.json&collections=["/api/collections/pref1"])");
-    EXPECT_EQ(requests[9].Header("Content-Type"), "application/json");
-    EXPECT_EQ(requests[9].mBody, "content");
+    EXPECT_NE(SearchFor(R"("name":"A_B_8.5")").find(R"(scope=["/collections/root1"])"), std::string::npos);
+    EXPECT_FALSE(SearchFor(R"(scope=["/collections/old"])").empty());
+    EXPECT_EQ(mService.Find("GET", "/api/assets/i1").mTarget, "/api/assets/i1");
+    const HttpRequest upload = mService.Find("POST", "/api/assets?");
+    EXPECT_EQ(Decode(upload.mTarget), R"(/api/assets?name=theme_9.0.json&collections=["/api/collections/pref1"])");
+    EXPECT_EQ(upload.Header("Content-Type"), "application/json");
+    EXPECT_EQ(upload.mBody, "content");
     for (const HttpRequest& request : requests) EXPECT_NE(request.mMethod, "DELETE");
 }
 
@@ -107,7 +110,7 @@ TEST_F(MigrationTest, PreviousMajorFormLooksForX0AndANothingFoundDeliversTheNewR
     ASSERT_TRUE(outcome.Wait());
     ASSERT_TRUE(outcome.Succeeded());
     EXPECT_EQ(outcome.AssetSeen()->mId, "pref1");
-    EXPECT_NE(SearchOf(5).find(R"("name":"A_B_8.0")"), std::string::npos);
+    EXPECT_FALSE(SearchFor(R"("name":"A_B_8.0")").empty());
     EXPECT_EQ(mService.Requests().size(), 6u);
 }
 
@@ -121,7 +124,7 @@ TEST_F(MigrationTest, FailuresAfterTheNewRootAreIgnored)
     client->GetPreferencesRootAsync(outcome.CollectionDone(), outcome.Error(), Guid::CreateUnique());
     ASSERT_TRUE(outcome.Wait());
     ASSERT_TRUE(outcome.Succeeded());
-    EXPECT_NE(SearchOf(5).find(R"("name":"A_B_9.1")"), std::string::npos);
+    EXPECT_FALSE(SearchFor(R"("name":"A_B_9.1")").empty());
 }
 
 TEST_F(MigrationTest, OldHostVersionsSearchBelowTheOlderClientIdentifiersRoot)
@@ -135,9 +138,8 @@ TEST_F(MigrationTest, OldHostVersionsSearchBelowTheOlderClientIdentifiersRoot)
     client->GetPreferencesRootAsync(outcome.CollectionDone(), outcome.Error(), Guid::CreateUnique());
     ASSERT_TRUE(outcome.Wait());
     ASSERT_TRUE(outcome.Succeeded());
-    EXPECT_EQ(mService.Request(5).mTarget, "/api/collections?name=5d26c4f8-0ae1-47b3-9c15-c3e7b0926d41");
-    EXPECT_NE(SearchOf(6).find(R"("name":"A_Cinderal_8.0")"), std::string::npos);
-    EXPECT_NE(SearchOf(6).find(R"(scope=["/collections/oldroot"])"), std::string::npos);
+    EXPECT_EQ(mService.Find("GET", "/api/collections?name=5d26c4f8-0ae1-47b3-9c15-c3e7b0926d41").mMethod, "GET");
+    EXPECT_NE(SearchFor(R"("name":"A_Cinderal_8.0")").find(R"(scope=["/collections/oldroot"])"), std::string::npos);
     // The older root is not cached in place of ours.
     EXPECT_EQ(client->CachedRoot()->mId, "root1");
 }
@@ -164,6 +166,5 @@ TEST_F(MigrationTest, CinderalAboveX0SearchesBelowTheClientRoot)
     client->GetPreferencesRootAsync(outcome.CollectionDone(), outcome.Error(), Guid::CreateUnique());
     ASSERT_TRUE(outcome.Wait());
     ASSERT_TRUE(outcome.Succeeded());
-    EXPECT_NE(SearchOf(5).find(R"("name":"A_Cinderal_8.5")"), std::string::npos);
-    EXPECT_NE(SearchOf(5).find(R"(scope=["/collections/root1"])"), std::string::npos);
+    EXPECT_NE(SearchFor(R"("name":"A_Cinderal_8.5")").find(R"(scope=["/collections/root1"])"), std::string::npos);
 }

@@ -20,8 +20,7 @@ TEST_F(ClientTest, RootIsAskedForByNameOnceAndThenCached)
     const Guid id = Guid::CreateUnique();
     EXPECT_EQ(mClient->GetRootAsync(first.CollectionDone(), first.Error(), id), id);
     ASSERT_TRUE(first.Wait());
-    const HttpRequest request = mService.Request(0);
-    EXPECT_EQ(request.mMethod, "GET");
+    const HttpRequest request = mService.Find("GET", "/api/collections?name=client-1");
     EXPECT_EQ(request.mTarget, "/api/collections?name=client-1");
     ExpectAuthorised(request, id);
     ASSERT_TRUE(first.Succeeded());
@@ -86,8 +85,7 @@ TEST(UserRoot, WithoutClientIdentifierEveryCallSearchesByTypeAndCachesNothing)
         ASSERT_TRUE(outcome.Wait());
     }
     ASSERT_EQ(service.Requests().size(), 4u);
-    EXPECT_EQ(service.Request(0).mMethod, "POST");
-    EXPECT_NE(Decode(service.Request(0).mTarget).find(std::string(R"("type":")") + kRootMedia), std::string::npos);
+    EXPECT_EQ(service.Find("POST", "/api/search?", std::string(R"("type":")") + kRootMedia).mMethod, "POST");
     EXPECT_TRUE(outcomes[0].Succeeded());
     EXPECT_TRUE(outcomes[1].Succeeded());
     EXPECT_EQ(outcomes[2].ErrorText(), "GetRoot missing or too many root");
@@ -117,14 +115,13 @@ TEST_F(ClientTest, PreferencesRootIsMadeOnFirstUseUnderAChainIdentifier)
     ASSERT_TRUE(outcome.Wait());
     const auto requests = mService.Requests();
     ASSERT_EQ(requests.size(), 5u);
-    EXPECT_EQ(requests[0].mTarget, "/api/collections?name=client-1");
-    const std::string search = Decode(requests[1].mTarget);
-    EXPECT_NE(search.find(R"("name":"A_B_9.0")"), std::string::npos);
-    EXPECT_NE(search.find(R"(scope=["/collections/root1"])"), std::string::npos);
-    EXPECT_EQ(requests[2].mBody, std::string(R"({"header":{"name":"A_B_9.0","type":")") + kPreferencesMedia + "\"}}");
-    EXPECT_EQ(requests[3].mTarget, "/api/collections/pref1/header");
-    EXPECT_EQ(requests[4].mTarget, "/api/collections/root1/members");
-    EXPECT_EQ(requests[4].mBody, R"(["/collections/pref1"])");
+    EXPECT_EQ(mService.Find("GET", "/api/collections?name=client-1").mMethod, "GET");
+    EXPECT_EQ(mService.Find("POST", "/api/search?", R"("name":"A_B_9.0")").mMethod, "POST");
+    EXPECT_EQ(mService.Find("POST", "/api/search?", R"(scope=["/collections/root1"])").mMethod, "POST");
+    EXPECT_EQ(mService.Find("POST", "/api/collections").mBody,
+              std::string(R"({"header":{"name":"A_B_9.0","type":")") + kPreferencesMedia + "\"}}");
+    EXPECT_EQ(mService.Find("GET", "/api/collections/pref1/header").mMethod, "GET");
+    EXPECT_EQ(mService.Find("PUT", "/api/collections/root1/members").mBody, R"(["/collections/pref1"])");
     for (const HttpRequest& request : requests) ExpectAuthorised(request, chain);
     ASSERT_TRUE(outcome.Succeeded());
     EXPECT_EQ(outcome.Id(), chain);
