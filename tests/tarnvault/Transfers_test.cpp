@@ -1,5 +1,6 @@
 // Upload (search, deletes, post, metadata) and conditional download.
 
+#include <functional>
 #include <set>
 
 #include "ClientTestSupport.h"
@@ -179,52 +180,54 @@ TEST_F(TransferTest, DownloadWithoutEtagSendsNoConditionAndTakesAnEmptyBody)
     EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "");
 }
 
-TEST_F(TransferTest, DownloadUnchangedOrRefusedLeavesTheFileAlone)
+TEST_F(TransferTest, DownloadUnchangedLeavesTheFileAlone)
 {
-    WriteFileBytes(mDir / "kept.txt", "old");
     mService.Script(304, "");
-    mService.Script(404, "no such asset");
-    Outcome unchanged, refused;
+    Outcome unchanged;
     mClient->DownloadAsync(unchanged.Downloaded(), unchanged.Error(), MakeItem("i1"), FileAt(mDir / "new.txt"), "e",
                            Guid::CreateUnique());
     ASSERT_TRUE(unchanged.Wait());
-    mClient->DownloadAsync(refused.Downloaded(), refused.Error(), MakeItem("i1"), FileAt(mDir / "kept.txt"), "",
-                           Guid::CreateUnique());
-    ASSERT_TRUE(refused.Wait());
     ASSERT_TRUE(unchanged.Succeeded());
     EXPECT_FALSE(unchanged.DownloadSeen().mDownloaded);
     EXPECT_TRUE(unchanged.DownloadSeen().mEtag.empty());
     EXPECT_FALSE(std::filesystem::exists(mDir / "new.txt"));
-    EXPECT_EQ(refused.Status(), 404);
-    EXPECT_EQ(refused.ErrorText(), "no such asset");
-    EXPECT_EQ(ReadFileBytes(mDir / "kept.txt"), "old");
 }
 
-TEST_F(TransferTest, DownloadIntoAMissingDirectoryFailsWithoutAFile)
+// Each failure reaches the error callback and leaves the target as it was.
+TEST_F(TransferTest, DownloadFailuresLeaveTheFileAsItWas)
 {
-    mService.Script(200, "content");
-    Outcome outcome;
-    mClient->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i1"), FileAt(mDir / "no" / "f.txt"), "",
-                           Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_FALSE(outcome.Succeeded());
-    EXPECT_EQ(outcome.Status(), -100);
-    EXPECT_FALSE(outcome.ErrorText().empty());
-    EXPECT_FALSE(std::filesystem::exists(mDir / "no" / "f.txt"));
-}
-
-TEST_F(TransferTest, DownloadCutOffMidBodyFailsWithoutTouchingTheFile)
-{
-    WriteFileBytes(mDir / "f.txt", "old");
-    mService.ScriptHangUp(std::string(100000, 'x'));
-    Outcome outcome;
-    mClient->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i1"), FileAt(mDir / "f.txt"), "",
-                           Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_FALSE(outcome.Succeeded());
-    EXPECT_EQ(outcome.Status(), -100);
-    EXPECT_FALSE(outcome.ErrorText().empty());
-    EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "old");
+    WriteFileBytes(mDir / "kept.txt", "old");
+    const struct {
+        const char* mWhat;
+        std::function<void()> mScript;
+        std::filesystem::path mTarget;
+        int mStatus;
+        const char* mText;  // null: any text but an empty one
+    } cases[] = {
+        {"refused", [&] { mService.Script(404, "no such asset"); }, mDir / "kept.txt", 404, "no such asset"},
+        {"cut off mid-body", [&] { mService.ScriptHangUp(std::string(100000, 'x')); }, mDir / "kept.txt", -100,
+         nullptr},
+        {"into a missing directory", [&] { mService.Script(200, "content"); }, mDir / "no" / "f.txt", -100, nullptr},
+    };
+    for (const auto& failure : cases) {
+        SCOPED_TRACE(failure.mWhat);
+        const bool existed = std::filesystem::exists(failure.mTarget);
+        failure.mScript();
+        Outcome outcome;
+        mClient->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i1"), FileAt(failure.mTarget), "",
+                               Guid::CreateUnique());
+        ASSERT_TRUE(outcome.Wait());
+        EXPECT_FALSE(outcome.Succeeded());
+        EXPECT_EQ(outcome.Status(), failure.mStatus);
+        if (failure.mText)
+            EXPECT_EQ(outcome.ErrorText(), failure.mText);
+        else
+            EXPECT_FALSE(outcome.ErrorText().empty());
+        if (existed)
+            EXPECT_EQ(ReadFileBytes(failure.mTarget), "old");
+        else
+            EXPECT_FALSE(std::filesystem::exists(failure.mTarget));
+    }
 }
 
 TEST_F(TransferTest, DownloadReachingItsLimitFailsAndRemovesItsFile)
