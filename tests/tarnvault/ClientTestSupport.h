@@ -64,8 +64,7 @@ public:
         answer.mStatus = status;
         answer.mBody = body;
         answer.mHeaders = headers;
-        std::lock_guard<std::mutex> lock(mMutex);
-        mAnswers.push_back(answer);
+        Push(answer);
     }
     // A 200 with a body that the server cuts off half way.
     void ScriptHangUp(const std::string& body)
@@ -73,8 +72,7 @@ public:
         HttpAnswer answer;
         answer.mBody = body;
         answer.mFault = HttpAnswer::Fault_HangUpMidBody;
-        std::lock_guard<std::mutex> lock(mMutex);
-        mAnswers.push_back(answer);
+        Push(answer);
     }
     // `prefix` and then `fillBytes` spaces, made as they go out.
     void ScriptLarge(const std::string& prefix, size_t fillBytes, int status = 200)
@@ -83,6 +81,10 @@ public:
         answer.mStatus = status;
         answer.mBody = prefix;
         answer.mFillBytes = fillBytes;
+        Push(answer);
+    }
+    void Push(const HttpAnswer& answer)
+    {
         std::lock_guard<std::mutex> lock(mMutex);
         mAnswers.push_back(answer);
     }
