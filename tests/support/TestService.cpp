@@ -1,0 +1,39 @@
+#include "support/TestService.h"
+
+namespace testsupport {
+
+using tolmonetsync::server::LocalService;
+using tolmonetsync::server::LocalServiceOptions;
+
+const char kAliceToken[] = "alice-token_0123456789";
+const char kBobToken[] = "bob-token_9876543210";
+
+LocalServiceOptions TestService::DefaultOptions(const std::filesystem::path& root)
+{
+    LocalServiceOptions options;
+    options.mDataDirectory = (root / "data").string();
+    options.mTokens.push_back({"alice", kAliceToken});
+    options.mTokens.push_back({"bob", kBobToken});
+    return options;
+}
+
+TestService::TestService(const Customise& customise) : mOptions(DefaultOptions(mRoot.Path()))
+{
+    if (customise)
+        customise(mOptions);
+    mDataDirectory = mOptions.mDataDirectory;
+    Restart();
+}
+
+TestService::~TestService() { Stop(); }
+
+void TestService::Stop() { mService.reset(); }
+
+void TestService::Restart()
+{
+    Stop();
+    mService = std::make_unique<LocalService>(mOptions);
+    mService->Start();
+}
+
+}  // namespace testsupport
