@@ -4,22 +4,7 @@ namespace modeltest {
 
 using namespace tolmonetsync;
 
-namespace {
-
 enum class State { Current, Push, Pull };
-
-// The record's own verdict: with no history on either side, the file's
-// presence decides; then a local change pushes; then the mode.
-State StateOf(const CachedEntry& cached, bool onServer, bool existsNow, bool changed, bool sameServerDate,
-              SyncMode mode)
-{
-    if (cached.mServerDate.empty() || !onServer) return existsNow ? State::Push : State::Pull;
-    if (changed) return State::Push;
-    if (mode == SyncMode_LocalWins) return sameServerDate ? State::Current : State::Pull;
-    return State::Pull;
-}
-
-}  // namespace
 
 Outcome Predict(const World& world, SyncMode mode, bool checksums)
 {
@@ -52,8 +37,15 @@ Outcome Predict(const World& world, SyncMode mode, bool checksums)
         if (fromFolder && world.mCache.count(name) != 0) record = world.mCache.at(name);
         const bool changed = byChecksum ? record.mLocalChecksum != planned->second.mBytes
                                         : fromFolder && record.mLocalModified != planned->second.mModified;
-        const State state =
-            StateOf(record, onServer, existsNow, changed, onServer && record.mServerDate == remote->second.mEtag, mode);
+        // With no history on one side the file's presence decides; then a
+        // local change pushes; then the mode.
+        State state = State::Pull;
+        if (record.mServerDate.empty() || !onServer)
+            state = existsNow ? State::Push : State::Pull;
+        else if (changed)
+            state = State::Push;
+        else if (mode == SyncMode_LocalWins && record.mServerDate == remote->second.mEtag)
+            state = State::Current;
         // What the plan read of the file is what the save keeps.
         record.mLocalModified.reset();
         record.mLocalChecksum.reset();

@@ -42,11 +42,8 @@ struct World {
 };
 
 struct Outcome {
-    std::map<std::string, std::string> mLocal;
-    std::map<std::string, std::string> mRemote;
-    std::map<std::string, std::string> mBackups;  // this run's copies by name
-    std::set<std::string> mUploaded;
-    std::set<std::string> mDownloaded;
+    std::map<std::string, std::string> mLocal, mRemote, mBackups;  // bytes by name; backups of this run
+    std::set<std::string> mUploaded, mDownloaded;
     // The next cache file. Uploaded names take the new tag, and names in
     // mFreshDates the downloaded file's date, once the sync has happened.
     std::map<std::string, CachedEntry> mCache;
