@@ -8,13 +8,14 @@
 #include <climits>
 #include <cstdlib>
 
-#include "IdentityService.h"
 #include "foundation/net/HeaderConstants.h"
 #include "server/FaultHooks.h"
+#include "support/IdentityService.h"
 
 namespace {
 
-using namespace idtest;
+using namespace testsupport;
+using namespace tolmonetsync;
 
 bool sProcessUsed = false;
 
