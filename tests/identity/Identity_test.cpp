@@ -123,61 +123,36 @@ TEST(IdentityCalls, UnreadableAnswersReachTheHandlerOnce)
 
 // --- a host's stored sign-in ---
 
-TEST(StoredSignIn, SurvivesANewClientObjectIsProvedAndForgottenOnLogout)
+TEST(StoredSignIn, SurvivesANewClientFailsOnceWithdrawnIsRefreshedAndForgottenOnLogout)
 {
     PrefDirScope prefs;
     IdentityService service;
     const Answered signedIn = SignIn("ann", "secret");
     ASSERT_EQ(signedIn.Status(), 200);
     EXPECT_EQ(SetCredentials(service.Client(), CredentialsOf(signedIn.mAnswer)), SyncServer_Connected);
+    auto check = [](const boost::shared_ptr<tarnvault::Tarnvault>& client) {
+        return WaitForState([&](const ConnectionStateCallback& report) { return client->CheckConnection(report); });
+    };
 
     const auto restarted = service.Client();  // as after a restart of the host
-    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return restarted->CheckConnection(report); }),
-              SyncServer_Connected);
+    EXPECT_EQ(check(restarted), SyncServer_Connected);
+    EXPECT_EQ(RootStatus(restarted), 200);
+
+    // The service withdraws the token: the check fails until the host refreshes.
+    service.Service().GetAccounts().ExpireTokensOf("ann");
+    EXPECT_EQ(check(restarted), SyncServer_ConnectionFailed);
+    std::string refusal;
+    EXPECT_EQ(RootStatus(restarted, &refusal), 401);
+    EXPECT_NE(refusal.find("missing or unknown access token"), std::string::npos) << refusal;
+    const Answered refreshed = Refresh(S(signedIn.mAnswer.refresh_token));
+    ASSERT_EQ(refreshed.Status(), 200);
+    EXPECT_EQ(SetCredentials(restarted, CredentialsOf(refreshed.mAnswer)), SyncServer_Connected);
     EXPECT_EQ(RootStatus(restarted), 200);
 
     // Logging out clears the stored tokens, not only this object's.
     EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return restarted->Logout(report); }),
               SyncServer_NotLoggedIn);
-    const auto later = service.Client();
-    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return later->CheckConnection(report); }),
-              SyncServer_NotLoggedIn);
-}
-
-TEST(StoredSignIn, AWithdrawnTokenFailsUntilTheHostRefreshesIt)
-{
-    const std::vector<std::pair<const char*, std::function<void(IdentityService&, const OvraResponse&)> > > cases = {
-        {"expired",
-         [](IdentityService& service, const OvraResponse&) { service.Service().GetAccounts().ExpireTokensOf("ann"); }},
-        {"signed out", [](IdentityService&, const OvraResponse& tokens) { SignOut(S(tokens.device_token)); }},
-    };
-    for (const auto& withdraw : cases) {
-        SCOPED_TRACE(withdraw.first);
-        PrefDirScope prefs;
-        IdentityService service;
-        const Answered signedIn = SignIn("ann", "secret");
-        ASSERT_EQ(signedIn.Status(), 200);
-        const auto client = service.Client();
-        ASSERT_EQ(SetCredentials(client, CredentialsOf(signedIn.mAnswer)), SyncServer_Connected);
-
-        withdraw.second(service, signedIn.mAnswer);
-        EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return client->CheckConnection(report); }),
-                  SyncServer_ConnectionFailed);
-        std::string refusal;
-        EXPECT_EQ(RootStatus(client, &refusal), 401);
-        EXPECT_NE(refusal.find("missing or unknown access token"), std::string::npos) << refusal;
-    }
-
-    // The refresh token outlives the expired access token.
-    PrefDirScope prefs;
-    IdentityService service;
-    const Answered signedIn = SignIn("ann", "secret");
-    service.Service().GetAccounts().ExpireTokensOf("ann");
-    const Answered refreshed = Refresh(S(signedIn.mAnswer.refresh_token));
-    ASSERT_EQ(refreshed.Status(), 200);
-    const auto client = service.Client();
-    EXPECT_EQ(SetCredentials(client, CredentialsOf(refreshed.mAnswer)), SyncServer_Connected);
-    EXPECT_EQ(RootStatus(client), 200);
+    EXPECT_EQ(check(service.Client()), SyncServer_NotLoggedIn);
 }
 
 }  // namespace

@@ -2,7 +2,6 @@
 
 #include <dlfcn.h>
 
-#include <chrono>
 #include <stdexcept>
 #include <vector>
 
@@ -27,7 +26,6 @@ FakeOvraLibrary::FakeOvraLibrary(const std::string& path)
     Take(mHandle, "FakeOvra_SetStatus", mSetStatus);
     Take(mHandle, "FakeOvra_SetCallbackStatus", mSetCallbackStatus);
     Take(mHandle, "FakeOvra_SetText", mSetText);
-    Take(mHandle, "FakeOvra_SetCallbackDelay", mSetCallbackDelay);
     Take(mHandle, "FakeOvra_HoldCallbacks", mHoldCallbacks);
     Take(mHandle, "FakeOvra_WaitUntilIdle", mWaitUntilIdle);
     Take(mHandle, "FakeOvra_CallCount", mCallCount);
@@ -48,32 +46,11 @@ boost::shared_ptr<tolmonetsync::OvraConnection> Connect(const std::string& path)
     return boost::shared_ptr<tolmonetsync::OvraConnection>(new tolmonetsync::OvraConnection(path));
 }
 
-tolmonetsync::OvraAsyncCompletionFunction CompletionRecorder::Function(const std::string& name)
+tolmonetsync::OvraAsyncCompletionFunction Completion(const Completions& completions, const std::string& name)
 {
-    return [this, name](OVRA_STATUS status, const char* text) {
-        std::lock_guard<std::mutex> lock(mMutex);
-        ++mCalls;
-        mLog += name + " " + std::to_string(status) + " " + (text != nullptr ? text : "(null)") + "\n";
-        mCame.notify_all();
+    return [completions, name](OVRA_STATUS status, const char* text) {
+        completions.Add(name + " " + std::to_string(status) + " " + (text != nullptr ? text : "(null)"));
     };
-}
-
-bool CompletionRecorder::WaitForCalls(int count)
-{
-    std::unique_lock<std::mutex> lock(mMutex);
-    return mCame.wait_for(lock, std::chrono::seconds(30), [&] { return mCalls >= count; });
-}
-
-int CompletionRecorder::Calls()
-{
-    std::lock_guard<std::mutex> lock(mMutex);
-    return mCalls;
-}
-
-std::string CompletionRecorder::Log()
-{
-    std::lock_guard<std::mutex> lock(mMutex);
-    return mLog;
 }
 
 }  // namespace nativetest

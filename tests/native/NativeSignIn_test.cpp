@@ -5,7 +5,7 @@
 #include <gtest/gtest.h>
 
 #include "FakeOvraLibrary.h"
-#include "IdentityService.h"
+#include "support/IdentityService.h"
 #include "support/TestScopes.h"
 
 namespace {
@@ -16,8 +16,8 @@ using tolmonetsync::OvraConnection;
 TEST(NativeSignIn, TheLibrarysTokenOpensTheAssetService)
 {
     testsupport::PrefDirScope prefs;
-    idtest::IdentityService service;
-    const idtest::Answered signedIn = service.SignIn("ann", "secret");
+    testsupport::IdentityService service;
+    const testsupport::Answered signedIn = testsupport::SignIn("ann", "secret");
     ASSERT_EQ(signedIn.Status(), 200);
     const std::string token = signedIn.mAnswer.access_token.ToStdString();
 
@@ -25,9 +25,10 @@ TEST(NativeSignIn, TheLibrarysTokenOpensTheAssetService)
     fake.SetText("OVRA_fetchDefaultUserInfoForClientId", "<UserInfo><UserID>ann</UserID></UserInfo>");
     fake.SetText("OVRA_fetchAccessToken",
                  ("{\"access_token\": \"" + token + "\", \"email\": \"ann@example.test\"}").c_str());
-    fake.SetCallbackDelay(20);  // the answer comes after the call has returned
+    fake.HoldCallbacks(true);  // the answer comes after the call has returned
     auto connection = Connect(FAKE_OVRA_LIB);
     ASSERT_TRUE(connection->GetUserInfoAndFetchToken(true, UTF8String(), UTF8String(), UTF8String(), UTF8String()));
+    fake.HoldCallbacks(false);
     ASSERT_TRUE(fake.WaitUntilIdle());
     ASSERT_EQ(connection->GetFetchState(), OvraConnection::kFetchState_Received);
 
@@ -35,11 +36,8 @@ TEST(NativeSignIn, TheLibrarysTokenOpensTheAssetService)
     credentials.accessToken = connection->GetAccessToken();
     credentials.userID = connection->GetEmail();
     const auto client = service.Client();
-    EXPECT_EQ(idtest::WaitForState([&](const tolmonetsync::ConnectionStateCallback& report) {
-                  return client->SetCredentials(report, credentials);
-              }),
-              tolmonetsync::SyncServer_Connected);
-    EXPECT_EQ(idtest::RootStatus(client), 200);
+    EXPECT_EQ(testsupport::SetCredentials(client, credentials), tolmonetsync::SyncServer_Connected);
+    EXPECT_EQ(testsupport::RootStatus(client), 200);
 
     // A token the service never gave is refused the same way.
     auto stranger = Connect(FAKE_OVRA_LIB);
@@ -48,11 +46,8 @@ TEST(NativeSignIn, TheLibrarysTokenOpensTheAssetService)
     ASSERT_TRUE(fake.WaitUntilIdle());
     credentials.accessToken = stranger->GetAccessToken();
     const auto refused = service.Client();
-    EXPECT_EQ(idtest::WaitForState([&](const tolmonetsync::ConnectionStateCallback& report) {
-                  return refused->SetCredentials(report, credentials);
-              }),
-              tolmonetsync::SyncServer_ConnectionFailed);
-    EXPECT_EQ(idtest::RootStatus(refused), 401);
+    EXPECT_EQ(testsupport::SetCredentials(refused, credentials), tolmonetsync::SyncServer_ConnectionFailed);
+    EXPECT_EQ(testsupport::RootStatus(refused), 401);
 }
 
 }  // namespace

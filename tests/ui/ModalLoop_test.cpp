@@ -1,5 +1,5 @@
-// The headless UI's own behaviour that dialogs rely on: the modal loop
-// (closing from another thread, nesting), buttons and the OK hook.
+// The headless UI's modal loop that dialogs rely on: closing from another
+// thread, and nesting.
 
 #include <gtest/gtest.h>
 
@@ -13,12 +13,12 @@ namespace {
 using namespace tolmoui;
 
 const int kWaitMs = 30000;
-const int kOkAndCancel = UI_MessageBox::kMessageBoxButton_OK | UI_MessageBox::kMessageBoxButton_Cancel;
 
 boost::intrusive_ptr<UI_MessageBox> MakeBox()
 {
-    return new UI_MessageBox(nullptr, UTF16String(u"Title"), UTF16String(u"Message"), kOkAndCancel, kDialogResponse_OK,
-                             3, nullptr, 0, 0, 0, nullptr);
+    return new UI_MessageBox(nullptr, UTF16String(u"Title"), UTF16String(u"Message"),
+                             UI_MessageBox::kMessageBoxButton_OK | UI_MessageBox::kMessageBoxButton_Cancel,
+                             kDialogResponse_OK, 3, nullptr, 0, 0, 0, nullptr);
 }
 
 // Runs a dialog's modal loop on a thread of its own.
@@ -57,18 +57,6 @@ TEST_F(ModalLoop, PostCloseFromAnotherThreadEndsRunModal)
     EXPECT_FALSE(box->IsInModalLoop());
 }
 
-TEST_F(ModalLoop, APostCloseBeforeTheLoopEndsTheNextLoopAtOnce)
-{
-    auto box = MakeBox();
-    box->PostClose();
-    EXPECT_EQ(box->RunModal(), kDialogResponse_None);
-    // Consumed: a later loop runs until closed again.
-    LoopThread loop(box);
-    ASSERT_EQ(WaitForModalDialog(kWaitMs), box);
-    ASSERT_TRUE(RunInModalLoop([&] { box->HandleCloseBox(); }, kWaitMs));
-    EXPECT_EQ(loop.Join(), kDialogResponse_Cancel);
-}
-
 TEST_F(ModalLoop, NestedLoopsTakeActionsInnermostFirst)
 {
     auto outer = MakeBox();
@@ -85,54 +73,6 @@ TEST_F(ModalLoop, NestedLoopsTakeActionsInnermostFirst)
     ASSERT_EQ(WaitForModalDialog(kWaitMs), outer);
     ASSERT_TRUE(RunInModalLoop([&] { outer->HandleCloseBox(); }, kWaitMs));
     EXPECT_EQ(loop.Join(), kDialogResponse_Cancel);
-}
-
-class DialogButtons : public ::testing::Test {};
-
-TEST_F(DialogButtons, ADisabledButtonCannotBePressed)
-{
-    auto box = MakeBox();
-    box->GetSpecificButton(kDialogResponse_OK)->SetDisabled(true);
-    LoopThread loop(box);
-    ASSERT_TRUE(RunInModalLoop(
-        [&] {
-            EXPECT_FALSE(box->HandleButtonClick(kDialogResponse_OK));
-            EXPECT_FALSE(box->HandleButtonClick(7));  // no such button
-            box->GetSpecificButton(kDialogResponse_OK)->SetDisabled(false);
-            EXPECT_TRUE(box->HandleButtonClick(kDialogResponse_OK));
-        },
-        kWaitMs));
-    EXPECT_EQ(loop.Join(), kDialogResponse_OK);
-}
-
-TEST_F(DialogButtons, OKGoesThroughTheHookAndCancelDoesNot)
-{
-    auto box = MakeBox();
-    int asked = 0;
-    bool accept = false;
-    box->SetOkHook([&] {
-        ++asked;
-        return accept;
-    });
-    box->SetOkButton(box->GetSpecificButton(kDialogResponse_OK));
-    LoopThread loop(box);
-    ASSERT_TRUE(RunInModalLoop([&] { EXPECT_TRUE(box->HandleButtonClick(kDialogResponse_OK)); }, kWaitMs));
-    ASSERT_TRUE(RunInModalLoop(
-        [&] {
-            EXPECT_EQ(asked, 1);
-            EXPECT_TRUE(box->IsInModalLoop());
-            accept = true;
-            box->HandleButtonClick(kDialogResponse_OK);
-        },
-        kWaitMs));
-    EXPECT_EQ(loop.Join(), kDialogResponse_OK);
-    EXPECT_EQ(asked, 2);
-
-    LoopThread again(box);
-    accept = false;
-    ASSERT_TRUE(RunInModalLoop([&] { box->HandleButtonClick(kDialogResponse_Cancel); }, kWaitMs));
-    EXPECT_EQ(again.Join(), kDialogResponse_Cancel);
-    EXPECT_EQ(asked, 2);
 }
 
 }  // namespace
