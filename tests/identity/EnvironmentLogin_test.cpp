@@ -8,7 +8,6 @@
 #include <climits>
 #include <cstdlib>
 
-#include "foundation/net/HeaderConstants.h"
 #include "server/FaultHooks.h"
 #include "support/IdentityService.h"
 
@@ -42,25 +41,14 @@ protected:
         counter.mNth = INT_MAX;
         return service.Service().Faults().Install(counter);
     }
-    boost::shared_ptr<tarnvault::Tarnvault> AutoClient(IdentityService& service)
-    {
-        ParameterList parameters;
-        const std::string url = service.AssetUrl();
-        parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(url.begin(), url.end()));
-        parameters.emplace_back(tolmonet::kHEADER_USER_AGENT,
-                                UTF8String(reinterpret_cast<const unsigned char*>("env")));
-        parameters.emplace_back(tolmonet::kHEADER_SET_COOKIE,
-                                UTF8String(reinterpret_cast<const unsigned char*>("auto")));
-        return boost::shared_ptr<tarnvault::Tarnvault>(new tarnvault::Tarnvault(parameters));
-    }
 };
 
 TEST_F(EnvironmentLogin, OneSignInServesEveryClientOfTheProcess)
 {
     IdentityService service;
     const auto signIns = CountSignIns(service);
-    const auto first = AutoClient(service);
-    const auto second = AutoClient(service);
+    const auto first = service.Client(true);
+    const auto second = service.Client(true);
     EXPECT_EQ(signIns->Seen(), 1);
     EXPECT_EQ(RootStatus(second), 200);
     // Such a client holds a working token, yet nothing is stored for a check.
@@ -72,9 +60,9 @@ TEST_F(EnvironmentLogin, SignsInAgainOnceTheServiceRefusesTheKeptToken)
 {
     IdentityService service;
     const auto signIns = CountSignIns(service);
-    AutoClient(service);
+    service.Client(true);
     service.Service().GetAccounts().ExpireTokensOf("ann");
-    const auto later = AutoClient(service);
+    const auto later = service.Client(true);
     EXPECT_EQ(signIns->Seen(), 2);
     EXPECT_EQ(RootStatus(later), 200);
 }
@@ -84,13 +72,13 @@ TEST_F(EnvironmentLogin, ARefusedSignInLeavesNoClient)
     IdentityService service;
     setenv("TOLMONETSYNC_PASSWORD", "wrong", 1);
     try {
-        AutoClient(service);
+        service.Client(true);
         FAIL() << "no exception";
     } catch (const std::runtime_error& e) {
         EXPECT_STREQ(e.what(), "doOvraLogin failed");
     }
     setenv("TOLMONETSYNC_PASSWORD", "secret", 1);  // the next try signs in
-    EXPECT_EQ(RootStatus(AutoClient(service)), 200);
+    EXPECT_EQ(RootStatus(service.Client(true)), 200);
 }
 
 }  // namespace

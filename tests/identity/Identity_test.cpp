@@ -129,7 +129,8 @@ TEST(StoredSignIn, SurvivesANewClientFailsOnceWithdrawnIsRefreshedAndForgottenOn
     IdentityService service;
     const Answered signedIn = SignIn("ann", "secret");
     ASSERT_EQ(signedIn.Status(), 200);
-    EXPECT_EQ(SetCredentials(service.Client(), CredentialsOf(signedIn.mAnswer)), SyncServer_Connected);
+    const auto client = service.Client();
+    EXPECT_EQ(SetCredentials(client, CredentialsOf(signedIn.mAnswer)), SyncServer_Connected);
     auto check = [](const boost::shared_ptr<tarnvault::Tarnvault>& client) {
         return WaitForState([&](const ConnectionStateCallback& report) { return client->CheckConnection(report); });
     };
@@ -140,17 +141,17 @@ TEST(StoredSignIn, SurvivesANewClientFailsOnceWithdrawnIsRefreshedAndForgottenOn
 
     // The service withdraws the token: the check fails until the host refreshes.
     service.Service().GetAccounts().ExpireTokensOf("ann");
-    EXPECT_EQ(check(restarted), SyncServer_ConnectionFailed);
+    EXPECT_EQ(check(client), SyncServer_ConnectionFailed);
     std::string refusal;
-    EXPECT_EQ(RootStatus(restarted, &refusal), 401);
+    EXPECT_EQ(RootStatus(client, &refusal), 401);
     EXPECT_NE(refusal.find("missing or unknown access token"), std::string::npos) << refusal;
     const Answered refreshed = Refresh(S(signedIn.mAnswer.refresh_token));
     ASSERT_EQ(refreshed.Status(), 200);
-    EXPECT_EQ(SetCredentials(restarted, CredentialsOf(refreshed.mAnswer)), SyncServer_Connected);
-    EXPECT_EQ(RootStatus(restarted), 200);
+    EXPECT_EQ(SetCredentials(client, CredentialsOf(refreshed.mAnswer)), SyncServer_Connected);
+    EXPECT_EQ(RootStatus(client), 200);
 
     // Logging out clears the stored tokens, not only this object's.
-    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return restarted->Logout(report); }),
+    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return client->Logout(report); }),
               SyncServer_NotLoggedIn);
     EXPECT_EQ(check(service.Client()), SyncServer_NotLoggedIn);
 }

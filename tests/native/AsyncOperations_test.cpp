@@ -20,7 +20,7 @@ const char kFetched[] = "{\"access_token\": \"tok-7\", \"email\": \"ann@example.
 
 class NativeOperations : public ::testing::Test {
 protected:
-    NativeOperations() : mFake(FAKE_OVRA_LIB), mConnection(Connect(FAKE_OVRA_LIB))
+    NativeOperations() : mFake(LoadFake(FAKE_OVRA_LIB)), mConnection(Connect(FAKE_OVRA_LIB))
     {
         mFake.SetText(kFetch, kFetched);
         mFake.SetText(kRevoke, "revoked");
@@ -32,7 +32,7 @@ protected:
         return mConnection->AsyncRevokeDeviceToken(true, Text("a"), Text("b"), Text("c"), Completion(mDone, name));
     }
 
-    FakeOvraLibrary mFake;
+    FakeOvraState& mFake;
     boost::shared_ptr<OvraConnection> mConnection;
     Completions mDone;
 };

@@ -1,7 +1,7 @@
 #pragma once
 // The tests' hold on a fake native identity library (tests/fixtures): the
-// same file the bridge loads, opened again with dlopen so that its control
-// functions script and inspect the very copy the bridge calls. Also
+// same file the bridge loads, opened again with dlopen so that the test
+// scripts and inspects the very state the bridge's copy uses. Also
 // completions that record their calls.
 //
 // The bridge loads its library once per process, so a test that needs
@@ -17,31 +17,8 @@
 
 namespace nativetest {
 
-class FakeOvraLibrary {
-public:
-    // Throws std::runtime_error if the file cannot be loaded.
-    explicit FakeOvraLibrary(const std::string& path);
-
-    void SetStatus(const char* function, int status) const { mSetStatus(function, status); }
-    void SetCallbackStatus(const char* function, int status) const { mSetCallbackStatus(function, status); }
-    void SetText(const char* function, const char* text) const { mSetText(function, text); }
-    void HoldCallbacks(bool hold) const { mHoldCallbacks(hold ? 1 : 0); }
-    // True once every queued callback has returned (30 s at most).
-    bool WaitUntilIdle() const { return mWaitUntilIdle(30000) != 0; }
-    int Calls(const char* function) const { return mCallCount(function); }
-    // Argument `index` of the function's last call; "<no call>" if none.
-    std::string Argument(const char* function, int index) const;
-
-private:
-    void* mHandle;
-    FakeOvra_SetStatus_Function mSetStatus;
-    FakeOvra_SetCallbackStatus_Function mSetCallbackStatus;
-    FakeOvra_SetText_Function mSetText;
-    FakeOvra_HoldCallbacks_Function mHoldCallbacks;
-    FakeOvra_WaitUntilIdle_Function mWaitUntilIdle;
-    FakeOvra_CallCount_Function mCallCount;
-    FakeOvra_CopyArgument_Function mCopyArgument;
-};
+// The state of the fake at `path`; throws std::runtime_error if it cannot be loaded.
+FakeOvraState& LoadFake(const std::string& path);
 
 // A connection as a host holds it, naming the library's path.
 boost::shared_ptr<tolmonetsync::OvraConnection> Connect(const std::string& path);

@@ -55,7 +55,7 @@ TEST(NativeLibraryMissing, EveryOperationFailsQuietly)
 
 TEST(NativeLibraryIncomplete, AMissingFunctionFailsItsOperationsAlone)
 {
-    FakeOvraLibrary fake(FAKE_OVRA_LIB_INCOMPLETE);
+    FakeOvraState& fake = LoadFake(FAKE_OVRA_LIB_INCOMPLETE);
     auto connection = Connect(FAKE_OVRA_LIB_INCOMPLETE);
     fake.SetText("OVRA_fetchDefaultUserInfoForClientId", "<UserID>u-1</UserID>");
     fake.SetText("OVRA_fetchAccounts", "[]");
@@ -80,7 +80,7 @@ TEST(NativeLibraryIncomplete, AMissingFunctionFailsItsOperationsAlone)
 
 TEST(NativeDeviceID, IsAskedForOncePerProcess)
 {
-    FakeOvraLibrary fake(FAKE_OVRA_LIB);
+    FakeOvraState& fake = LoadFake(FAKE_OVRA_LIB);
     fake.SetText("OVRA_getDeviceID", "dev-A");
     auto connection = Connect(FAKE_OVRA_LIB);
     EXPECT_EQ(connection->GetDeviceID(), Text("dev-A"));
@@ -94,24 +94,12 @@ TEST(NativeDeviceID, IsAskedForOncePerProcess)
     EXPECT_EQ(OvraConnection::InitializeDeviceID(), Text("dev-B"));
 }
 
-TEST(NativeDeviceID, AnEmptyFirstAnswerStaysEmpty)
-{
-    FakeOvraLibrary fake(FAKE_OVRA_LIB);
-    fake.SetText("OVRA_getDeviceID", "dev-A");
-    fake.SetStatus("OVRA_getDeviceID", 1);
-    auto connection = Connect(FAKE_OVRA_LIB);
-    EXPECT_TRUE(connection->GetDeviceID().empty());
-    fake.SetStatus("OVRA_getDeviceID", 0);
-    EXPECT_TRUE(connection->GetDeviceID().empty());
-    EXPECT_EQ(OvraConnection::InitializeDeviceID(), Text("dev-A"));
-}
-
 TEST(NativeLibraryPath, TheFirstConstructorsPathWins)
 {
     auto first = Connect(FAKE_OVRA_LIB);
     auto second = Connect("/nonexistent/OvraLib.dylib");
     EXPECT_EQ(sRecommendedOvraPath, FAKE_OVRA_LIB);
-    FakeOvraLibrary fake(FAKE_OVRA_LIB);
+    FakeOvraState& fake = LoadFake(FAKE_OVRA_LIB);
     fake.SetText("OVRA_fetchAccounts", "from the first path");
     EXPECT_EQ(second->FetchAccounts(true, Text("x")), Text("from the first path"));
     EXPECT_EQ(GetOvraLib().mLibrary, LoadedFrom(FAKE_OVRA_LIB));
@@ -127,7 +115,7 @@ TEST(NativeLibraryPath, WithoutAPathItIsFrameworksUnderTheApplicationDirectory)
     Dir::SetAppDir(Dir(tolmocore::utility::ToUTF16(app.Path().string())));
 
     auto connection = boost::shared_ptr<OvraConnection>(new OvraConnection());
-    FakeOvraLibrary fake(copy);
+    FakeOvraState& fake = LoadFake(copy);
     fake.SetText("OVRA_fetchAccounts", "from the application's copy");
     EXPECT_EQ(connection->FetchAccounts(true, Text("x")), Text("from the application's copy"));
     EXPECT_TRUE(sRecommendedOvraPath.empty());

@@ -21,7 +21,7 @@ TEST(NativeSignIn, TheLibrarysTokenOpensTheAssetService)
     ASSERT_EQ(signedIn.Status(), 200);
     const std::string token = signedIn.mAnswer.access_token.ToStdString();
 
-    FakeOvraLibrary fake(FAKE_OVRA_LIB);
+    FakeOvraState& fake = LoadFake(FAKE_OVRA_LIB);
     fake.SetText("OVRA_fetchDefaultUserInfoForClientId", "<UserInfo><UserID>ann</UserID></UserInfo>");
     fake.SetText("OVRA_fetchAccessToken",
                  ("{\"access_token\": \"" + token + "\", \"email\": \"ann@example.test\"}").c_str());

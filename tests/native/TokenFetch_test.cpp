@@ -20,9 +20,9 @@ const char kFetch[] = "OVRA_fetchAccessToken";
 
 class NativeTokenFetch : public ::testing::Test {
 protected:
-    NativeTokenFetch() : mFake(FAKE_OVRA_LIB), mConnection(Connect(FAKE_OVRA_LIB)) {}
+    NativeTokenFetch() : mFake(LoadFake(FAKE_OVRA_LIB)), mConnection(Connect(FAKE_OVRA_LIB)) {}
 
-    FakeOvraLibrary mFake;
+    FakeOvraState& mFake;
     boost::shared_ptr<OvraConnection> mConnection;
 };
 
@@ -76,35 +76,34 @@ TEST_F(NativeTokenFetch, EachOutcomeOfTheLibraryShowsInTheFetchState)
 {
     struct Outcome {
         const char* mLabel;
-        std::function<void(const FakeOvraLibrary&)> mScript;
+        std::function<void(FakeOvraState&)> mScript;
         bool mStarted;
         int mState;
         const char* mUserAsked;  // null: the token was never asked for
         const char* mToken;
     };
     const Outcome outcomes[] = {
-        {"no default user", [](const FakeOvraLibrary& fake) { fake.SetStatus(kUserInfo, 3); }, false,
+        {"no default user", [](FakeOvraState& fake) { fake.SetStatus(kUserInfo, 3); }, false,
          OvraConnection::kFetchState_NotStarted, nullptr, ""},
         {"user info without its closing tag: an empty user",
-         [](const FakeOvraLibrary& fake) { fake.SetText(kUserInfo, "<UserInfo><UserID>u-42"); }, true,
+         [](FakeOvraState& fake) { fake.SetText(kUserInfo, "<UserInfo><UserID>u-42"); }, true,
          OvraConnection::kFetchState_Received, "", "tok-1"},
-        {"token text that is not JSON",
-         [](const FakeOvraLibrary& fake) { fake.SetText(kFetch, "<html>not json</html>"); }, true,
-         OvraConnection::kFetchState_Fetching, "u-42", ""},
+        {"token text that is not JSON", [](FakeOvraState& fake) { fake.SetText(kFetch, "<html>not json</html>"); },
+         true, OvraConnection::kFetchState_Fetching, "u-42", ""},
         {"failure reported by the callback",
-         [](const FakeOvraLibrary& fake) {
+         [](FakeOvraState& fake) {
              fake.SetText(kFetch, "{\"access_token\": \"ignored\"}");
              fake.SetCallbackStatus(kFetch, 9);
          },
          true, OvraConnection::kFetchState_Failed, "u-42", ""},
         // A refusal at once stays under way: a host polling the state keeps waiting.
-        {"fetch refused at once", [](const FakeOvraLibrary& fake) { fake.SetStatus(kFetch, 2); }, false,
+        {"fetch refused at once", [](FakeOvraState& fake) { fake.SetStatus(kFetch, 2); }, false,
          OvraConnection::kFetchState_Fetching, "u-42", ""},
     };
     testsupport::TraceCapture trace("OvraConnection:1");
     for (const Outcome& outcome : outcomes) {
         SCOPED_TRACE(outcome.mLabel);
-        FakeOvraLibrary fake(FAKE_OVRA_LIB);
+        FakeOvraState& fake = LoadFake(FAKE_OVRA_LIB);
         fake.SetText(kUserInfo, "<UserID>u-42</UserID>");
         fake.SetStatus(kUserInfo, 0);
         fake.SetStatus(kFetch, 0);
@@ -119,7 +118,9 @@ TEST_F(NativeTokenFetch, EachOutcomeOfTheLibraryShowsInTheFetchState)
         EXPECT_EQ(connection->GetFetchState(), outcome.mState);
         EXPECT_EQ(connection->GetAccessToken(), Text(outcome.mToken));
         EXPECT_EQ(fake.Calls(kFetch) - fetchesBefore, outcome.mUserAsked != nullptr ? 1 : 0);
-        if (outcome.mUserAsked != nullptr) EXPECT_EQ(fake.Argument(kFetch, 2), outcome.mUserAsked);
+        if (outcome.mUserAsked != nullptr) {
+            EXPECT_EQ(fake.Argument(kFetch, 2), outcome.mUserAsked);
+        }
     }
     EXPECT_TRUE(trace.Contains("ParseAccessTokenDetails error: "));
 }

@@ -82,11 +82,12 @@ IdentityService::IdentityService()
 {
 }
 
-boost::shared_ptr<tarnvault::Tarnvault> IdentityService::Client()
+boost::shared_ptr<tarnvault::Tarnvault> IdentityService::Client(bool autoSignIn)
 {
     ParameterList parameters;
     parameters.emplace_back(tolmonet::kHEADER_LOCATION, Text(mService->AssetServiceUrl()));
     parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, Text("identity-tests"));
+    if (autoSignIn) parameters.emplace_back(tolmonet::kHEADER_SET_COOKIE, Text("auto"));
     return boost::shared_ptr<tarnvault::Tarnvault>(new tarnvault::Tarnvault(parameters));
 }
 

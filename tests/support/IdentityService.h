@@ -47,8 +47,9 @@ public:
     tolmonetsync::server::LocalService& Service() { return *mService; }
     std::string AssetUrl() { return mService->AssetServiceUrl(); }
 
-    // A client of this service as a host makes it, without a token.
-    boost::shared_ptr<tolmonetsync::tarnvault::Tarnvault> Client();
+    // A client of this service as a host makes it, without a token; one that
+    // signs in from the environment with `autoSignIn`.
+    boost::shared_ptr<tolmonetsync::tarnvault::Tarnvault> Client(bool autoSignIn = false);
 
 private:
     TestService mService;

@@ -46,31 +46,46 @@ DialogArguments Filled()
 
 class PasswordDialog : public ::testing::Test {};
 
-TEST_F(PasswordDialog, ShowsTheFieldsWithTheStartingValuesInAModalScope)
+// Without a validator OK never closes; Cancel and the close box give false
+// and hand back what was typed.
+TEST_F(PasswordDialog, ShowsTheStartingValuesAndGivesBackTheTypedOnesOnCancelOrClose)
 {
-    DialogArguments arguments = Filled();
-    DialogRun run(arguments);
-    ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        EXPECT_EQ(N(box.GetTitle()), "Sign in");
-        EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
-        EXPECT_TRUE(box.GetSpecificButton(kDialogResponse_OK)->IsDefault());
-        EXPECT_EQ(UI_NodeManager::GetModalScopeDepth(), 1);
+    for (const bool closeBox : {false, true}) {
+        SCOPED_TRACE(closeBox ? "close box" : "cancel");
+        DialogRun run(Filled());
+        ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
+            EXPECT_EQ(N(box.GetTitle()), "Sign in");
+            EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
+            EXPECT_TRUE(box.GetSpecificButton(kDialogResponse_OK)->IsDefault());
+            EXPECT_EQ(UI_NodeManager::GetModalScopeDepth(), 1);
 
-        const auto userName = Edit(box, "UserNameTextEdit");
-        const auto password = Edit(box, "PasswordTextEdit");
-        ASSERT_TRUE(userName && password);
-        EXPECT_EQ(N(userName->GetValue()), "ann");
-        EXPECT_TRUE(userName->IsAllSelected());
-        EXPECT_EQ(N(password->GetValue()), "secret");
-        EXPECT_EQ(password->GetFlags(), 0x20);  // masked
-        EXPECT_EQ(N(box.FindDescendantAs<UI_StaticText>("UserNameStaticText")->GetValue()), "User name:");
-        EXPECT_EQ(N(box.FindDescendantAs<UI_StaticText>("PasswordStaticText")->GetValue()), "Password:");
-        EXPECT_FALSE(Link(box, "UserNameLinkHotTextButton"));
-        EXPECT_FALSE(Link(box, "PasswordLinkHotTextButton"));
-    }));
-    EXPECT_TRUE(run.Do([](UI_MessageBox& box) { EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_Cancel)); }));
-    EXPECT_FALSE(run.Finish());
-    EXPECT_EQ(UI_NodeManager::GetModalScopeDepth(), 0);
+            const auto userName = Edit(box, "UserNameTextEdit");
+            const auto password = Edit(box, "PasswordTextEdit");
+            ASSERT_TRUE(userName && password);
+            EXPECT_EQ(N(userName->GetValue()), "ann");
+            EXPECT_TRUE(userName->IsAllSelected());
+            EXPECT_EQ(N(password->GetValue()), "secret");
+            EXPECT_EQ(password->GetFlags(), 0x20);  // masked
+            EXPECT_EQ(N(box.FindDescendantAs<UI_StaticText>("UserNameStaticText")->GetValue()), "User name:");
+            EXPECT_EQ(N(box.FindDescendantAs<UI_StaticText>("PasswordStaticText")->GetValue()), "Password:");
+            EXPECT_FALSE(Link(box, "UserNameLinkHotTextButton"));
+            EXPECT_FALSE(Link(box, "PasswordLinkHotTextButton"));
+            EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
+            EXPECT_TRUE(MessageText(box).empty());  // the empty error
+            EXPECT_TRUE(box.IsInModalLoop());
+
+            SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String(u"carla"));
+            SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"hunter2"));
+            if (closeBox)
+                box.HandleCloseBox();
+            else
+                EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_Cancel));
+        }));
+        EXPECT_FALSE(run.Finish());
+        EXPECT_EQ(UI_NodeManager::GetModalScopeDepth(), 0);
+        EXPECT_EQ(N(run.Arguments().userName), "carla");
+        EXPECT_EQ(N(run.Arguments().password), "hunter2");
+    }
 }
 
 TEST_F(PasswordDialog, OneEmptyValueDisablesOKUntilBothHoldTextAndAnAcceptingValidatorCloses)
@@ -129,43 +144,6 @@ TEST_F(PasswordDialog, ARefusalShowsItsErrorUntilTheUserTypesAndKeepsTheDialogOp
     }));
     // Still open: the loop runs the next action.
     EXPECT_TRUE(run.Do([](UI_MessageBox& box) { EXPECT_TRUE(box.IsInModalLoop()); }));
-}
-
-TEST_F(PasswordDialog, CancelAndTheCloseBoxReturnFalseWithTheTypedValues)
-{
-    for (const bool closeBox : {false, true}) {
-        DialogArguments arguments = Filled();
-        arguments.validator = Validator([](const UTF16String&, const UTF16String&, UTF16String&) { return true; });
-        DialogRun run(arguments);
-        ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
-            SimulateTyping(*Edit(box, "UserNameTextEdit"), UTF16String(u"carla"));
-            SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"hunter2"));
-            if (closeBox)
-                box.HandleCloseBox();
-            else
-                EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_Cancel));
-        }));
-        EXPECT_FALSE(run.Finish()) << closeBox;
-        EXPECT_EQ(N(run.Arguments().userName), "carla");
-        EXPECT_EQ(N(run.Arguments().password), "hunter2");
-    }
-}
-
-TEST_F(PasswordDialog, WithoutAValidatorOKNeverCloses)
-{
-    DialogArguments arguments = Filled();
-    DialogRun run(arguments);
-    ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        EXPECT_TRUE(OkEnabled(box));
-        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
-        EXPECT_TRUE(MessageText(box).empty());  // the empty error
-        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
-    }));
-    ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
-        EXPECT_TRUE(box.IsInModalLoop());
-        box.HandleButtonClick(kDialogResponse_Cancel);
-    }));
-    EXPECT_FALSE(run.Finish());
 }
 
 TEST_F(PasswordDialog, ALinkOpensItsOwnURLAndOneWithoutAURLOpensNothing)
