@@ -4,6 +4,8 @@
 
 #include <gtest/gtest.h>
 
+#include <functional>
+
 #include "server/FaultHooks.h"
 #include "support/IdentityService.h"
 #include "support/TestScopes.h"
@@ -13,7 +15,6 @@ namespace {
 using namespace testsupport;
 using namespace tolmonetsync;
 using tolmocore::utility::ToNarrow;
-using tolmonetsync::server::FaultAction_NotJson;
 using tolmonetsync::server::FaultAction_Status;
 using tolmonetsync::server::FaultRule;
 
@@ -81,44 +82,44 @@ TEST(IdentityCalls, RefusalsCarryTheirLocalisedText)
 TEST(IdentityCalls, UnreadableAnswersReachTheHandlerOnce)
 {
     IdentityService service;
-    auto answerWith = [&](const char* path, int status, const std::string& body) {
-        FaultRule rule;
-        rule.mPathPattern = path;
-        rule.mAction = FaultAction_Status;
-        rule.mStatus = status;
-        rule.mBody = body;
-        return service.Service().Faults().Install(rule);
+    const struct {
+        const char* mLabel;
+        std::function<Answered()> mCall;
+        int mStatus;
+        std::string mBody;
+        int mSeenStatus;
+        const char* mText;  // null: not looked at
+    } cases[] = {
+        // A success that cannot be read becomes the library's own error response.
+        {"html", [] { return SignIn("ann", "secret"); }, 200, "<html>", tolmonet::kStatusNoResponse, nullptr},
+        {"array", [] { return SignIn("ann", "secret"); }, 200, "[1, 2]", tolmonet::kStatusNoResponse, nullptr},
+        {"wrong types", [] { return SignIn("ann", "secret"); }, 200, "{\"userId\": 7, \"access_token\": \"t\"}",
+         tolmonet::kStatusNoResponse, nullptr},
+        // An empty success is an empty answer with the service's response.
+        {"empty profile", [] { return Profile("anything"); }, 200, "", 200, ""},
+        // A failure whose body is not JSON still gets the default text.
+        {"failed refresh", [] { return Refresh("r"); }, 500, "<html>down</html>", 500, kFailedText},
+        // The sign-out's answer is never read.
+        {"sign-out", [] { return SignOut("d"); }, 200, "<html>not json</html>", 200, nullptr},
     };
-
-    // A success that cannot be read becomes the library's own error response.
-    for (const std::string body : {"<html>", "[1, 2]", "{\"userId\": 7, \"access_token\": \"t\"}"}) {
-        const auto fault = answerWith("/ovra/login/v1/device", 200, body);
-        const Answered answered = SignIn("ann", "secret");
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.mLabel);
+        FaultRule rule;
+        rule.mPathPattern = "/ovra/.*";
+        rule.mAction = FaultAction_Status;
+        rule.mStatus = c.mStatus;
+        rule.mBody = c.mBody;
+        const auto fault = service.Service().Faults().Install(rule);
+        const Answered answered = c.mCall();
         EXPECT_TRUE(fault->Fired());
-        EXPECT_EQ(answered.mCalls, 1) << body;
-        EXPECT_EQ(answered.Status(), tolmonet::kStatusNoResponse) << body;
-        EXPECT_TRUE(answered.mAnswer.access_token.empty()) << body;
+        EXPECT_EQ(answered.mCalls, 1);
+        EXPECT_EQ(answered.Status(), c.mSeenStatus);
+        EXPECT_TRUE(answered.mAnswer.access_token.empty() && answered.mAnswer.userId.empty());
+        if (c.mText != nullptr) {
+            EXPECT_EQ(ToNarrow(answered.mAnswer.errorMessage), c.mText);
+        }
         service.Service().Faults().Clear();
     }
-    // An empty success is an empty answer with the service's response.
-    answerWith("/ovra/profile/v1", 200, "");
-    const Answered empty = Profile("anything");
-    EXPECT_EQ(empty.Status(), 200);
-    EXPECT_TRUE(empty.mAnswer.userId.empty() && empty.mAnswer.errorMessage.empty());
-    service.Service().Faults().Clear();
-
-    // A failure whose body is not JSON still gets the default text.
-    answerWith("/ovra/token/v1", 500, "<html>down</html>");
-    const Answered failed = Refresh("r");
-    EXPECT_EQ(failed.Status(), 500);
-    EXPECT_EQ(ToNarrow(failed.mAnswer.errorMessage), kFailedText);
-    service.Service().Faults().Clear();
-
-    // The sign-out's answer is never read.
-    answerWith("/ovra/invalidate_token/v1", 200, "<html>not json</html>");
-    const Answered signedOut = SignOut("d");
-    EXPECT_EQ(signedOut.mCalls, 1);
-    EXPECT_EQ(signedOut.Status(), 200);
 }
 
 // --- a host's stored sign-in ---

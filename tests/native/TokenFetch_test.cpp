@@ -26,33 +26,6 @@ protected:
     boost::shared_ptr<OvraConnection> mConnection;
 };
 
-TEST_F(NativeTokenFetch, DefaultUserGetsATokenDeliveredOnTheLibrarysThread)
-{
-    mFake.SetText(kUserInfo, "<UserInfo><UserID>u-42</UserID><Name>Ann</Name></UserInfo>");
-    mFake.SetText(kFetch, "{\"access_token\": \"tok-1\", \"email\": \"ann@example.test\", \"token_type\": \"bearer\"}");
-    mFake.HoldCallbacks(true);
-    EXPECT_EQ(mConnection->GetFetchState(), OvraConnection::kFetchState_None);
-    ASSERT_TRUE(mConnection->GetUserInfoAndFetchToken(true, UTF8String(), UTF8String(), UTF8String(), UTF8String()));
-    EXPECT_EQ(mConnection->GetFetchState(), OvraConnection::kFetchState_Fetching);
-    EXPECT_EQ(mConnection->GetUserID(), Text("u-42"));
-
-    mFake.HoldCallbacks(false);
-    ASSERT_TRUE(mFake.WaitUntilIdle());
-    EXPECT_EQ(mConnection->GetFetchState(), OvraConnection::kFetchState_Received);
-    EXPECT_EQ(mConnection->GetAccessToken(), Text("tok-1"));
-    EXPECT_EQ(mConnection->GetEmail(), Text("ann@example.test"));
-
-    // Production, the built-in client and its production secret, the default scope.
-    EXPECT_EQ(mFake.Argument("OVRA_createRef", 0), "context");
-    EXPECT_EQ(mFake.Argument("OVRA_createRef", 1), "1");
-    EXPECT_EQ(mFake.Argument(kUserInfo, 0), tolmonetsync::kTOLMO_OVRA_CLIENT_ID.ToStdString());
-    EXPECT_EQ(mFake.Argument(kFetch, 0), tolmonetsync::kTOLMO_OVRA_CLIENT_ID.ToStdString());
-    EXPECT_EQ(mFake.Argument(kFetch, 1), tolmonetsync::kTOLMO_OVRA_CLIENT_SECRET_GM.ToStdString());
-    EXPECT_EQ(mFake.Argument(kFetch, 2), "u-42");
-    EXPECT_EQ(mFake.Argument(kFetch, 3), "");
-    EXPECT_EQ(mFake.Argument(kFetch, 4), "openid,HalvaneID,pellucid");
-}
-
 TEST_F(NativeTokenFetch, StagingTakesTheStagingSecretAndGivenValuesPassAsTheyAre)
 {
     ASSERT_TRUE(mConnection->GetUserInfoAndFetchToken(false, Text("ann"), UTF8String(), UTF8String(), UTF8String()));
