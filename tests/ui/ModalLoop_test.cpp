@@ -3,6 +3,7 @@
 
 #include <gtest/gtest.h>
 
+#include <future>
 #include <thread>
 
 #include "foundation/ui/UI_MessageBox.h"
@@ -21,39 +22,22 @@ boost::intrusive_ptr<UI_MessageBox> MakeBox()
                              kDialogResponse_OK, 3, nullptr, 0, 0, 0, nullptr);
 }
 
-// Runs a dialog's modal loop on a thread of its own.
-class LoopThread {
-public:
-    explicit LoopThread(const boost::intrusive_ptr<OS_Dialog>& dialog) : mDialog(dialog)
-    {
-        mThread = std::thread([this] { mResponse = mDialog->RunModal(); });
-    }
-    ~LoopThread()
-    {
-        if (mThread.joinable()) Join();
-    }
-    int Join()
-    {
-        mThread.join();
-        return mResponse;
-    }
-
-private:
-    boost::intrusive_ptr<OS_Dialog> mDialog;
-    int mResponse = -1;
-    std::thread mThread;
-};
+// Runs a dialog's modal loop on a thread of its own; its response.
+std::future<int> RunModalOnAThread(const boost::intrusive_ptr<UI_MessageBox>& dialog)
+{
+    return std::async(std::launch::async, [dialog] { return dialog->RunModal(); });
+}
 
 class ModalLoop : public ::testing::Test {};
 
 TEST_F(ModalLoop, PostCloseFromAnotherThreadEndsRunModal)
 {
     auto box = MakeBox();
-    LoopThread loop(box);
+    auto loop = RunModalOnAThread(box);
     ASSERT_EQ(WaitForModalDialog(kWaitMs), box);
     EXPECT_TRUE(box->IsInModalLoop());
     box->PostClose();
-    EXPECT_EQ(loop.Join(), kDialogResponse_None);
+    EXPECT_EQ(loop.get(), kDialogResponse_None);
     EXPECT_FALSE(box->IsInModalLoop());
 }
 
@@ -61,7 +45,7 @@ TEST_F(ModalLoop, NestedLoopsTakeActionsInnermostFirst)
 {
     auto outer = MakeBox();
     auto inner = MakeBox();
-    LoopThread loop(outer);
+    auto loop = RunModalOnAThread(outer);
     ASSERT_EQ(WaitForModalDialog(kWaitMs), outer);
     int innerResponse = -1;
     std::thread opener([&] { RunInModalLoop([&] { innerResponse = inner->RunModal(); }, kWaitMs); });
@@ -72,7 +56,7 @@ TEST_F(ModalLoop, NestedLoopsTakeActionsInnermostFirst)
     EXPECT_EQ(innerResponse, kDialogResponse_OK);
     ASSERT_EQ(WaitForModalDialog(kWaitMs), outer);
     ASSERT_TRUE(RunInModalLoop([&] { outer->HandleCloseBox(); }, kWaitMs));
-    EXPECT_EQ(loop.Join(), kDialogResponse_Cancel);
+    EXPECT_EQ(loop.get(), kDialogResponse_Cancel);
 }
 
 }  // namespace
