@@ -22,7 +22,7 @@ std::string QuotedURL(const std::string& url)
     return quoted;
 }
 
-TEST(IdentityWire, EachCallSendsItsRequestAsSpecified)
+TEST(IdentityWire, EachCallPutsItsRequestOnTheWireAsTheServiceReadsIt)
 {
     CallRecorder<HttpRequest> arrived;
     LoopbackHttpServer server([arrived](const HttpRequest& request) {
