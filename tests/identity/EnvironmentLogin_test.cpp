@@ -1,95 +1,53 @@
 // The environment sign-in keeps its state for the whole process and never
-// resets it, so each case needs a process of its own: ctest runs every test
-// of this binary as a process of its own. Run by hand, only the first case of
-// a process runs; the others skip and say why.
+// resets it, so its whole life is one test: a refusal keeps nothing, one
+// sign-in serves every client, and a refused token brings a new sign-in.
 
 #include <gtest/gtest.h>
 
 #include <climits>
 #include <cstdlib>
 
-#include "IdentityService.h"
-#include "foundation/net/HeaderConstants.h"
 #include "server/FaultHooks.h"
+#include "support/IdentityService.h"
 
 namespace {
 
-using namespace idtest;
+using namespace testsupport;
+using namespace tolmonetsync;
 
-bool sProcessUsed = false;
-
-class EnvironmentLogin : public ::testing::Test {
-protected:
-    void SetUp() override
-    {
-        if (sProcessUsed) GTEST_SKIP() << "process-wide sign-in already used in this process; run under ctest";
-        sProcessUsed = true;
-        setenv("TOLMONETSYNC_USERNAME", "ann", 1);
-        setenv("TOLMONETSYNC_PASSWORD", "secret", 1);
-    }
-    void TearDown() override
-    {
-        unsetenv("TOLMONETSYNC_USERNAME");
-        unsetenv("TOLMONETSYNC_PASSWORD");
-    }
-
+TEST(EnvironmentLogin, OneSignInServesTheProcessUntilTheServiceRefusesItsToken)
+{
+    IdentityService service;
     // Counts the sign-ins the service sees; never fires.
-    std::shared_ptr<const server::FaultHandle> CountSignIns(IdentityService& service)
-    {
-        server::FaultRule counter;
-        counter.mPathPattern = "/ovra/login/.*";
-        counter.mNth = INT_MAX;
-        return service.Service().Faults().Install(counter);
-    }
-    boost::shared_ptr<tarnvault::Tarnvault> AutoClient(IdentityService& service)
-    {
-        ParameterList parameters;
-        const std::string url = service.AssetUrl();
-        parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(url.begin(), url.end()));
-        parameters.emplace_back(tolmonet::kHEADER_USER_AGENT,
-                                UTF8String(reinterpret_cast<const unsigned char*>("env")));
-        parameters.emplace_back(tolmonet::kHEADER_SET_COOKIE,
-                                UTF8String(reinterpret_cast<const unsigned char*>("auto")));
-        return boost::shared_ptr<tarnvault::Tarnvault>(new tarnvault::Tarnvault(parameters));
-    }
-};
+    server::FaultRule counter;
+    counter.mPathPattern = "/ovra/login/.*";
+    counter.mNth = INT_MAX;
+    const auto signIns = service.Service().Faults().Install(counter);
+    setenv("TOLMONETSYNC_USERNAME", "ann", 1);
 
-TEST_F(EnvironmentLogin, OneSignInServesEveryClientOfTheProcess)
-{
-    IdentityService service;
-    const auto signIns = CountSignIns(service);
-    const auto first = AutoClient(service);
-    const auto second = AutoClient(service);
-    EXPECT_EQ(signIns->Seen(), 1);
-    EXPECT_EQ(RootStatus(second), 200);
-    // Such a client holds a working token, yet nothing is stored for a check.
-    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return second->CheckConnection(report); }),
-              SyncServer_NotLoggedIn);
-}
-
-TEST_F(EnvironmentLogin, SignsInAgainOnceTheServiceRefusesTheKeptToken)
-{
-    IdentityService service;
-    const auto signIns = CountSignIns(service);
-    AutoClient(service);
-    service.Service().GetAccounts().ExpireTokensOf("ann");
-    const auto later = AutoClient(service);
-    EXPECT_EQ(signIns->Seen(), 2);
-    EXPECT_EQ(RootStatus(later), 200);
-}
-
-TEST_F(EnvironmentLogin, ARefusedSignInLeavesNoClient)
-{
-    IdentityService service;
     setenv("TOLMONETSYNC_PASSWORD", "wrong", 1);
     try {
-        AutoClient(service);
+        service.Client(true);
         FAIL() << "no exception";
     } catch (const std::runtime_error& e) {
         EXPECT_STREQ(e.what(), "doOvraLogin failed");
     }
+
     setenv("TOLMONETSYNC_PASSWORD", "secret", 1);  // the next try signs in
-    EXPECT_EQ(RootStatus(AutoClient(service)), 200);
+    const auto first = service.Client(true);
+    const auto second = service.Client(true);
+    EXPECT_EQ(signIns->Seen(), 2);
+    EXPECT_EQ(RootStatus(second), 200);
+    // Such a client holds a working token, yet nothing is stored for a check.
+    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return second->CheckConnection(report); }),
+              SyncServer_NotLoggedIn);
+
+    service.Service().GetAccounts().ExpireTokensOf("ann");
+    const auto later = service.Client(true);
+    EXPECT_EQ(signIns->Seen(), 3);
+    EXPECT_EQ(RootStatus(later), 200);
+    unsetenv("TOLMONETSYNC_USERNAME");
+    unsetenv("TOLMONETSYNC_PASSWORD");
 }
 
 }  // namespace

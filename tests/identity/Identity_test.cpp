@@ -4,16 +4,17 @@
 
 #include <gtest/gtest.h>
 
+#include <functional>
 
-#include "IdentityService.h"
 #include "server/FaultHooks.h"
+#include "support/IdentityService.h"
 #include "support/TestScopes.h"
 
 namespace {
 
-using namespace idtest;
+using namespace testsupport;
+using namespace tolmonetsync;
 using tolmocore::utility::ToNarrow;
-using tolmonetsync::server::FaultAction_NotJson;
 using tolmonetsync::server::FaultAction_Status;
 using tolmonetsync::server::FaultRule;
 
@@ -31,7 +32,7 @@ std::string S(const UTF8String& text)
 TEST(IdentityCalls, SignInRefreshProfileAndSignOutAgainstTheService)
 {
     IdentityService service;
-    const Answered signedIn = service.SignIn("ann", "secret");
+    const Answered signedIn = SignIn("ann", "secret");
     ASSERT_EQ(signedIn.Status(), 200);
     EXPECT_EQ(signedIn.mCalls, 1);
     const OvraResponse& tokens = signedIn.mAnswer;
@@ -39,40 +40,40 @@ TEST(IdentityCalls, SignInRefreshProfileAndSignOutAgainstTheService)
     EXPECT_EQ(S(tokens.email), "ann@example.test");
     EXPECT_TRUE(tokens.errorMessage.empty());
 
-    const Answered profile = service.Profile(S(tokens.access_token));
+    const Answered profile = Profile(S(tokens.access_token));
     ASSERT_EQ(profile.Status(), 200);
     EXPECT_EQ(profile.mAnswer.userId, tokens.userId);
     EXPECT_TRUE(profile.mAnswer.access_token.empty());
 
     // A refresh rotates: the new refresh token works once, the old one never again.
-    const Answered refreshed = service.Refresh(S(tokens.refresh_token));
+    const Answered refreshed = Refresh(S(tokens.refresh_token));
     ASSERT_EQ(refreshed.Status(), 200);
     EXPECT_NE(refreshed.mAnswer.access_token, tokens.access_token);
     EXPECT_NE(refreshed.mAnswer.refresh_token, tokens.refresh_token);
-    const Answered reused = service.Refresh(S(tokens.refresh_token));
+    const Answered reused = Refresh(S(tokens.refresh_token));
     EXPECT_EQ(reused.Status(), 400);
     EXPECT_EQ(S(reused.mAnswer.error), "invalid_grant");
     EXPECT_EQ(ToNarrow(reused.mAnswer.errorMessage), kFailedText);
 
     // Signing out withdraws every access token of the device at once.
-    const Answered signedOut = service.SignOut(S(tokens.device_token));
+    const Answered signedOut = SignOut(S(tokens.device_token));
     EXPECT_EQ(signedOut.Status(), 200);
     EXPECT_EQ(signedOut.mCalls, 1);
-    EXPECT_EQ(service.Profile(S(tokens.access_token)).Status(), 401);
-    EXPECT_EQ(service.Profile(S(refreshed.mAnswer.access_token)).Status(), 401);
+    EXPECT_EQ(Profile(S(tokens.access_token)).Status(), 401);
+    EXPECT_EQ(Profile(S(refreshed.mAnswer.access_token)).Status(), 401);
 }
 
 TEST(IdentityCalls, RefusalsCarryTheirLocalisedText)
 {
     IdentityService service;
     for (const auto& attempt : {std::make_pair("ann", "wrong"), std::make_pair("nobody", "secret")}) {
-        const Answered refused = service.SignIn(attempt.first, attempt.second);
+        const Answered refused = SignIn(attempt.first, attempt.second);
         EXPECT_EQ(refused.Status(), 401) << attempt.first;
         EXPECT_EQ(refused.mCalls, 1);
         EXPECT_TRUE(refused.mAnswer.access_token.empty());
         EXPECT_EQ(ToNarrow(refused.mAnswer.errorMessage), kFailedText);
     }
-    const Answered denied = service.SignIn("bob", "secret");
+    const Answered denied = SignIn("bob", "secret");
     EXPECT_EQ(denied.Status(), 403);
     EXPECT_EQ(S(denied.mAnswer.error), "access_denied_non_t1");
     EXPECT_EQ(ToNarrow(denied.mAnswer.errorMessage), kDeniedText);
@@ -81,122 +82,79 @@ TEST(IdentityCalls, RefusalsCarryTheirLocalisedText)
 TEST(IdentityCalls, UnreadableAnswersReachTheHandlerOnce)
 {
     IdentityService service;
-    auto answerWith = [&](const char* path, int status, const std::string& body) {
-        FaultRule rule;
-        rule.mPathPattern = path;
-        rule.mAction = FaultAction_Status;
-        rule.mStatus = status;
-        rule.mBody = body;
-        return service.Service().Faults().Install(rule);
+    const struct {
+        const char* mLabel;
+        std::function<Answered()> mCall;
+        int mStatus;
+        std::string mBody;
+        int mSeenStatus;
+        const char* mText;  // null: not looked at
+    } cases[] = {
+        // A success that cannot be read becomes the library's own error response.
+        {"html", [] { return SignIn("ann", "secret"); }, 200, "<html>", tolmonet::kStatusNoResponse, nullptr},
+        {"array", [] { return SignIn("ann", "secret"); }, 200, "[1, 2]", tolmonet::kStatusNoResponse, nullptr},
+        {"wrong types", [] { return SignIn("ann", "secret"); }, 200, "{\"userId\": 7, \"access_token\": \"t\"}",
+         tolmonet::kStatusNoResponse, nullptr},
+        // An empty success is an empty answer with the service's response.
+        {"empty profile", [] { return Profile("anything"); }, 200, "", 200, ""},
+        // A failure whose body is not JSON still gets the default text.
+        {"failed refresh", [] { return Refresh("r"); }, 500, "<html>down</html>", 500, kFailedText},
+        // The sign-out's answer is never read.
+        {"sign-out", [] { return SignOut("d"); }, 200, "<html>not json</html>", 200, nullptr},
     };
-
-    // A success that cannot be read becomes the library's own error response.
-    for (const std::string body : {"<html>", "[1, 2]", "{\"userId\": 7, \"access_token\": \"t\"}"}) {
-        const auto fault = answerWith("/ovra/login/v1/device", 200, body);
-        const Answered answered = service.SignIn("ann", "secret");
+    for (const auto& c : cases) {
+        SCOPED_TRACE(c.mLabel);
+        FaultRule rule;
+        rule.mPathPattern = "/ovra/.*";
+        rule.mAction = FaultAction_Status;
+        rule.mStatus = c.mStatus;
+        rule.mBody = c.mBody;
+        const auto fault = service.Service().Faults().Install(rule);
+        const Answered answered = c.mCall();
         EXPECT_TRUE(fault->Fired());
-        EXPECT_EQ(answered.mCalls, 1) << body;
-        EXPECT_EQ(answered.Status(), tolmonet::kStatusNoResponse) << body;
-        EXPECT_TRUE(answered.mAnswer.access_token.empty()) << body;
+        EXPECT_EQ(answered.mCalls, 1);
+        EXPECT_EQ(answered.Status(), c.mSeenStatus);
+        EXPECT_TRUE(answered.mAnswer.access_token.empty() && answered.mAnswer.userId.empty());
+        if (c.mText != nullptr) {
+            EXPECT_EQ(ToNarrow(answered.mAnswer.errorMessage), c.mText);
+        }
         service.Service().Faults().Clear();
     }
-    // An empty success is an empty answer with the service's response.
-    answerWith("/ovra/profile/v1", 200, "");
-    const Answered empty = service.Profile("anything");
-    EXPECT_EQ(empty.Status(), 200);
-    EXPECT_TRUE(empty.mAnswer.userId.empty() && empty.mAnswer.errorMessage.empty());
-    service.Service().Faults().Clear();
-
-    // A failure whose body is not JSON still gets the default text.
-    answerWith("/ovra/token/v1", 500, "<html>down</html>");
-    const Answered failed = service.Refresh("r");
-    EXPECT_EQ(failed.Status(), 500);
-    EXPECT_EQ(ToNarrow(failed.mAnswer.errorMessage), kFailedText);
-    service.Service().Faults().Clear();
-
-    // The sign-out's answer is never read.
-    answerWith("/ovra/invalidate_token/v1", 200, "<html>not json</html>");
-    const Answered signedOut = service.SignOut("d");
-    EXPECT_EQ(signedOut.mCalls, 1);
-    EXPECT_EQ(signedOut.Status(), 200);
 }
 
 // --- a host's stored sign-in ---
 
-OvraCredentials Credentials(const OvraResponse& answer)
+TEST(StoredSignIn, SurvivesANewClientFailsOnceWithdrawnIsRefreshedAndForgottenOnLogout)
 {
-    OvraCredentials credentials;
-    credentials.accessToken = answer.access_token;
-    credentials.refreshToken = answer.refresh_token;
-    credentials.userID = answer.userId;
-    return credentials;
-}
-
-TEST(StoredSignIn, SurvivesANewClientObjectIsProvedAndForgottenOnLogout)
-{
-    testsupport::PrefDirScope prefs;
+    PrefDirScope prefs;
     IdentityService service;
-    const Answered signedIn = service.SignIn("ann", "secret");
+    const Answered signedIn = SignIn("ann", "secret");
     ASSERT_EQ(signedIn.Status(), 200);
     const auto client = service.Client();
-    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) {
-                  return client->SetCredentials(report, Credentials(signedIn.mAnswer));
-              }),
-              SyncServer_Connected);
+    EXPECT_EQ(SetCredentials(client, CredentialsOf(signedIn.mAnswer)), SyncServer_Connected);
+    auto check = [](const boost::shared_ptr<tarnvault::Tarnvault>& client) {
+        return WaitForState([&](const ConnectionStateCallback& report) { return client->CheckConnection(report); });
+    };
 
     const auto restarted = service.Client();  // as after a restart of the host
-    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return restarted->CheckConnection(report); }),
-              SyncServer_Connected);
+    EXPECT_EQ(check(restarted), SyncServer_Connected);
     EXPECT_EQ(RootStatus(restarted), 200);
 
-    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return restarted->Logout(report); }),
-              SyncServer_NotLoggedIn);
-    const auto later = service.Client();
-    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return later->CheckConnection(report); }),
-              SyncServer_NotLoggedIn);
-}
-
-TEST(StoredSignIn, AnExpiredTokenFailsUntilTheHostRefreshesIt)
-{
-    testsupport::PrefDirScope prefs;
-    IdentityService service;
-    const Answered signedIn = service.SignIn("ann", "secret");
-    ASSERT_EQ(signedIn.Status(), 200);
-    const auto client = service.Client();
-    ASSERT_EQ(WaitForState([&](const ConnectionStateCallback& report) {
-                  return client->SetCredentials(report, Credentials(signedIn.mAnswer));
-              }),
-              SyncServer_Connected);
-
+    // The service withdraws the token: the check fails until the host refreshes.
     service.Service().GetAccounts().ExpireTokensOf("ann");
-    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return client->CheckConnection(report); }),
-              SyncServer_ConnectionFailed);
+    EXPECT_EQ(check(client), SyncServer_ConnectionFailed);
     std::string refusal;
     EXPECT_EQ(RootStatus(client, &refusal), 401);
     EXPECT_NE(refusal.find("missing or unknown access token"), std::string::npos) << refusal;
-
-    const Answered refreshed = service.Refresh(S(signedIn.mAnswer.refresh_token));
+    const Answered refreshed = Refresh(S(signedIn.mAnswer.refresh_token));
     ASSERT_EQ(refreshed.Status(), 200);
-    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) {
-                  return client->SetCredentials(report, Credentials(refreshed.mAnswer));
-              }),
-              SyncServer_Connected);
+    EXPECT_EQ(SetCredentials(client, CredentialsOf(refreshed.mAnswer)), SyncServer_Connected);
     EXPECT_EQ(RootStatus(client), 200);
-}
 
-TEST(StoredSignIn, ASignedOutDeviceIsRefusedAtOnce)
-{
-    testsupport::PrefDirScope prefs;
-    IdentityService service;
-    const Answered signedIn = service.SignIn("ann", "secret");
-    const auto client = service.Client();
-    ASSERT_EQ(WaitForState([&](const ConnectionStateCallback& report) {
-                  return client->SetCredentials(report, Credentials(signedIn.mAnswer));
-              }),
-              SyncServer_Connected);
-    service.SignOut(S(signedIn.mAnswer.device_token));
-    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return client->CheckConnection(report); }),
-              SyncServer_ConnectionFailed);
+    // Logging out clears the stored tokens, not only this object's.
+    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return client->Logout(report); }),
+              SyncServer_NotLoggedIn);
+    EXPECT_EQ(check(service.Client()), SyncServer_NotLoggedIn);
 }
 
 }  // namespace

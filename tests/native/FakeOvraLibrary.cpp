@@ -2,45 +2,17 @@
 
 #include <dlfcn.h>
 
-#include <chrono>
 #include <stdexcept>
-#include <vector>
 
 namespace nativetest {
 
-namespace {
-
-template <typename Function>
-void Take(void* handle, const char* name, Function& function)
-{
-    function = reinterpret_cast<Function>(dlsym(handle, name));
-    if (function == nullptr) throw std::runtime_error(std::string("the fake lacks ") + name);
-}
-
-}  // namespace
-
-FakeOvraLibrary::FakeOvraLibrary(const std::string& path)
+FakeOvraState& LoadFake(const std::string& path)
 {
     // The bridge's own flags, so that this is the copy it loads.
-    mHandle = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
-    if (mHandle == nullptr) throw std::runtime_error("cannot load " + path);
-    Take(mHandle, "FakeOvra_SetStatus", mSetStatus);
-    Take(mHandle, "FakeOvra_SetCallbackStatus", mSetCallbackStatus);
-    Take(mHandle, "FakeOvra_SetText", mSetText);
-    Take(mHandle, "FakeOvra_SetCallbackDelay", mSetCallbackDelay);
-    Take(mHandle, "FakeOvra_HoldCallbacks", mHoldCallbacks);
-    Take(mHandle, "FakeOvra_WaitUntilIdle", mWaitUntilIdle);
-    Take(mHandle, "FakeOvra_CallCount", mCallCount);
-    Take(mHandle, "FakeOvra_CopyArgument", mCopyArgument);
-}
-
-std::string FakeOvraLibrary::Argument(const char* function, int index) const
-{
-    const long length = mCopyArgument(function, index, nullptr, 0);
-    if (length < 0) return "<no call>";
-    std::vector<char> buffer(static_cast<std::size_t>(length) + 1);
-    mCopyArgument(function, index, buffer.data(), buffer.size());
-    return std::string(buffer.data(), static_cast<std::size_t>(length));
+    void* handle = dlopen(path.c_str(), RTLD_NOW | RTLD_LOCAL);
+    const auto state = handle ? reinterpret_cast<FakeOvra_State_Function>(dlsym(handle, "FakeOvra_State")) : nullptr;
+    if (state == nullptr) throw std::runtime_error("cannot load the fake at " + path);
+    return *state();
 }
 
 boost::shared_ptr<tolmonetsync::OvraConnection> Connect(const std::string& path)
@@ -48,32 +20,11 @@ boost::shared_ptr<tolmonetsync::OvraConnection> Connect(const std::string& path)
     return boost::shared_ptr<tolmonetsync::OvraConnection>(new tolmonetsync::OvraConnection(path));
 }
 
-tolmonetsync::OvraAsyncCompletionFunction CompletionRecorder::Function(const std::string& name)
+tolmonetsync::OvraAsyncCompletionFunction Completion(const Completions& completions, const std::string& name)
 {
-    return [this, name](OVRA_STATUS status, const char* text) {
-        std::lock_guard<std::mutex> lock(mMutex);
-        ++mCalls;
-        mLog += name + " " + std::to_string(status) + " " + (text != nullptr ? text : "(null)") + "\n";
-        mCame.notify_all();
+    return [completions, name](OVRA_STATUS status, const char* text) {
+        completions.Add(name + " " + std::to_string(status) + " " + (text != nullptr ? text : "(null)"));
     };
-}
-
-bool CompletionRecorder::WaitForCalls(int count)
-{
-    std::unique_lock<std::mutex> lock(mMutex);
-    return mCame.wait_for(lock, std::chrono::seconds(30), [&] { return mCalls >= count; });
-}
-
-int CompletionRecorder::Calls()
-{
-    std::lock_guard<std::mutex> lock(mMutex);
-    return mCalls;
-}
-
-std::string CompletionRecorder::Log()
-{
-    std::lock_guard<std::mutex> lock(mMutex);
-    return mLog;
 }
 
 }  // namespace nativetest

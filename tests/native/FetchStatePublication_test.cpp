@@ -30,7 +30,7 @@ int AwaitEndOfFetch(const OvraConnection& connection)
 
 TEST(NativeFetchPublication, FieldsAreCompleteOnceTheStateSaysReceived)
 {
-    FakeOvraLibrary fake(FAKE_OVRA_LIB);
+    FakeOvraState& fake = LoadFake(FAKE_OVRA_LIB);
     const boost::shared_ptr<OvraConnection> connection = Connect(FAKE_OVRA_LIB);
     for (int round = 0; round < 20; ++round) {
         const std::string n = std::to_string(round);

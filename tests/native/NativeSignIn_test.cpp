@@ -1,11 +1,13 @@
-// The whole way of a native sign-in: the library hands out a real access
-// token of the local service, and the credentials a host builds from the
-// connection open the asset service.
+// The whole way of a native sign-in for the library's default user: the
+// library hands out a real access token of the local service on its own
+// thread, and the credentials a host builds from the connection open the
+// asset service.
 
 #include <gtest/gtest.h>
 
 #include "FakeOvraLibrary.h"
-#include "IdentityService.h"
+#include "identity/OvraAuth.h"
+#include "support/IdentityService.h"
 #include "support/TestScopes.h"
 
 namespace {
@@ -13,46 +15,46 @@ namespace {
 using namespace nativetest;
 using tolmonetsync::OvraConnection;
 
-TEST(NativeSignIn, TheLibrarysTokenOpensTheAssetService)
+const char kUserInfo[] = "OVRA_fetchDefaultUserInfoForClientId";
+const char kFetch[] = "OVRA_fetchAccessToken";
+
+TEST(NativeSignIn, TheLibrarysTokenForTheDefaultUserOpensTheAssetService)
 {
     testsupport::PrefDirScope prefs;
-    idtest::IdentityService service;
-    const idtest::Answered signedIn = service.SignIn("ann", "secret");
+    testsupport::IdentityService service;
+    const testsupport::Answered signedIn = testsupport::SignIn("ann", "secret");
     ASSERT_EQ(signedIn.Status(), 200);
     const std::string token = signedIn.mAnswer.access_token.ToStdString();
 
-    FakeOvraLibrary fake(FAKE_OVRA_LIB);
-    fake.SetText("OVRA_fetchDefaultUserInfoForClientId", "<UserInfo><UserID>ann</UserID></UserInfo>");
-    fake.SetText("OVRA_fetchAccessToken",
-                 ("{\"access_token\": \"" + token + "\", \"email\": \"ann@example.test\"}").c_str());
-    fake.SetCallbackDelay(20);  // the answer comes after the call has returned
+    FakeOvraState& fake = LoadFake(FAKE_OVRA_LIB);
+    fake.SetText(kUserInfo, "<UserInfo><UserID>u-42</UserID><Name>Ann</Name></UserInfo>");
+    fake.SetText(kFetch, ("{\"access_token\": \"" + token + "\", \"email\": \"ann@example.test\"}").c_str());
+    fake.HoldCallbacks(true);  // the answer comes after the call has returned
     auto connection = Connect(FAKE_OVRA_LIB);
+    EXPECT_EQ(connection->GetFetchState(), OvraConnection::kFetchState_None);
     ASSERT_TRUE(connection->GetUserInfoAndFetchToken(true, UTF8String(), UTF8String(), UTF8String(), UTF8String()));
+    EXPECT_EQ(connection->GetFetchState(), OvraConnection::kFetchState_Fetching);
+    EXPECT_EQ(connection->GetUserID(), Text("u-42"));
+    fake.HoldCallbacks(false);
     ASSERT_TRUE(fake.WaitUntilIdle());
     ASSERT_EQ(connection->GetFetchState(), OvraConnection::kFetchState_Received);
+    EXPECT_EQ(connection->GetEmail(), Text("ann@example.test"));
+
+    // Production, the built-in client and its production secret, the default scope.
+    EXPECT_EQ(fake.Argument("OVRA_createRef", 0), "context");
+    EXPECT_EQ(fake.Argument("OVRA_createRef", 1), "1");
+    const std::string client = tolmonetsync::kTOLMO_OVRA_CLIENT_ID.ToStdString();
+    EXPECT_EQ(fake.Argument(kUserInfo, 0), client);
+    const std::vector<std::string> asked = {client, tolmonetsync::kTOLMO_OVRA_CLIENT_SECRET_GM.ToStdString(), "u-42",
+                                            "", "openid,HalvaneID,pellucid"};
+    for (size_t i = 0; i < asked.size(); ++i) EXPECT_EQ(fake.Argument(kFetch, i), asked[i]) << i;
 
     tolmonetsync::OvraCredentials credentials;
     credentials.accessToken = connection->GetAccessToken();
     credentials.userID = connection->GetEmail();
-    const auto client = service.Client();
-    EXPECT_EQ(idtest::WaitForState([&](const tolmonetsync::ConnectionStateCallback& report) {
-                  return client->SetCredentials(report, credentials);
-              }),
-              tolmonetsync::SyncServer_Connected);
-    EXPECT_EQ(idtest::RootStatus(client), 200);
-
-    // A token the service never gave is refused the same way.
-    auto stranger = Connect(FAKE_OVRA_LIB);
-    fake.SetText("OVRA_fetchAccessToken", "{\"access_token\": \"forged\", \"email\": \"ann@example.test\"}");
-    ASSERT_TRUE(stranger->GetUserInfoAndFetchToken(true, Text("ann"), UTF8String(), UTF8String(), UTF8String()));
-    ASSERT_TRUE(fake.WaitUntilIdle());
-    credentials.accessToken = stranger->GetAccessToken();
-    const auto refused = service.Client();
-    EXPECT_EQ(idtest::WaitForState([&](const tolmonetsync::ConnectionStateCallback& report) {
-                  return refused->SetCredentials(report, credentials);
-              }),
-              tolmonetsync::SyncServer_ConnectionFailed);
-    EXPECT_EQ(idtest::RootStatus(refused), 401);
+    const auto assets = service.Client();
+    EXPECT_EQ(testsupport::SetCredentials(assets, credentials), tolmonetsync::SyncServer_Connected);
+    EXPECT_EQ(testsupport::RootStatus(assets), 200);
 }
 
 }  // namespace

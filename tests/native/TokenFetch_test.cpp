@@ -4,6 +4,8 @@
 
 #include <gtest/gtest.h>
 
+#include <functional>
+
 #include "FakeOvraLibrary.h"
 #include "identity/OvraAuth.h"
 #include "support/TestScopes.h"
@@ -18,47 +20,11 @@ const char kFetch[] = "OVRA_fetchAccessToken";
 
 class NativeTokenFetch : public ::testing::Test {
 protected:
-    NativeTokenFetch() : mFake(FAKE_OVRA_LIB), mConnection(Connect(FAKE_OVRA_LIB)) {}
+    NativeTokenFetch() : mFake(LoadFake(FAKE_OVRA_LIB)), mConnection(Connect(FAKE_OVRA_LIB)) {}
 
-    // Fetches for the library's default user and waits for its callback.
-    bool FetchForDefaultUser(bool production)
-    {
-        const bool started =
-            mConnection->GetUserInfoAndFetchToken(production, UTF8String(), UTF8String(), UTF8String(), UTF8String());
-        EXPECT_TRUE(mFake.WaitUntilIdle());
-        return started;
-    }
-
-    FakeOvraLibrary mFake;
+    FakeOvraState& mFake;
     boost::shared_ptr<OvraConnection> mConnection;
 };
-
-TEST_F(NativeTokenFetch, DefaultUserGetsATokenDeliveredOnTheLibrarysThread)
-{
-    mFake.SetText(kUserInfo, "<UserInfo><UserID>u-42</UserID><Name>Ann</Name></UserInfo>");
-    mFake.SetText(kFetch, "{\"access_token\": \"tok-1\", \"email\": \"ann@example.test\", \"token_type\": \"bearer\"}");
-    mFake.HoldCallbacks(true);
-    EXPECT_EQ(mConnection->GetFetchState(), OvraConnection::kFetchState_None);
-    ASSERT_TRUE(mConnection->GetUserInfoAndFetchToken(true, UTF8String(), UTF8String(), UTF8String(), UTF8String()));
-    EXPECT_EQ(mConnection->GetFetchState(), OvraConnection::kFetchState_Fetching);
-    EXPECT_EQ(mConnection->GetUserID(), Text("u-42"));
-
-    mFake.HoldCallbacks(false);
-    ASSERT_TRUE(mFake.WaitUntilIdle());
-    EXPECT_EQ(mConnection->GetFetchState(), OvraConnection::kFetchState_Received);
-    EXPECT_EQ(mConnection->GetAccessToken(), Text("tok-1"));
-    EXPECT_EQ(mConnection->GetEmail(), Text("ann@example.test"));
-
-    // Production, the built-in client and its production secret, the default scope.
-    EXPECT_EQ(mFake.Argument("OVRA_createRef", 0), "context");
-    EXPECT_EQ(mFake.Argument("OVRA_createRef", 1), "1");
-    EXPECT_EQ(mFake.Argument(kUserInfo, 0), tolmonetsync::kTOLMO_OVRA_CLIENT_ID.ToStdString());
-    EXPECT_EQ(mFake.Argument(kFetch, 0), tolmonetsync::kTOLMO_OVRA_CLIENT_ID.ToStdString());
-    EXPECT_EQ(mFake.Argument(kFetch, 1), tolmonetsync::kTOLMO_OVRA_CLIENT_SECRET_GM.ToStdString());
-    EXPECT_EQ(mFake.Argument(kFetch, 2), "u-42");
-    EXPECT_EQ(mFake.Argument(kFetch, 3), "");
-    EXPECT_EQ(mFake.Argument(kFetch, 4), "openid,HalvaneID,pellucid");
-}
 
 TEST_F(NativeTokenFetch, StagingTakesTheStagingSecretAndGivenValuesPassAsTheyAre)
 {
@@ -78,66 +44,76 @@ TEST_F(NativeTokenFetch, StagingTakesTheStagingSecretAndGivenValuesPassAsTheyAre
     EXPECT_TRUE(mFake.WaitUntilIdle());
 }
 
-TEST_F(NativeTokenFetch, NoDefaultUserMeansTheFetchNeverStarts)
+// How each outcome of the library shows in the return value and the state.
+TEST_F(NativeTokenFetch, EachOutcomeOfTheLibraryShowsInTheFetchState)
 {
-    mFake.SetStatus(kUserInfo, 3);
-    EXPECT_FALSE(FetchForDefaultUser(true));
-    EXPECT_EQ(mConnection->GetFetchState(), OvraConnection::kFetchState_NotStarted);
-    EXPECT_EQ(mFake.Calls(kFetch), 0);
-}
-
-TEST_F(NativeTokenFetch, UserInfoWithoutItsClosingTagFetchesForAnEmptyUser)
-{
-    mFake.SetText(kUserInfo, "<UserInfo><UserID>u-42");
-    EXPECT_TRUE(FetchForDefaultUser(true));
-    EXPECT_EQ(mFake.Argument(kFetch, 2), "");
-    EXPECT_TRUE(mConnection->GetUserID().empty());
-}
-
-TEST_F(NativeTokenFetch, FailureReportedByTheCallbackIsState3)
-{
-    mFake.SetText(kFetch, "{\"access_token\": \"ignored\"}");
-    mFake.SetCallbackStatus(kFetch, 9);
-    EXPECT_TRUE(mConnection->GetUserInfoAndFetchToken(true, Text("ann"), UTF8String(), UTF8String(), UTF8String()));
-    ASSERT_TRUE(mFake.WaitUntilIdle());
-    EXPECT_EQ(mConnection->GetFetchState(), OvraConnection::kFetchState_Failed);
-    EXPECT_TRUE(mConnection->GetAccessToken().empty());
-}
-
-TEST_F(NativeTokenFetch, AFetchRefusedAtOnceStaysUnderWay)
-{
-    mFake.SetStatus(kFetch, 2);
-    EXPECT_FALSE(mConnection->GetUserInfoAndFetchToken(true, Text("ann"), UTF8String(), UTF8String(), UTF8String()));
-    EXPECT_EQ(mConnection->GetFetchState(), OvraConnection::kFetchState_Fetching);
-}
-
-TEST_F(NativeTokenFetch, TokenTextThatIsNotJsonLeavesState1AndIsTraced)
-{
+    struct Outcome {
+        const char* mLabel;
+        std::function<void(FakeOvraState&)> mScript;
+        bool mStarted;
+        int mState;
+        const char* mUserAsked;  // null: the token was never asked for
+        const char* mToken;
+    };
+    const Outcome outcomes[] = {
+        {"no default user", [](FakeOvraState& fake) { fake.SetStatus(kUserInfo, 3); }, false,
+         OvraConnection::kFetchState_NotStarted, nullptr, ""},
+        {"user info without its closing tag: an empty user",
+         [](FakeOvraState& fake) { fake.SetText(kUserInfo, "<UserInfo><UserID>u-42"); }, true,
+         OvraConnection::kFetchState_Received, "", "tok-1"},
+        {"token text that is not JSON", [](FakeOvraState& fake) { fake.SetText(kFetch, "<html>not json</html>"); },
+         true, OvraConnection::kFetchState_Fetching, "u-42", ""},
+        {"failure reported by the callback",
+         [](FakeOvraState& fake) {
+             fake.SetText(kFetch, "{\"access_token\": \"ignored\"}");
+             fake.SetCallbackStatus(kFetch, 9);
+         },
+         true, OvraConnection::kFetchState_Failed, "u-42", ""},
+        // A refusal at once stays under way: a host polling the state keeps waiting.
+        {"fetch refused at once", [](FakeOvraState& fake) { fake.SetStatus(kFetch, 2); }, false,
+         OvraConnection::kFetchState_Fetching, "u-42", ""},
+    };
     testsupport::TraceCapture trace("OvraConnection:1");
-    mFake.SetText(kUserInfo, "<UserID>u-42</UserID>");
-    mFake.SetText(kFetch, "<html>not json</html>");
-    EXPECT_TRUE(FetchForDefaultUser(true));
-    EXPECT_EQ(mConnection->GetFetchState(), OvraConnection::kFetchState_Fetching);
-    EXPECT_TRUE(mConnection->GetAccessToken().empty());
-    EXPECT_TRUE(trace.Contains("ParseAccessTokenDetails error: ")) << trace.Count() << " lines";
+    for (const Outcome& outcome : outcomes) {
+        SCOPED_TRACE(outcome.mLabel);
+        FakeOvraState& fake = LoadFake(FAKE_OVRA_LIB);
+        fake.SetText(kUserInfo, "<UserID>u-42</UserID>");
+        fake.SetStatus(kUserInfo, 0);
+        fake.SetStatus(kFetch, 0);
+        fake.SetCallbackStatus(kFetch, 0);
+        fake.SetText(kFetch, "{\"access_token\": \"tok-1\"}");
+        outcome.mScript(fake);
+        const int fetchesBefore = fake.Calls(kFetch);
+        auto connection = Connect(FAKE_OVRA_LIB);
+        EXPECT_EQ(connection->GetUserInfoAndFetchToken(true, UTF8String(), UTF8String(), UTF8String(), UTF8String()),
+                  outcome.mStarted);
+        ASSERT_TRUE(fake.WaitUntilIdle());
+        EXPECT_EQ(connection->GetFetchState(), outcome.mState);
+        EXPECT_EQ(connection->GetAccessToken(), Text(outcome.mToken));
+        EXPECT_EQ(fake.Calls(kFetch) - fetchesBefore, outcome.mUserAsked != nullptr ? 1 : 0);
+        if (outcome.mUserAsked != nullptr) {
+            EXPECT_EQ(fake.Argument(kFetch, 2), outcome.mUserAsked);
+        }
+    }
+    EXPECT_TRUE(trace.Contains("ParseAccessTokenDetails error: "));
 }
 
 TEST_F(NativeTokenFetch, AnObjectGoneBeforeItsCallbackIsLeftAlone)
 {
     mFake.SetText(kFetch, "{\"access_token\": \"late\"}");
     mFake.HoldCallbacks(true);
-    CompletionRecorder recorder;
+    Completions late;
     auto other = Connect(FAKE_OVRA_LIB);
     ASSERT_TRUE(mConnection->GetUserInfoAndFetchToken(true, Text("ann"), UTF8String(), UTF8String(), UTF8String()));
     ASSERT_TRUE(other->AsyncFetchAccessToken(true, Text("ann"), Text("cid"), Text("secret"), Text("scope"),
-                                             recorder.Function("late")));
+                                             Completion(late, "late")));
     mConnection.reset();
     other.reset();
 
     mFake.HoldCallbacks(false);
     ASSERT_TRUE(mFake.WaitUntilIdle());
     EXPECT_EQ(mFake.Calls(kFetch), 2);  // both callbacks were delivered...
-    EXPECT_EQ(recorder.Calls(), 0);     // ...and found nobody
+    EXPECT_EQ(late.Count(), 0u);        // ...and found nobody
 }
 
 }  // namespace

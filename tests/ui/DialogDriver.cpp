@@ -68,24 +68,4 @@ bool OkEnabled(UI_MessageBox& box)
     return !box.GetSpecificButton(kDialogResponse_OK)->IsDisabled();
 }
 
-RecordingOpener::RecordingOpener()
-{
-    mPrevious = tolmocore::utility::SetOpener([this](const UTF16String& url) {
-        std::lock_guard<std::mutex> lock(mMutex);
-        mOpened.push_back(url);
-        return true;
-    });
-}
-
-RecordingOpener::~RecordingOpener()
-{
-    tolmocore::utility::SetOpener(mPrevious);
-}
-
-std::vector<UTF16String> RecordingOpener::Opened()
-{
-    std::lock_guard<std::mutex> lock(mMutex);
-    return mOpened;
-}
-
 }  // namespace uitest

@@ -3,14 +3,11 @@
 // user from its thread through the modal loop.
 
 #include <functional>
-#include <mutex>
 #include <thread>
-#include <vector>
 
 #include <boost/intrusive_ptr.hpp>
 #include <boost/shared_ptr.hpp>
 
-#include "foundation/core/Opener.h"
 #include "foundation/ui/UI_HotTextButton.h"
 #include "foundation/ui/UI_MessageBox.h"
 #include "foundation/ui/UI_TextEdit.h"
@@ -68,18 +65,5 @@ boost::intrusive_ptr<UI_TextEdit> Edit(UI_MessageBox& box, const char* nodeID);
 boost::intrusive_ptr<UI_HotTextButton> Link(UI_MessageBox& box, const char* nodeID);
 UTF16String MessageText(UI_MessageBox& box);
 bool OkEnabled(UI_MessageBox& box);
-
-// Records what would have been opened in the browser while it lives.
-class RecordingOpener {
-public:
-    RecordingOpener();
-    ~RecordingOpener();
-    std::vector<UTF16String> Opened();
-
-private:
-    std::mutex mMutex;
-    std::vector<UTF16String> mOpened;
-    tolmocore::utility::Opener mPrevious;
-};
 
 }  // namespace uitest

@@ -20,26 +20,20 @@ protected:
     boost::intrusive_ptr<OS_View> mStage{new OS_View};
 };
 
-TEST_F(KelpView, ARectangleWithNoHeightBelowZeroChangesNothing)
+TEST_F(KelpView, TheStageViewGetsTheRectangleTruncatedAndNoHeightChangesNothing)
 {
-    mView->UI_SetLocalRectF(RectT<float>{0, 0, 100, 50});
+    mView->UI_SetLocalRectF(RectT<float>{10.7f, 20.2f, 300.9f, 400.5f});
+    EXPECT_EQ(mStage->UI_GetLocalRect(), (RectT<int>{10, 20, 300, 400}));
 
     mView->UI_SetLocalRectF(RectT<float>{5, 5, 200, 0});
     mView->UI_SetLocalRectF(RectT<float>{5, 5, 200, -3});
-    EXPECT_EQ(mView->UI_GetLocalRectF(), (RectT<float>{0, 0, 100, 50}));
-    EXPECT_EQ(mStage->UI_GetLocalRect(), (RectT<int>{0, 0, 100, 50}));
-}
-
-TEST_F(KelpView, TheStageViewGetsTheRectangleTruncated)
-{
-    mView->UI_SetLocalRectF(RectT<float>{10.7f, 20.2f, 300.9f, 400.5f});
     EXPECT_EQ(mView->UI_GetLocalRectF(), (RectT<float>{10.7f, 20.2f, 300.9f, 400.5f}));
     EXPECT_EQ(mStage->UI_GetLocalRect(), (RectT<int>{10, 20, 300, 400}));
 }
 
 TEST_F(KelpView, TheClipRectangleIsTheStageViewInWindowCoordinates)
 {
-    const boost::intrusive_ptr<tolmoui::UI_SubView> window(new tolmoui::UI_SubView());
+    boost::intrusive_ptr<tolmoui::UI_SubView> window(new tolmoui::UI_SubView());
     window->UI_SetLocalRectF(RectT<float>{100, 200, 900, 800});
     window->ChildPushBack(mView);
     mView->UI_SetLocalRectF(RectT<float>{30, 40, 530, 440});
@@ -50,10 +44,9 @@ TEST_F(KelpView, TheClipRectangleIsTheStageViewInWindowCoordinates)
     EXPECT_FALSE(list[0].first);
     // The stage view's rectangle (30, 40, ...) moved by the view's origin; the window's own place is not added.
     EXPECT_EQ(list[0].second, (RectT<float>{60, 80, 560, 480}));
-}
 
-TEST_F(KelpView, TheStageViewIsLetGoWithTheView)
-{
+    // The stage view is let go with the view.
+    window.reset();
     mView.reset();
     EXPECT_EQ(mStage->UI_GetParent(), nullptr);
 }

@@ -1,7 +1,7 @@
 // The sign-in window: its size, title and id, the host's view inside it, and
 // a window without a view.
 
-#include "WebSignInFixture.h"
+#include "WebSignInHarness.h"
 
 namespace {
 
@@ -34,61 +34,43 @@ TEST_F(WebSignIn, TheDialogSizeIsTheHostsOnlyWhenBothValuesArePositive)
     EXPECT_EQ(MerrowLoginDialogImpl::GetDialogSize(), (PointT<float>{800, 600}));
 }
 
-TEST_F(WebSignIn, TheDialogCarriesTheHostsViewOnItsWholeArea)
+// With the host's view the dialog carries it on its whole area; without one
+// (no getter, or a getter giving none) it still runs until closed by hand.
+TEST_F(WebSignIn, TheDialogCarriesTheHostsViewOrRunsWithoutOne)
 {
-    MerrowLoginExtensionInfo info;
     const boost::intrusive_ptr<tolmoui::OS_View> view = mStageView;
-    info.mViewGetter = [view](boost::intrusive_ptr<tolmoui::OS_View>& out) { out = view; };
-    info.mSizeGetter = [](PointT<int>& size) { size = PointT<int>{1024, 700}; };
-    SetMerrowLoginExtensionInfo(info);
-    Extension(boost::none);
-    SignInRun run(mRecorder);
-    const auto dialog = WaitForSignInDialog();
-    ASSERT_TRUE(dialog);
-
-    ASSERT_TRUE(tolmoui::RunInModalLoop(
-        [&] {
-            EXPECT_EQ(dialog->UI_GetLocalRectF(), (RectT<float>{0, 0, 1024, 700}));
-            EXPECT_EQ(tolmocore::utility::ToNarrow(dialog->GetTitle()), "Halvane Pellucid Authentication");
-            EXPECT_EQ(Text(dialog->UI_GetNodeID()), "MerrowLoginDialogImpl");
-            EXPECT_EQ(dialog->GetFlags(), 4);
-            EXPECT_TRUE(dialog->UI_IsShown());
-            EXPECT_TRUE(dialog->UI_HasKeyboardFocus());
-            EXPECT_EQ(dialog->UI_GetKeyboardFocusReason(), 3);
-
-            const boost::intrusive_ptr<KelpHTMLView> htmlView = dialog->GetHTMLView();
-            ASSERT_TRUE(htmlView);
-            EXPECT_EQ(htmlView->UI_GetParent(), dialog->GetContentContainer());
-            EXPECT_TRUE(htmlView->UI_IsShown());
-            EXPECT_EQ(mStageView->UI_GetParent(), htmlView.get());
-            EXPECT_TRUE(mStageView->UI_IsShown());
-            EXPECT_EQ(mStageView->UI_GetLocalRect(), (RectT<int>{0, 0, 1024, 700}));
-            EXPECT_EQ(htmlView->UI_GetLocalRectF(), (RectT<float>{0, 0, 1024, 700}));
-        },
-        kWaitMs));
-    ASSERT_TRUE(CloseByHand());
-    EXPECT_FALSE(run.Result());
-}
-
-TEST_F(WebSignIn, WithoutAViewTheDialogStillRunsUntilClosedByHand)
-{
-    for (const bool getterGivesNull : {false, true}) {
-        if (getterGivesNull) {
-            MerrowLoginExtensionInfo info;
-            info.mViewGetter = [](boost::intrusive_ptr<tolmoui::OS_View>&) {};
-            SetMerrowLoginExtensionInfo(info);
-        } else {
-            GiveNoViewGetter();
-        }
+    const std::function<void(boost::intrusive_ptr<tolmoui::OS_View>&)> getters[] = {
+        [view](boost::intrusive_ptr<tolmoui::OS_View>& out) { out = view; },
+        nullptr,
+        [](boost::intrusive_ptr<tolmoui::OS_View>&) {},
+    };
+    for (int row = 0; row < 3; ++row) {
+        SCOPED_TRACE(row);
+        const bool withView = row == 0;
+        MerrowLoginExtensionInfo info;
+        if (getters[row]) info.mViewGetter = getters[row];
+        if (withView) info.mSizeGetter = [](PointT<int>& size) { size = PointT<int>{1024, 700}; };
+        SetMerrowLoginExtensionInfo(info);
         Extension(boost::none);
         SignInRun run(mRecorder);
         const auto dialog = WaitForSignInDialog();
         ASSERT_TRUE(dialog);
         ASSERT_TRUE(tolmoui::RunInModalLoop(
             [&] {
-                EXPECT_FALSE(dialog->GetHTMLView());
-                EXPECT_TRUE(dialog->GetContentContainer()->GetChildren().empty());
-                EXPECT_EQ(dialog->UI_GetLocalRectF(), (RectT<float>{0, 0, 800, 600}));
+                EXPECT_EQ(tolmocore::utility::ToNarrow(dialog->GetTitle()), "Halvane Pellucid Authentication");
+                EXPECT_TRUE(dialog->UI_IsShown() && dialog->UI_HasKeyboardFocus());
+                const boost::intrusive_ptr<KelpHTMLView> htmlView = dialog->GetHTMLView();
+                ASSERT_EQ(bool(htmlView), withView);
+                if (!withView) {
+                    EXPECT_TRUE(dialog->GetContentContainer()->GetChildren().empty());
+                    EXPECT_EQ(dialog->UI_GetLocalRectF(), (RectT<float>{0, 0, 800, 600}));
+                    return;
+                }
+                EXPECT_EQ(dialog->UI_GetLocalRectF(), (RectT<float>{0, 0, 1024, 700}));
+                EXPECT_EQ(htmlView->UI_GetParent(), dialog->GetContentContainer());
+                EXPECT_EQ(mStageView->UI_GetParent(), htmlView.get());
+                EXPECT_TRUE(htmlView->UI_IsShown() && mStageView->UI_IsShown());
+                EXPECT_EQ(mStageView->UI_GetLocalRect(), (RectT<int>{0, 0, 1024, 700}));
             },
             kWaitMs));
         ASSERT_TRUE(CloseByHand());

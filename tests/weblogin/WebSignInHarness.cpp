@@ -1,10 +1,7 @@
 #include "WebSignInHarness.h"
 
-#include <chrono>
-
 #include <boost/json.hpp>
 
-#include "foundation/net/HeaderConstants.h"
 #include "foundation/tessel/TesselHost.h"
 #include "identity/OvraAuth.h"
 
@@ -40,55 +37,12 @@ std::string TokenEvent(const std::string& token, const std::string& userID, cons
     return boost::json::serialize(event);
 }
 
-MerrowCredentialsCallback CredentialsRecorder::Callback()
-{
-    return [this](const OvraCredentials credentials) {
-        const bool onHost = tessel::TesselHost::Get().OnHostThread();
-        {
-            std::lock_guard<std::mutex> lock(mMutex);
-            ++mCalls;
-            mLast = credentials;
-            mLastThread = std::this_thread::get_id();
-            mLastOnHostThread = onHost;
-        }
-        mCalled.notify_all();
-    };
-}
-
-bool CredentialsRecorder::WaitForCalls(int count, int milliseconds)
-{
-    std::unique_lock<std::mutex> lock(mMutex);
-    return mCalled.wait_for(lock, std::chrono::milliseconds(milliseconds), [&] { return mCalls >= count; });
-}
-
-int CredentialsRecorder::Calls()
-{
-    std::lock_guard<std::mutex> lock(mMutex);
-    return mCalls;
-}
-
-OvraCredentials CredentialsRecorder::Last()
-{
-    std::lock_guard<std::mutex> lock(mMutex);
-    return mLast;
-}
-
-std::thread::id CredentialsRecorder::LastThread()
-{
-    std::lock_guard<std::mutex> lock(mMutex);
-    return mLastThread;
-}
-
-bool CredentialsRecorder::LastOnExtensionHostThread()
-{
-    std::lock_guard<std::mutex> lock(mMutex);
-    return mLastOnHostThread;
-}
-
-SignInRun::SignInRun(CredentialsRecorder& recorder, OvraAuth_Scheme scheme, const std::string& clientID,
+SignInRun::SignInRun(const CredentialsRecorder& recorder, OvraAuth_Scheme scheme, const std::string& clientID,
                      const std::string& locale)
 {
-    const MerrowCredentialsCallback callback = recorder.Callback();
+    const MerrowCredentialsCallback callback = [recorder](const OvraCredentials credentials) {
+        recorder.Add(Delivered{credentials, std::this_thread::get_id(), tessel::TesselHost::Get().OnHostThread()});
+    };
     mThread = std::thread([this, callback, scheme, clientID, locale] {
         mResult = DoMerrowLoginDialog(nullptr, nullptr, Text(clientID), callback, Text(locale), scheme);
     });
@@ -130,16 +84,54 @@ bool LauncherGoneAfter(const tessel::ScriptedExtension& extension, int unloadedE
     return extension.WaitForUnloadedEvents(unloadedEvents, kWaitMs) && !CurrentMerrowExtensionLauncher();
 }
 
-std::string SignInToken(idtest::IdentityService& service)
+void WebSignIn::SetUp()
 {
-    return Text(service.SignIn("ann", "secret").mAnswer.access_token);
+    GiveStageView();
 }
 
-bool Connects(const boost::shared_ptr<tarnvault::Tarnvault>& client, const OvraCredentials& credentials)
+void WebSignIn::TearDown()
 {
-    return idtest::WaitForState([&](const ConnectionStateCallback& callback) {
-               return client->SetCredentials(callback, credentials);
-           }) == SyncServer_Connected;
+    // Every unloaded event of this test is delivered before the next test's
+    // launcher could meet it.
+    tessel::FlushHost(kWaitMs);
+    if (mExtension) {
+        mExtension->ReleaseUnloaded();
+        mExtension->WaitForUnloadedEvents(mExtension->Unloads(), kWaitMs);
+    }
+    // A test that failed half way may leave a launcher behind.
+    boost::atomic_store(&sMerrowExtensionLauncher, boost::shared_ptr<MerrowExtensionLauncher>());
+    tessel::UnregisterExtension(kMerrowExtensionID);
+    GiveNoViewGetter();
+}
+
+void WebSignIn::GiveStageView()
+{
+    MerrowLoginExtensionInfo info;
+    const boost::intrusive_ptr<tolmoui::OS_View> view = mStageView;
+    info.mViewGetter = [view](boost::intrusive_ptr<tolmoui::OS_View>& out) { out = view; };
+    SetMerrowLoginExtensionInfo(info);
+}
+
+void WebSignIn::GiveNoViewGetter()
+{
+    MerrowLoginExtensionInfo none;
+    SetMerrowLoginExtensionInfo(none);
+}
+
+tessel::ScriptedExtension& WebSignIn::Extension(const boost::optional<std::string>& answer, bool holdUnloaded)
+{
+    mExtension = RegisterSignInExtension(answer, holdUnloaded);
+    return *mExtension;
+}
+
+boost::intrusive_ptr<MerrowLoginDialogImpl> WebSignIn::OpenAndInitialise(int nth)
+{
+    const boost::intrusive_ptr<MerrowLoginDialogImpl> dialog = WaitForSignInDialog();
+    if (!dialog) return dialog;
+    mExtension->SendReady();
+    if (!mExtension->WaitForInitialization(nth, kWaitMs)) return boost::intrusive_ptr<MerrowLoginDialogImpl>();
+    tessel::FlushHost(kWaitMs);
+    return dialog;
 }
 
 }  // namespace weblogin

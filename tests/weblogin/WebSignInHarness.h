@@ -1,21 +1,21 @@
 #pragma once
 // The web sign-in as a host drives it, for tests: a scripted sign-in
 // extension, a thread standing for the host's UI thread that runs the
-// dialog, a recorder of the credentials callback, and the local service's
-// tokens for the profile request and for proving the credentials.
+// dialog, and what the credentials callback was given; the fixture of the
+// sign-in tests, which clears whatever a test left of the flow.
 
-#include <condition_variable>
 #include <memory>
-#include <mutex>
 #include <string>
 #include <thread>
+
+#include <gtest/gtest.h>
 
 #include <boost/optional.hpp>
 #include <boost/shared_ptr.hpp>
 
-#include "IdentityService.h"
 #include "identity/dialogs/MerrowLoginDialog.h"
 #include "identity/dialogs/MerrowLoginDialogImpl.h"
+#include "support/CallRecorder.h"
 #include "support/TesselScriptedExtension.h"
 #include "support/UI_Automation.h"
 #include "tarnvault/Tarnvault.h"
@@ -41,28 +41,17 @@ boost::shared_ptr<tessel::ScriptedExtension> RegisterSignInExtension(const boost
 std::string TokenEvent(const std::string& token, const std::string& userID, const std::string& email);
 
 // What the credentials callback was given, and where.
-class CredentialsRecorder {
-public:
-    MerrowCredentialsCallback Callback();
-    bool WaitForCalls(int count, int milliseconds);
-    int Calls();
-    OvraCredentials Last();
-    std::thread::id LastThread();
-    bool LastOnExtensionHostThread();
-
-private:
-    std::mutex mMutex;
-    std::condition_variable mCalled;
-    int mCalls = 0;
-    OvraCredentials mLast;
-    std::thread::id mLastThread;
-    bool mLastOnHostThread = false;
+struct Delivered {
+    OvraCredentials mCredentials;
+    std::thread::id mThread;
+    bool mOnExtensionHostThread = false;
 };
+using CredentialsRecorder = testsupport::CallRecorder<Delivered>;
 
 // One DoMerrowLoginDialog on a thread of its own, the host's UI thread.
 class SignInRun {
 public:
-    explicit SignInRun(CredentialsRecorder& recorder, OvraAuth_Scheme scheme = OvraAuth_GM,
+    explicit SignInRun(const CredentialsRecorder& recorder, OvraAuth_Scheme scheme = OvraAuth_GM,
                        const std::string& clientID = "web-tests", const std::string& locale = "en_US");
     ~SignInRun();
     // What DoMerrowLoginDialog returned; waits for it.
@@ -83,9 +72,26 @@ bool CloseByHand();
 // the launcher is gone.
 bool LauncherGoneAfter(const tessel::ScriptedExtension& extension, int unloadedEvents);
 
-// A real access token of ann's from the local service (ann@example.test).
-std::string SignInToken(idtest::IdentityService& service);
-// SetCredentials on the client; true once it reports a connection.
-bool Connects(const boost::shared_ptr<tarnvault::Tarnvault>& client, const OvraCredentials& credentials);
+class WebSignIn : public ::testing::Test {
+protected:
+    void SetUp() override;
+    void TearDown() override;
+
+    // The host gives mStageView as the extension's view.
+    void GiveStageView();
+    void GiveNoViewGetter();
+
+    // Registers the sign-in extension for this test.
+    tessel::ScriptedExtension& Extension(const boost::optional<std::string>& answer, bool holdUnloaded = false);
+
+    // Waits for the dialog, lets the extension say it is ready, waits for
+    // the `nth` initialisation and until the extension's answer to it has
+    // reached the listeners. Null if the dialog never came.
+    boost::intrusive_ptr<MerrowLoginDialogImpl> OpenAndInitialise(int nth = 1);
+
+    boost::intrusive_ptr<tolmoui::OS_View> mStageView{new tolmoui::OS_View};
+    boost::shared_ptr<tessel::ScriptedExtension> mExtension;
+    CredentialsRecorder mRecorder;
+};
 
 }  // namespace weblogin
