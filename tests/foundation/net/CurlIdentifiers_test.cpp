@@ -120,18 +120,15 @@ TEST_F(CurlIdentifiersTest, LiveIdentifierIsRefusedAndFreeAgainOnceCancelled)
     ExpectCancelled(responses[0]);
     EXPECT_EQ(responses[1].mResponse->status, 200);
     EXPECT_EQ(mServer.RequestsReceived(), 2u);
-}
 
-TEST_F(CurlIdentifiersTest, CancelRightAfterStartReportsCancelled)
-{
-    constexpr size_t kRequests = 40;
-    for (size_t i = 0; i < kRequests; ++i) {
-        const Guid requestUID = Guid::CreateUnique();
-        ASSERT_TRUE(Get(requestUID, "/hang", mRecorder.Handler()));
-        mProcessor->TryToCancelRequest(requestUID);
+    // Cancelled right after the start, before it may have left.
+    for (int i = 0; i < 40; ++i) {
+        const Guid quick = Guid::CreateUnique();
+        ASSERT_TRUE(Get(quick, "/hang", mRecorder.Handler()));
+        mProcessor->TryToCancelRequest(quick);
     }
-    ASSERT_TRUE(mRecorder.WaitFor(kRequests));
-    for (const auto& recorded : mRecorder.Responses()) ExpectCancelled(recorded);
+    ASSERT_TRUE(mRecorder.WaitFor(42));
+    for (size_t i = 2; i < 42; ++i) ExpectCancelled(mRecorder.Responses().at(i));
 }
 
 TEST_F(CurlIdentifiersTest, CallAsynchronouslyRunsOnTheCompletionThreadAfterItsDelay)
