@@ -77,29 +77,33 @@ CurlProcessorSettings ShortStall()
     return settings;
 }
 
+using Send = std::function<bool(const Guid&, ResponseHandler, const ImmutableString&)>;
+
+Send GetWith(RequestProcessor& processor, const HeaderList& headers = HeaderList())
+{
+    return [&processor, headers](const Guid& id, ResponseHandler handler, const ImmutableString& url) {
+        return processor.GET(id, handler, url, headers, Configuration());
+    };
+}
+
 class CurlRequestsTest : public ::testing::Test {
 protected:
-    // Sends with `send` and gives the response its handler got, on the completion thread.
-    boost::shared_ptr<Response> Answer(RequestProcessor& processor, const std::function<bool(ResponseHandler)>& send)
+    // Sends with `send` under a fresh identifier; the response its one handler call got.
+    static boost::shared_ptr<Response> Answer(RequestProcessor& processor, const Send& send, const std::string& url)
     {
         testsupport::ResponseRecorder recorder(processor);
-        EXPECT_TRUE(send(recorder.Handler()));
+        const Guid requestUID = Guid::CreateUnique();
+        EXPECT_TRUE(send(requestUID, recorder.Handler(), ImmutableString::CreateDynamic(url)));
         if (!recorder.WaitFor(1)) return boost::make_shared<Response>();
-        EXPECT_TRUE(recorder.Responses().at(0).mOnCompletionThread);
-        return recorder.Responses().at(0).mResponse;
-    }
-    boost::shared_ptr<Response> Get(RequestProcessor& processor, const std::string& url, const HeaderList& headers = {},
-                                    const Configuration& configuration = Configuration())
-    {
-        return Answer(processor, [&](ResponseHandler handler) {
-            return processor.GET(Guid::CreateUnique(), handler, ImmutableString::CreateDynamic(url), headers,
-                                 configuration);
-        });
+        const testsupport::RecordedResponse got = recorder.Responses().at(0);
+        EXPECT_EQ(got.mRequestUID, requestUID);
+        EXPECT_TRUE(got.mOnCompletionThread);
+        return got.mResponse;
     }
     // The line a handler gets for a request with no HTTP answer.
-    std::string FailureText(RequestProcessor& processor, const std::string& url)
+    static std::string FailureText(RequestProcessor& processor, const std::string& url)
     {
-        const boost::shared_ptr<Response> response = Get(processor, url);
+        const boost::shared_ptr<Response> response = Answer(processor, GetWith(processor), url);
         EXPECT_EQ(response->status, kStatusNoResponse);
         const std::string text = response->BodyText().ToStdString();
         EXPECT_FALSE(text.empty());
@@ -124,7 +128,6 @@ TEST_F(CurlRequestsTest, EachVerbSendsItsMethodBodyAndContentTypeAndGetsStatusAn
     std::string large(4u << 20, '\0');
     std::mt19937 random(7);
     for (char& byte : large) byte = static_cast<char>(random());
-    using Send = std::function<bool(const Guid&, ResponseHandler, const ImmutableString&)>;
     struct Row {
         const char* mMethod;
         Send mSend;
@@ -156,30 +159,21 @@ TEST_F(CurlRequestsTest, EachVerbSendsItsMethodBodyAndContentTypeAndGetsStatusAn
     for (const Row& row : rows) {
         SCOPED_TRACE(std::string(row.mMethod) + " " + row.mContentType);
         for (const int status : {200, 404}) {
-            const Guid requestUID = Guid::CreateUnique();
-            testsupport::ResponseRecorder recorder(processor);
-            const ImmutableString url =
-                ImmutableString::CreateDynamic(mServer.Url("/status/" + std::to_string(status)));
-            ASSERT_TRUE(row.mSend(requestUID, recorder.Handler(), url));
-            ASSERT_TRUE(recorder.WaitFor(1));
-            const testsupport::RecordedResponse got = recorder.Responses().at(0);
-            EXPECT_EQ(got.mRequestUID, requestUID);
-            EXPECT_EQ(got.mResponse->status, status);
-            EXPECT_EQ(HeaderValue(*got.mResponse, "ETAG"), "\"v1\"") << "header names arrive in capitals";
-            EXPECT_EQ(HeaderValue(*got.mResponse, "X-METHOD"), row.mMethod);
-            EXPECT_EQ(HeaderValue(*got.mResponse, "X-REQUEST-CONTENT-TYPE"), row.mContentType);
-            EXPECT_EQ(HeaderValue(*got.mResponse, "X-REQUEST-LENGTH"), row.mLength);
-            EXPECT_EQ(HeaderValue(*got.mResponse, "X-REQUEST-EXPECT"), "no");
-            EXPECT_EQ(got.mResponse->BodyText().ToStdString(), row.mBody);
-            EXPECT_EQ(!got.mResponse->body, row.mBody.empty()) << "an empty body arrives as no body";
+            const boost::shared_ptr<Response> got =
+                Answer(processor, row.mSend, mServer.Url("/status/" + std::to_string(status)));
+            EXPECT_EQ(got->status, status);
+            EXPECT_EQ(HeaderValue(*got, "ETAG"), "\"v1\"") << "header names arrive in capitals";
+            EXPECT_EQ(HeaderValue(*got, "X-METHOD"), row.mMethod);
+            EXPECT_EQ(HeaderValue(*got, "X-REQUEST-CONTENT-TYPE"), row.mContentType);
+            EXPECT_EQ(HeaderValue(*got, "X-REQUEST-LENGTH"), row.mLength);
+            EXPECT_EQ(HeaderValue(*got, "X-REQUEST-EXPECT"), "no");
+            EXPECT_EQ(got->BodyText().ToStdString(), row.mBody);
+            EXPECT_EQ(!got->body, row.mBody.empty()) << "an empty body arrives as no body";
         }
         // A refused connection, or a hang-up before the whole body (which HEAD never waits for), is no answer.
         for (const std::string& url : {"http://127.0.0.1:" + std::to_string(port) + "/x", mServer.Url("/hang-up")}) {
-            const boost::shared_ptr<Response> response = Answer(processor, [&](ResponseHandler handler) {
-                return row.mSend(Guid::CreateUnique(), handler, ImmutableString::CreateDynamic(url));
-            });
             const bool complete = row.mMethod == std::string("HEAD") && url == mServer.Url("/hang-up");
-            EXPECT_EQ(response->status, complete ? 200 : kStatusNoResponse) << url;
+            EXPECT_EQ(Answer(processor, row.mSend, url)->status, complete ? 200 : kStatusNoResponse) << url;
         }
     }
 }
@@ -210,10 +204,12 @@ TEST_F(CurlRequestsTest, AnswerIsBoundedOrStreamedAsTheRequestAsks)
         Configuration configuration;
         configuration.mMaxResponseBody = bound;
         configuration.mBodySink = sink;
-        return Answer(*mProcessor, [&](ResponseHandler handler) {
-            return mProcessor->PUT(Guid::CreateUnique(), handler, ImmutableString::CreateDynamic(mServer.Url(target)),
-                                   Bytes(body), HeaderList(), configuration);
-        });
+        return Answer(
+            *mProcessor,
+            [&](const Guid& id, ResponseHandler handler, const ImmutableString& url) {
+                return mProcessor->PUT(id, handler, url, Bytes(body), HeaderList(), configuration);
+            },
+            mServer.Url(target));
     };
     EXPECT_EQ(send("/at", 1000, nullptr)->BodyText().ToStdString(), body);
     const boost::shared_ptr<Response> past = send("/past", 999, nullptr);
@@ -243,7 +239,7 @@ TEST_F(CurlRequestsTest, TraceLinesShowNeitherTheAuthorizationNorTheQuery)
     testsupport::TraceCapture trace("tolmonetsync:8");
     HeaderList headers;
     headers.emplace(ImmutableString::CreateStatic("Authorization"), ImmutableString::CreateStatic("Bearer SECRET-1"));
-    EXPECT_EQ(Get(*mProcessor, mServer.Url("/private?token=SECRET-2"), headers)->status, 200);
+    EXPECT_EQ(Answer(*mProcessor, GetWith(*mProcessor, headers), mServer.Url("/private?token=SECRET-2"))->status, 200);
     EXPECT_GE(trace.CountWith("/private"), 2u) << "the request and its answer are traced";
     EXPECT_EQ(trace.CountWith("SECRET"), 0u);
 }
