@@ -12,24 +12,19 @@
 
 using namespace tolmocore;
 
-TEST(Localizer, DefaultTextAfterTheEqualsSign)
-{
-    config::Localizer& localizer = config::Localizer::Get();
-    EXPECT_EQ(localizer.Localize("$$$/tolmonetsync/Login/Title=Sign In"), UTF16String(u"Sign In"));
-    EXPECT_EQ(localizer.Localize("$$$/tolmonetsync/Empty="), UTF16String());
-    EXPECT_EQ(localizer.Localize("$$$/tolmonetsync/Math=1 + 1 = 2"), UTF16String(u"1 + 1 = 2"));
-    EXPECT_EQ(localizer.Localize("plain text"), UTF16String(u"plain text"));
-    EXPECT_EQ(localizer.Localize(nullptr), UTF16String());
-}
-
-TEST(Localizer, InstalledTranslationWinsForItsKeyOnly)
+TEST(Localizer, DefaultTextAfterTheEqualsSignUnlessATranslationIsInstalledForTheKey)
 {
     config::Localizer& localizer = config::Localizer::Get();
     localizer.AddTranslations({{"tolmonetsync/Login/Title", UTF16String(u"Anmelden")}});
-    EXPECT_EQ(localizer.Localize("$$$/tolmonetsync/Login/Title=Sign In"), UTF16String(u"Anmelden"));
-    EXPECT_EQ(localizer.Localize("$$$/tolmonetsync/Login/Other=Other"), UTF16String(u"Other"));
+    const std::pair<const char*, const char16_t*> rows[] = {{"$$$/tolmonetsync/Login/Title=Sign In", u"Anmelden"},
+                                                            {"$$$/tolmonetsync/Login/Other=Other", u"Other"},
+                                                            {"$$$/tolmonetsync/Empty=", u""},
+                                                            {"$$$/tolmonetsync/Math=1 + 1 = 2", u"1 + 1 = 2"},
+                                                            {"plain text", u"plain text"},
+                                                            {nullptr, u""}};
+    for (const auto& row : rows) EXPECT_EQ(localizer.Localize(row.first), UTF16String(row.second));
     localizer.ClearTranslations();
-    EXPECT_EQ(localizer.Localize("$$$/tolmonetsync/Login/Title=Sign In"), UTF16String(u"Sign In"));
+    EXPECT_EQ(localizer.Localize(rows[0].first), UTF16String(u"Sign In"));
 }
 
 TEST(HostConfig, AReferenceHeldByAReaderSurvivesALateSetter)
@@ -73,33 +68,20 @@ TEST(ThrowError, AMessageOfTheWrongKindRaisesTheLocalisedConversionError)
     }
 }
 
-class OpenerTest : public ::testing::Test {
-protected:
-    void SetUp() override
-    {
-        utility::SetOpener([this](const UTF16String& target) {
-            mOpened.push_back(utility::ToNarrow(target));
-            return mAnswer;
-        });
-    }
-    void TearDown() override { utility::SetOpener(utility::Opener()); }
-
-    std::vector<std::string> mOpened;
-    bool mAnswer = true;
-};
-
-TEST_F(OpenerTest, BrowserGetsASchemeWhenTheTextHasNone)
+TEST(Opener, BrowserGetsASchemeWhenTheTextHasNoneAndFailuresAreReported)
 {
+    std::vector<std::string> opened;
+    bool answer = true;
+    utility::SetOpener([&](const UTF16String& target) {
+        opened.push_back(utility::ToNarrow(target));
+        return answer;
+    });
     EXPECT_TRUE(utility::OpenURLInDefaultBrowser(UTF16String(u"example.test/login")));
     EXPECT_TRUE(utility::OpenURLInDefaultBrowser(UTF16String(u"https://example.test/a?b=c")));
-    EXPECT_EQ(mOpened, (std::vector<std::string>{"http://example.test/login", "https://example.test/a?b=c"}));
-}
-
-TEST_F(OpenerTest, EmptyTextOpensNothingAndFailuresAreReported)
-{
     EXPECT_FALSE(utility::OpenURLInDefaultBrowser(UTF16String()));
-    EXPECT_TRUE(mOpened.empty());
-    mAnswer = false;
+    answer = false;
     EXPECT_FALSE(utility::OpenFileInDefaultApplication(UTF16String(u"/tmp/file.txt")));
-    EXPECT_EQ(mOpened.size(), 1u);
+    utility::SetOpener(utility::Opener());
+    EXPECT_EQ(opened,
+              (std::vector<std::string>{"http://example.test/login", "https://example.test/a?b=c", "/tmp/file.txt"}));
 }

@@ -27,13 +27,15 @@ protected:
     std::filesystem::path mStore = mPrefDir / "keychain.store";
 };
 
-TEST_F(KeychainTest, PasswordsRoundTripWhateverTheirText)
+TEST_F(KeychainTest, PasswordsRoundTripWhateverTheirTextInAPrivateStore)
 {
     const UTF16String domain(u"Tarnvault\tÉdition 9.0"), account(u"jöhn\\doe\n");
     const UTF16String password(u"p\u00e4ss\r\n\t\\t wörd \U0001F511");
-    EXPECT_EQ(Keychain::GetPassword(domain, account), UTF16String());
+    const mode_t oldMask = ::umask(0);
     EXPECT_TRUE(Keychain::SetPassword(domain, account, password));
+    std::filesystem::permissions(mStore, static_cast<std::filesystem::perms>(0644));
     EXPECT_TRUE(Keychain::SetPassword(domain, u"other", u"second"));
+    ::umask(oldMask);
     EXPECT_EQ(Keychain::GetPassword(domain, account), password);
     EXPECT_EQ(Keychain::GetPassword(domain, u"other"), UTF16String(u"second"));
     EXPECT_EQ(Keychain::GetPassword(u"Tarnvault", account), UTF16String());
@@ -41,45 +43,29 @@ TEST_F(KeychainTest, PasswordsRoundTripWhateverTheirText)
     EXPECT_TRUE(Keychain::SetPassword(domain, account, u"replaced"));
     EXPECT_EQ(Keychain::GetPassword(domain, account), UTF16String(u"replaced"));
     EXPECT_TRUE(Keychain::RemovePassword(domain, account));
-    EXPECT_EQ(Keychain::GetPassword(domain, account), UTF16String());
     EXPECT_TRUE(Keychain::RemovePassword(domain, account));
+    EXPECT_EQ(Keychain::GetPassword(domain, account), UTF16String());
     EXPECT_EQ(Keychain::GetPassword(domain, u"other"), UTF16String(u"second"));
-}
 
-TEST_F(KeychainTest, StoreIsReadableByTheUserAloneWhateverTheUmask)
-{
-    const mode_t oldMask = ::umask(0);
-    EXPECT_TRUE(Keychain::SetPassword(u"d", u"a", u"secret"));
-    std::filesystem::permissions(mStore, static_cast<std::filesystem::perms>(0644));
-    EXPECT_TRUE(Keychain::SetPassword(u"d", u"b", u"secret"));
-    ::umask(oldMask);
     struct stat info;
     ASSERT_EQ(::stat(mStore.c_str(), &info), 0);
-    EXPECT_EQ(info.st_mode & 07777, 0600u);
-    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(mPrefDir), {}), 1);
-    ASSERT_EQ(::stat(mPrefDir.c_str(), &info), 0);  // made by the first write
+    EXPECT_EQ(info.st_mode & 07777, 0600u) << "whatever the umask, and rewritten private";
+    ASSERT_EQ(::stat(mPrefDir.c_str(), &info), 0);
     EXPECT_EQ(info.st_mode & 07777, 0700u);
+    EXPECT_EQ(std::distance(std::filesystem::directory_iterator(mPrefDir), {}), 1) << "no temporary left";
 }
 
 TEST_F(KeychainTest, DamagedStoreKeepsWhatCanStillBeRead)
 {
     std::filesystem::create_directories(mPrefDir);
-    WriteFileBytes(mStore, std::string("tolmonetsync keychain store 1\n"
-                                       "d\ta\tgood\n"
-                                       "garbage without tabs\n"
-                                       "d\tbad\tunknown \\q escape\n"
-                                       "d\tbad2\t\xff\xfe not utf-8\n"
-                                       "d\tb\tgood too\n"
-                                       "d\tcut\tpartial pass"));
-    EXPECT_EQ(Keychain::GetPassword(u"d", u"a"), UTF16String(u"good"));
-    EXPECT_EQ(Keychain::GetPassword(u"d", u"b"), UTF16String(u"good too"));
-    EXPECT_EQ(Keychain::GetPassword(u"d", u"bad"), UTF16String());
-    EXPECT_EQ(Keychain::GetPassword(u"d", u"cut"), UTF16String());
-
+    WriteFileBytes(mStore,
+                   "tolmonetsync keychain store 1\nd\ta\tgood\ngarbage without tabs\n"
+                   "d\tbad\tunknown \\q escape\nd\tbad2\t\xff\xfe not utf-8\nd\tb\tgood too\n"
+                   "d\tcut\tpartial pass");
     EXPECT_TRUE(Keychain::SetPassword(u"d", u"c", u"new"));
-    EXPECT_EQ(Keychain::GetPassword(u"d", u"a"), UTF16String(u"good"));
-    EXPECT_EQ(Keychain::GetPassword(u"d", u"b"), UTF16String(u"good too"));
-    EXPECT_EQ(Keychain::GetPassword(u"d", u"c"), UTF16String(u"new"));
+    const std::pair<const char16_t*, const char16_t*> expected[] = {
+        {u"a", u"good"}, {u"b", u"good too"}, {u"c", u"new"}, {u"bad", u""}, {u"bad2", u""}, {u"cut", u""}};
+    for (const auto& entry : expected) EXPECT_EQ(Keychain::GetPassword(u"d", entry.first), UTF16String(entry.second));
 }
 
 TEST_F(KeychainTest, UnreadableStoreIsNeverOverwritten)

@@ -1,58 +1,31 @@
-// Trace configuration, the guard of each statement, and the line format.
+// Which statements trace, and where the lines may go.
 
 #include <gtest/gtest.h>
-
-#include <cstdio>
-#include <filesystem>
-#include <mutex>
-#include <regex>
-#include <thread>
-#include <vector>
 
 #include <fcntl.h>
 #include <unistd.h>
 
+#include <cstdio>
+#include <filesystem>
+#include <thread>
+#include <vector>
+
 #include "foundation/core/Trace.h"
-#include "support/TempDir.h"
+#include "support/TestScopes.h"
 
 using namespace tolmocore::debug;
+namespace fs = std::filesystem;
 
 namespace {
-
-// Collects lines through the listener; restores a silent configuration after.
-class TraceTest : public ::testing::Test {
-protected:
-    void SetUp() override
-    {
-        SetTraceFile("/dev/null");  // keep stderr quiet; the listener still sees lines
-        SetTraceListener([this](const std::string& line) {
-            std::lock_guard<std::mutex> lock(mMutex);
-            mLines.push_back(line);
-        });
-    }
-    void TearDown() override
-    {
-        SetTraceListener(TraceListener());
-        SetTraceSpec("");
-        SetTraceFile("");
-    }
-    std::vector<std::string> Lines()
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        return mLines;
-    }
-
-    std::mutex mMutex;
-    std::vector<std::string> mLines;
-};
 
 int sBuilt = 0;
 int Counted(int value)
 {
-    ++sBuilt;
-    return value;
+    return ++sBuilt, value;
 }
 
+// One statement whose level is computed at run time: it keeps the answer for
+// the level it saw first after the configuration last changed.
 void TraceAtLevel(int level)
 {
     TOLMO_TRACE("Tarnvault", level, "level " << level);
@@ -60,72 +33,37 @@ void TraceAtLevel(int level)
 
 }  // namespace
 
-TEST_F(TraceTest, OffByDefaultAndBuildsNoTextWhenOff)
+TEST(Trace, LevelsPerCategoryAndTheGuardFollowsEveryChange)
 {
-    SetTraceSpec("");
-    sBuilt = 0;
+    testsupport::TraceCapture trace("");
     TOLMO_TRACE("tolmonetsync", 1, "value " << Counted(1));
-    EXPECT_EQ(sBuilt, 0);
-    EXPECT_TRUE(Lines().empty());
-}
+    EXPECT_EQ(sBuilt, 0) << "no text is built while tracing is off";
 
-TEST_F(TraceTest, LineHasThreadCategoryLevelAndMessage)
-{
-    SetTraceSpec("8");
-    TOLMO_TRACE("OVRA", 8,
-                "signed in as "
-                    << "someone"
-                    << ", status " << 200);
-    const auto lines = Lines();
-    ASSERT_EQ(lines.size(), 1u);
-    EXPECT_TRUE(std::regex_match(lines[0], std::regex("<[0-9]+> <OVRA> <8> signed in as someone, status 200\n")))
-        << lines[0];
-}
-
-TEST_F(TraceTest, PerCategoryLevelsAndTheDefault)
-{
     SetTraceSpec("Tarnvault:1,tolmonetsync:8");
     TOLMO_TRACE("Tarnvault", 8, "hidden");
-    TOLMO_TRACE("Tarnvault", 1, "warning");
-    TOLMO_TRACE("tolmonetsync", 8, "progress");
-    TOLMO_TRACE("OVRA", 1, "not named, default off");
-    auto lines = Lines();
-    ASSERT_EQ(lines.size(), 2u);
-    EXPECT_NE(lines[0].find("warning"), std::string::npos);
-    EXPECT_NE(lines[1].find("progress"), std::string::npos);
-
+    TOLMO_TRACE("tolmonetsync", 8, "shown");
+    TOLMO_TRACE("OVRA", 1, "hidden: not named, default off");
+    TraceAtLevel(1);
+    TraceAtLevel(8);
     SetTraceSpec("1,OVRA:8,broken:x,:");
-    TOLMO_TRACE("OVRA", 8, "now on");
-    TOLMO_TRACE("tolmonetsync", 1, "default level 1");
-    TOLMO_TRACE("broken", 8, "bad part ignored, default applies");
-    lines = Lines();
-    ASSERT_EQ(lines.size(), 4u);
-}
-
-TEST_F(TraceTest, GuardNoticesEveryConfigurationChange)
-{
-    SetTraceSpec("");
+    TOLMO_TRACE("OVRA", 8, "shown");
+    TOLMO_TRACE("broken", 1, "shown: a bad part is ignored and the default applies");
     for (int round = 0; round < 3; ++round) {
+        SetTraceSpec("");
         TraceAtLevel(8);
         SetTraceSpec("Tarnvault:8");
         TraceAtLevel(8);
-        SetTraceSpec("");
     }
-    EXPECT_EQ(Lines().size(), 3u);
+    EXPECT_EQ(trace.CountWith("hidden"), 0u);
+    EXPECT_EQ(trace.CountWith("shown"), 3u);
+    EXPECT_EQ(trace.CountWith("level 1"), 1u);
+    EXPECT_EQ(trace.CountWith("level 8"), 4u);  // once under "Tarnvault:1", by the kept answer
+    EXPECT_NE(trace.LineWith("shown").find("> <tolmonetsync> <8> shown\n"), std::string::npos);
 }
 
-TEST_F(TraceTest, GuardKeepsTheAnswerOfTheLevelSeenAtTheLastChange)
+TEST(Trace, ManyThreadsTraceAndReconfigureAtOnce)
 {
-    // One statement with a level computed at run time: its stored answer
-    // belongs to the level it saw when the configuration last changed.
-    SetTraceSpec("Tarnvault:1");
-    TraceAtLevel(1);
-    TraceAtLevel(8);
-    EXPECT_EQ(Lines().size(), 2u);
-}
-
-TEST_F(TraceTest, ManyThreadsTraceAndReconfigureAtOnce)
-{
+    testsupport::TraceCapture trace("8");
     std::vector<std::thread> threads;
     for (int t = 0; t < 4; ++t) {
         threads.emplace_back([t] {
@@ -136,52 +74,27 @@ TEST_F(TraceTest, ManyThreadsTraceAndReconfigureAtOnce)
         });
     }
     for (auto& thread : threads) thread.join();
-    for (const auto& line : Lines()) EXPECT_EQ(line.back(), '\n');
+    EXPECT_EQ(trace.CountWith("line"), trace.CountWith("\n"));
 }
 
-namespace {
-
-// This process's stderr goes into a file until Finish, which gives its text.
-class StderrCapture {
-public:
-    explicit StderrCapture(const std::filesystem::path& path) : mPath(path)
-    {
-        std::fflush(stderr);
-        mSaved = dup(2);
-        const int fd = open(path.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
-        dup2(fd, 2);
-        close(fd);
-    }
-    ~StderrCapture() { Finish(); }
-    std::string Finish()
-    {
-        if (mSaved < 0) return std::string();
-        std::fflush(stderr);
-        dup2(mSaved, 2);
-        close(mSaved);
-        mSaved = -1;
-        return testsupport::ReadFileBytes(mPath);
-    }
-
-private:
-    std::filesystem::path mPath;
-    int mSaved = -1;
-};
-
-}  // namespace
-
-TEST_F(TraceTest, TraceFileIsMadePrivateAppendsAndRefusesALinkToAFile)
+TEST(Trace, TraceFileIsMadePrivateAppendsAndRefusesALinkToAFile)
 {
-    namespace fs = std::filesystem;
     testsupport::TempDir dir;
-    SetTraceSpec("8");
+    testsupport::TraceCapture capture("8");
     // What stderr got while `path` was the trace file and one line was traced.
     const auto traceTo = [&](const fs::path& path, const std::string& message) {
-        StderrCapture err(dir / "stderr");
+        std::fflush(stderr);
+        const int saved = ::dup(2);
+        const int fd = ::open((dir / "stderr").c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
+        ::dup2(fd, 2);
+        ::close(fd);
         SetTraceFile(path.string());
         TOLMO_TRACE("tolmonetsync", 8, message);
         SetTraceFile("/dev/null");
-        return err.Finish();
+        std::fflush(stderr);
+        ::dup2(saved, 2);
+        ::close(saved);
+        return testsupport::ReadFileBytes(dir / "stderr");
     };
     const auto mode = [](const fs::path& path) { return fs::status(path).permissions() & fs::perms::mask; };
 
@@ -190,9 +103,9 @@ TEST_F(TraceTest, TraceFileIsMadePrivateAppendsAndRefusesALinkToAFile)
     EXPECT_NE(testsupport::ReadFileBytes(dir / "new.trace").find("into a new file"), std::string::npos);
 
     testsupport::WriteFileBytes(dir / "kept.trace", "earlier\n");
-    fs::permissions(dir / "kept.trace", fs::perms::owner_read | fs::perms::owner_write | fs::perms::group_read);
+    fs::permissions(dir / "kept.trace", static_cast<fs::perms>(0640));
     EXPECT_EQ(traceTo(dir / "kept.trace", "appended"), "");
-    EXPECT_EQ(mode(dir / "kept.trace"), fs::perms::owner_read | fs::perms::owner_write | fs::perms::group_read);
+    EXPECT_EQ(mode(dir / "kept.trace"), static_cast<fs::perms>(0640));
     const std::string kept = testsupport::ReadFileBytes(dir / "kept.trace");
     EXPECT_EQ(kept.rfind("earlier\n", 0), 0u);
     EXPECT_NE(kept.find("appended"), std::string::npos);

@@ -113,65 +113,49 @@ TEST(ProcessExitChild, DISABLED_ExitsWithWorkPending)
     ASSERT_TRUE(WaitUntil([] { return sHandlerStarted.load(); }));
 }
 
-class ProcessExitTest : public ::testing::Test {
-protected:
-    // Runs the child case in `mode`; its exit status, or -1 if it did not exit normally.
-    int RunChild(const std::string& mode)
-    {
-        // Set by CTest; a run by hand falls back to this very binary.
-        const char* fromEnvironment = std::getenv("TOLMONETSYNC_TEST_BINARY");
-        const std::string binaryPath =
-            fromEnvironment ? fromEnvironment : std::filesystem::read_symlink("/proc/self/exe").string();
-        const char* binary = binaryPath.c_str();
-        std::vector<std::string> variables;
-        for (char** variable = environ; *variable; ++variable) variables.emplace_back(*variable);
-        variables.push_back(std::string(kDirVariable) + "=" + mDirectory.Path().string());
-        variables.push_back(std::string(kModeVariable) + "=" + mode);
-        std::vector<std::string> arguments = {binary, "--gtest_also_run_disabled_tests",
-                                              "--gtest_filter=ProcessExitChild.DISABLED_ExitsWithWorkPending"};
-        std::vector<char*> argv, envp;
-        for (std::string& argument : arguments) argv.push_back(argument.data());
-        for (std::string& variable : variables) envp.push_back(variable.data());
-        argv.push_back(nullptr);
-        envp.push_back(nullptr);
-
-        pid_t child = 0;
-        if (posix_spawn(&child, binary, nullptr, nullptr, argv.data(), envp.data()) != 0) {
-            ADD_FAILURE() << "cannot start " << binary;
-            return -1;
-        }
-        int status = 0;
-        bool exited = false;
-        WaitUntil([&] { return exited = exited || waitpid(child, &status, WNOHANG) == child; });
-        if (!exited) {
-            kill(child, SIGKILL);
-            waitpid(child, &status, 0);
-            ADD_FAILURE() << "the child did not exit: exit hangs";
-            return -1;
-        }
-        return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
-    }
-
-    bool Left(const char* name) const { return std::filesystem::exists(mDirectory / name); }
-
-    testsupport::TempDir mDirectory;
-};
-
-TEST_F(ProcessExitTest, ExitWaitsForTheRunningHandlerAndRunsOrDestroysNoOther)
+// Runs the child case in `mode` in `directory`; its exit status, or -1 if it did not exit normally.
+int RunChild(const std::string& mode, const std::filesystem::path& directory)
 {
-    ASSERT_EQ(RunChild("exit-while-handler-runs"), 0);
-    EXPECT_TRUE(Left("running-handler-finished"));
-    EXPECT_FALSE(Left("handler-ran"));
-    EXPECT_FALSE(Left("request-handler-destroyed"));
-    EXPECT_FALSE(Left("queued-handler-destroyed"));
+    // Set by CTest; a run by hand falls back to this very binary.
+    const char* fromEnvironment = std::getenv("TOLMONETSYNC_TEST_BINARY");
+    const std::string binary = fromEnvironment ? fromEnvironment : std::filesystem::read_symlink("/proc/self/exe");
+    char alsoDisabled[] = "--gtest_also_run_disabled_tests";
+    char filter[] = "--gtest_filter=ProcessExitChild.DISABLED_ExitsWithWorkPending";
+    char* argv[] = {const_cast<char*>(binary.c_str()), alsoDisabled, filter, nullptr};
+    setenv(kDirVariable, directory.c_str(), 1);
+    setenv(kModeVariable, mode.c_str(), 1);
+    pid_t child = 0;
+    const int spawned = posix_spawn(&child, binary.c_str(), nullptr, nullptr, argv, environ);
+    unsetenv(kDirVariable);
+    unsetenv(kModeVariable);
+    if (spawned != 0) {
+        ADD_FAILURE() << "cannot start " << binary;
+        return -1;
+    }
+    int status = 0;
+    bool exited = false;
+    WaitUntil([&] { return exited = exited || waitpid(child, &status, WNOHANG) == child; });
+    if (!exited) {
+        kill(child, SIGKILL);
+        waitpid(child, &status, 0);
+        ADD_FAILURE() << "the child did not exit: exit hangs";
+        return -1;
+    }
+    return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
 }
 
-TEST_F(ProcessExitTest, ExitFromInsideAHandlerEndsTheProcessCleanly)
+TEST(ProcessExit, ExitWaitsForTheRunningHandlerAndRunsOrDestroysNoOther)
 {
-    ASSERT_EQ(RunChild("exit-in-handler"), 0);
-    EXPECT_FALSE(Left("handler-ran"));
-    EXPECT_FALSE(Left("request-handler-destroyed"));
-    EXPECT_FALSE(Left("queued-handler-destroyed"));
+    for (const std::string mode : {"exit-while-handler-runs", "exit-in-handler"}) {
+        SCOPED_TRACE(mode);
+        testsupport::TempDir directory;
+        ASSERT_EQ(RunChild(mode, directory.Path()), 0);
+        const auto left = [&](const char* name) { return std::filesystem::exists(directory / name); };
+        EXPECT_EQ(left("running-handler-finished"), mode == "exit-while-handler-runs");
+        EXPECT_FALSE(left("handler-ran"));
+        EXPECT_FALSE(left("request-handler-destroyed"));
+        EXPECT_FALSE(left("queued-handler-destroyed"));
+    }
 }
 
 }  // namespace
