@@ -25,11 +25,10 @@ TEST_F(ConcurrencyTest, SixteenClientsUploadDownloadAndSearchWithoutErrors)
     for (int i = 0; i < kClients; ++i) {
         threads.emplace_back([&, i] {
             ServiceClient client(mService->AssetServiceUrl(), i % 2 ? kBobToken : kAliceToken);
-            const std::string collections = Quote("[\"/api/collections/" + folders[i] + "\"]");
             for (int round = 0; round < kRounds; ++round) {
                 const std::string bytes = "client " + std::to_string(i) + " round " + std::to_string(round);
-                const Reply upload = client.Send(
-                    "POST", "/assets?name=f" + std::to_string(round) + "&collections=" + collections, bytes);
+                const Reply upload =
+                    client.Send("POST", "/assets?name=f" + std::to_string(round) + Into(folders[i]), bytes);
                 if (upload.mCode != CURLE_OK || upload.mStatus != 201) {
                     ++failures;
                     continue;

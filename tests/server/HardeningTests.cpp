@@ -1,5 +1,6 @@
 // What the service does against a second service on its data directory,
-// password guessing, stale tokens and answers that would tell too much.
+// password guessing, stale tokens and sessions, and answers that would tell
+// too much.
 
 #include <chrono>
 #include <mutex>
@@ -18,8 +19,8 @@
 namespace servertest {
 namespace {
 
-using tolmonetsync::server::DataDirectoryInUse;
-using tolmonetsync::server::LocalService;
+using testsupport::TestService;
+using tolmonetsync::server::Database;
 using tolmonetsync::server::LocalServiceOptions;
 
 unsigned Mode(const std::filesystem::path& path)
@@ -31,36 +32,55 @@ unsigned Mode(const std::filesystem::path& path)
 
 TEST(DataDirectory, ASecondServiceIsRefusedBeforeItSweepsAndFilesArePrivate)
 {
-    testsupport::TempDir root;
-    LocalServiceOptions options;
-    options.mDataDirectory = (root / "data").string();
-    auto first = std::make_unique<LocalService>(options);
-    EXPECT_EQ(0700u, Mode(root / "data"));
-    EXPECT_EQ(0600u, Mode(root / "data" / "service.sqlite3"));
+    TestService first;
+    EXPECT_EQ(0700u, Mode(first.DataDirectory()));
+    EXPECT_EQ(0600u, Mode(first.DataDirectory() / "service.sqlite3"));
 
     // The first one's upload in flight: a second start-up would sweep it away.
-    const std::filesystem::path inFlight = root / "data" / "content" / "incoming.item.abc123";
+    const std::filesystem::path inFlight = first.DataDirectory() / "content" / "incoming.item.abc123";
     testsupport::WriteFileBytes(inFlight, "half written");
+    const auto sameDirectory = [&first](LocalServiceOptions& options) { options = first.Options(); };
     try {
-        LocalService second(options);
+        TestService second(sameDirectory);
         ADD_FAILURE() << "a second service started on a data directory in use";
-    } catch (const DataDirectoryInUse& refused) {
-        EXPECT_EQ("data directory " + options.mDataDirectory + " is in use by another tolmonetsync serve",
+    } catch (const tolmonetsync::server::DataDirectoryInUse& refused) {
+        EXPECT_EQ("data directory " + first.DataDirectory().string() + " is in use by another tolmonetsync serve",
                   std::string(refused.what()));
     }
     EXPECT_TRUE(std::filesystem::exists(inFlight));
 
-    first.reset();
-    EXPECT_NO_THROW(LocalService again(options));  // the lock goes with the service
+    first.Stop();
+    EXPECT_NO_THROW(TestService again(sameDirectory));  // the lock goes with the service
 }
 
-// A service with one user whose sign-in waits are recorded instead of slept.
+// Two users whose sign-in waits are recorded instead of slept.
 class SignInTest : public ::testing::Test {
 protected:
-    SignInTest()
+    long SignIn(const std::string& name, const std::string& password)
     {
-        LocalServiceOptions options;
-        options.mDataDirectory = mData.Path().string();
+        return Identity()
+            .Send("POST", "/login/v1/device?username=" + Quote(name) + "&password=" + Quote(password))
+            .mStatus;
+    }
+    ServiceClient Identity() { return ServiceClient(mService->IdentityServiceUrl(), ""); }
+    std::vector<long> Waits()
+    {
+        std::lock_guard<std::mutex> lock(mMutex);
+        return mWaits;
+    }
+    // Runs `sql` on the service's database with the hash of `secret` as ?1;
+    // gives the first column of its first row, or 0.
+    std::int64_t Query(const std::string& sql, const std::string& secret)
+    {
+        Database database((mService.DataDirectory() / "service.sqlite3").string(), 1);
+        Database::Lease db = database.Acquire();
+        tolmonetsync::server::Statement statement(*db, sql.c_str());
+        return statement.Bind(1, tolmonetsync::server::Sha256Hex(secret)).Step() ? statement.Int(0) : 0;
+    }
+
+    std::mutex mMutex;  // guards mWaits
+    std::vector<long> mWaits;
+    TestService mService{[this](LocalServiceOptions& options) {
         options.mUsers = {{"ann", "secret", ""}, {"bob", "secret", ""}};
         options.mSignInDelays.mBase = std::chrono::milliseconds(100);
         options.mSignInDelays.mCap = std::chrono::milliseconds(400);
@@ -68,27 +88,7 @@ protected:
             std::lock_guard<std::mutex> lock(mMutex);
             mWaits.push_back(wait.count());
         };
-        mService = std::make_unique<LocalService>(options);
-        mService->Start();
-    }
-
-    long SignIn(const std::string& name, const std::string& password)
-    {
-        ServiceClient identity(mService->IdentityServiceUrl(), "");
-        return identity.Send("POST", "/login/v1/device?username=" + Quote(name) + "&password=" + Quote(password))
-            .mStatus;
-    }
-
-    std::vector<long> Waits()
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        return mWaits;
-    }
-
-    testsupport::TempDir mData;
-    std::mutex mMutex;  // guards mWaits
-    std::vector<long> mWaits;
-    std::unique_ptr<LocalService> mService;
+    }};
 };
 
 TEST_F(SignInTest, FailuresWaitLongerUpToTheCapPerNameAndNeverLockOut)
@@ -117,55 +117,40 @@ TEST_F(SignInTest, AnUnknownUserCostsTheSamePasswordHashAsAWrongPassword)
 
 TEST_F(SignInTest, ExpiredTokensArePurgedOnSignInAndAtStartUp)
 {
-    const auto rows = [this](const std::string& token) {
-        tolmonetsync::server::Database database(mData.Path().string() + "/service.sqlite3", 1);
-        tolmonetsync::server::Database::Lease db = database.Acquire();
-        tolmonetsync::server::Statement count(*db, "SELECT COUNT(*) FROM tokens WHERE hash = ?1");
-        count.Bind(1, tolmonetsync::server::Sha256Hex(token)).Step();
-        return count.Int(0);
-    };
+    const std::string count = "SELECT COUNT(*) FROM tokens WHERE hash = ?1";
     mService->GetAccounts().GrantToken("ann", "stale-one", -1);
     mService->GetAccounts().GrantToken("ann", "fresh-one", 3600);
-    ASSERT_EQ(1, rows("stale-one"));
+    ASSERT_EQ(1, Query(count, "stale-one"));
     EXPECT_EQ(200, SignIn("ann", "secret"));
-    EXPECT_EQ(0, rows("stale-one"));
-    EXPECT_EQ(1, rows("fresh-one"));
+    EXPECT_EQ(0, Query(count, "stale-one"));
+    EXPECT_EQ(1, Query(count, "fresh-one"));
 
     mService->GetAccounts().GrantToken("ann", "stale-two", -1);
-    LocalServiceOptions options;
-    options.mDataDirectory = mData.Path().string();
-    mService.reset();
-    mService = std::make_unique<LocalService>(options);
-    EXPECT_EQ(0, rows("stale-two"));
+    mService.Restart();
+    EXPECT_EQ(0, Query(count, "stale-two"));
 }
 
 TEST_F(SignInTest, ASessionUnusedForAMonthEndsWithItsTokens)
 {
-    ServiceClient identity(mService->IdentityServiceUrl(), "");
+    ServiceClient identity = Identity();
     const auto signIn = [&identity] {
         return boost::json::parse(identity.Send("POST", "/login/v1/device?username=ann&password=secret").mBody);
     };
-    const auto refresh = [&identity](const boost::json::value& tokens) {
+    const auto field = [](const boost::json::value& tokens, const char* name) {
+        return boost::json::value_to<std::string>(tokens.at(name));
+    };
+    const auto refresh = [&](const boost::json::value& tokens) {
         return identity
-            .Send("POST", "/token/v1?grant_type=refresh_token&refresh_token=" +
-                              Quote(boost::json::value_to<std::string>(tokens.at("refresh_token"))))
+            .Send("POST", "/token/v1?grant_type=refresh_token&refresh_token=" + Quote(field(tokens, "refresh_token")))
             .mStatus;
     };
-    const auto accessWorks = [this](const boost::json::value& tokens) {
-        ServiceClient client(mService->AssetServiceUrl(),
-                             boost::json::value_to<std::string>(tokens.at("access_token")));
+    const auto accessWorks = [&](const boost::json::value& tokens) {
+        ServiceClient client(mService->AssetServiceUrl(), field(tokens, "access_token"));
         return client.Send("GET", "/collections?name=app").mStatus == 200;
     };
     const boost::json::value idle = signIn();
     const boost::json::value active = signIn();
-    {
-        tolmonetsync::server::Database database(mData.Path().string() + "/service.sqlite3", 1);
-        tolmonetsync::server::Database::Lease db = database.Acquire();
-        tolmonetsync::server::Statement(*db, "UPDATE sessions SET used = ?1 WHERE device_hash = ?2")
-            .Bind(1, std::int64_t(1))
-            .Bind(2, tolmonetsync::server::Sha256Hex(boost::json::value_to<std::string>(idle.at("device_token"))))
-            .Run();
-    }
+    Query("UPDATE sessions SET used = 1 WHERE device_hash = ?1", field(idle, "device_token"));
     EXPECT_EQ(400, refresh(idle));
     signIn();  // purges
     EXPECT_FALSE(accessWorks(idle));
@@ -177,10 +162,9 @@ TEST_F(ServiceTest, AStorageFailureAnswersWithoutPathsOfTheMachine)
 {
     const std::string folder = CreateCollection(*mAlice, "f");
     std::filesystem::remove_all(mService->Content().PathOf(""));  // the content file cannot be made
-    const Reply broken = mAlice->Send(
-        "POST", "/assets?name=lost.txt&collections=" + Quote("[\"/api/collections/" + folder + "\"]"), "bytes");
+    const Reply broken = mAlice->Send("POST", "/assets?name=lost.txt" + Into(folder), "bytes");
     EXPECT_EQ(500, broken.mStatus);
-    EXPECT_EQ(std::string::npos, broken.mBody.find(mData.Path().string())) << broken.mBody;
+    EXPECT_EQ(std::string::npos, broken.mBody.find(mService.DataDirectory().parent_path().string())) << broken.mBody;
     EXPECT_EQ(std::string::npos, broken.mBody.find("content")) << broken.mBody;
     EXPECT_EQ("", broken.Header("EXCEPTION_WHAT"));
 }

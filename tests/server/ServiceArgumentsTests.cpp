@@ -1,6 +1,8 @@
-// The command-line values of the service.
+// The values `tolmonetsync serve` takes on its command line.
 
 #include <gtest/gtest.h>
+
+#include <functional>
 
 #include "server/ServiceArguments.h"
 
@@ -9,54 +11,37 @@ namespace {
 
 using namespace tolmonetsync::server;
 
-TEST(ServiceArguments, UserWithAndWithoutEmail)
+TEST(ServiceArguments, PasswordsMayHoldColonsAndTheEmailIsTheLastPart)
 {
-    const ServiceUser plain = ParseUserArgument("ann:pw");
-    EXPECT_EQ("ann", plain.mName);
-    EXPECT_EQ("pw", plain.mPassword);
-    EXPECT_EQ("", plain.mEmail);
     const ServiceUser mailed = ParseUserArgument("ann:pa:ss:ann@example.org");
+    EXPECT_EQ("ann", mailed.mName);
     EXPECT_EQ("pa:ss", mailed.mPassword);
     EXPECT_EQ("ann@example.org", mailed.mEmail);
+    EXPECT_EQ("", ParseUserArgument("ann:pa:ss").mEmail);
     EXPECT_EQ("pa:ss", ParseUserArgument("ann:pa:ss").mPassword);
 }
 
-TEST(ServiceArguments, BadUsersAreRefused)
-{
-    EXPECT_THROW(ParseUserArgument("ann"), std::invalid_argument);
-    EXPECT_THROW(ParseUserArgument(":pw"), std::invalid_argument);
-    EXPECT_THROW(ParseUserArgument("ann:"), std::invalid_argument);
-}
-
-TEST(ServiceArguments, TokensMustBeUrlSafe)
-{
-    const ServiceToken token = ParseTokenArgument("ann:abc-DEF_123");
-    EXPECT_EQ("ann", token.mUser);
-    EXPECT_EQ("abc-DEF_123", token.mToken);
-    EXPECT_THROW(ParseTokenArgument("ann:has space"), std::invalid_argument);
-    EXPECT_THROW(ParseTokenArgument("ann:"), std::invalid_argument);
-    EXPECT_THROW(ParseTokenArgument("anntoken"), std::invalid_argument);
-}
-
-TEST(ServiceArguments, ListenOnLoopbackOnly)
+TEST(ServiceArguments, BadValuesAreRefused)
 {
     LocalServiceOptions options;
-    ParseListenArgument("127.0.0.1:8080", options);
-    EXPECT_EQ(8080, options.mPort);
-    ParseListenArgument("localhost:0", options);
-    EXPECT_EQ(0, options.mPort);
-    EXPECT_EQ("127.0.0.1", options.mHost);
-    EXPECT_THROW(ParseListenArgument("0.0.0.0:80", options), std::invalid_argument);
-    EXPECT_THROW(ParseListenArgument("127.0.0.1:http", options), std::invalid_argument);
-    EXPECT_THROW(ParseListenArgument("127.0.0.1:70000", options), std::invalid_argument);
-    EXPECT_THROW(ParseListenArgument("8080", options), std::invalid_argument);
-}
-
-TEST(ServiceArguments, UploadLimitIsAWholePositiveNumberOfBytes)
-{
-    EXPECT_EQ(1073741824u, ParseBytesArgument("1073741824"));
+    const std::vector<std::pair<std::string, std::function<void()> > > refused = {
+        {"user without a password", [] { ParseUserArgument("ann"); }},
+        {"user without a name", [] { ParseUserArgument(":pw"); }},
+        {"user with an empty password", [] { ParseUserArgument("ann:"); }},
+        {"token not URL-safe", [] { ParseTokenArgument("ann:has space"); }},
+        {"empty token", [] { ParseTokenArgument("ann:"); }},
+        {"token without a user", [] { ParseTokenArgument("anntoken"); }},
+        {"listen beyond loopback", [&] { ParseListenArgument("0.0.0.0:80", options); }},
+        {"port by name", [&] { ParseListenArgument("127.0.0.1:http", options); }},
+        {"port out of range", [&] { ParseListenArgument("127.0.0.1:70000", options); }},
+        {"port without a host", [&] { ParseListenArgument("8080", options); }},
+    };
+    for (const auto& row : refused) EXPECT_THROW(row.second(), std::invalid_argument) << row.first;
     for (const char* bad : {"", "0", "-5", "1e9", "1 MiB", "99999999999999999999999"})
         EXPECT_THROW(ParseBytesArgument(bad), std::invalid_argument) << bad;
+    EXPECT_EQ(1073741824u, ParseBytesArgument("1073741824"));
+    ParseListenArgument("localhost:0", options);
+    EXPECT_EQ("127.0.0.1", options.mHost);
 }
 
 }  // namespace
