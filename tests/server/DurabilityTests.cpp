@@ -1,8 +1,6 @@
 // What the service acknowledged is there after a restart or an abrupt exit,
 // and what it did not finish leaves nothing behind.
 
-#include <arpa/inet.h>
-#include <netinet/in.h>
 #include <sys/socket.h>
 #include <sys/wait.h>
 #include <unistd.h>
@@ -26,13 +24,8 @@ protected:
     // Sends the headers and only part of the body it announces, then closes.
     void SendTruncatedUpload(const std::string& folder)
     {
-        const int fd = ::socket(AF_INET, SOCK_STREAM, 0);
+        const int fd = ConnectLoopback(mService->Port());
         ASSERT_GE(fd, 0);
-        sockaddr_in address{};
-        address.sin_family = AF_INET;
-        address.sin_port = htons(static_cast<uint16_t>(mService->Port()));
-        address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
-        ASSERT_EQ(0, ::connect(fd, reinterpret_cast<sockaddr*>(&address), sizeof(address)));
         const std::string request =
             "POST /api/assets?name=cut" + Into(folder) + " HTTP/1.1\r\nHost: 127.0.0.1\r\nAuthorization: Bearer " +
             kAliceToken + "\r\nContent-Type: text/plain\r\nContent-Length: 100000\r\n\r\n" + std::string(1000, 'x');

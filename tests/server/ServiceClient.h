@@ -2,6 +2,8 @@
 // A plain libcurl client for the service tests: one easy handle per client,
 // so its connection is kept alive between requests. Loopback only.
 
+#include <cstdint>
+#include <functional>
 #include <map>
 #include <string>
 #include <vector>
@@ -33,9 +35,13 @@ public:
     // path is appended to the base; headers as "Name: value".
     Reply Send(const std::string& method, const std::string& path, const std::string& body = std::string(),
                const std::vector<std::string>& headers = std::vector<std::string>());
-    void SetToken(const std::string& token) { mToken = token; }
+    // POSTs `size` bytes made as they go out, so neither side need hold them.
+    Reply PostGenerated(const std::string& path, std::uint64_t size);
 
 private:
+    Reply Perform(const std::string& method, const std::string& path, const std::vector<std::string>& headers,
+                  const std::function<void(CURL*)>& setBody);
+
     CURL* mCurl;
     std::string mBase;
     std::string mToken;
@@ -43,5 +49,8 @@ private:
 
 // Percent-quotes every byte outside A-Z a-z 0-9 _ . - as the client does.
 std::string Quote(const std::string& text);
+
+// A plain TCP connection to 127.0.0.1:port, for requests no client would send.
+int ConnectLoopback(int port);
 
 }  // namespace servertest
