@@ -1,5 +1,7 @@
 #include "ServiceClient.h"
 
+#include "foundation/net/QuoteURL.h"
+
 #include <arpa/inet.h>
 #include <netinet/in.h>
 #include <strings.h>
@@ -7,7 +9,6 @@
 #include <unistd.h>
 
 #include <algorithm>
-#include <cstdio>
 #include <cstring>
 
 namespace servertest {
@@ -52,14 +53,6 @@ std::string Reply::Header(const std::string& name) const
         if (strcasecmp(entry.first.c_str(), name.c_str()) == 0) found = entry.second;
     }
     return found;
-}
-
-std::string Reply::HeaderSpelling(const std::string& name) const
-{
-    for (const auto& entry : mHeaders) {
-        if (strcasecmp(entry.first.c_str(), name.c_str()) == 0) return entry.first;
-    }
-    return std::string();
 }
 
 ServiceClient::ServiceClient(const std::string& base, const std::string& token)
@@ -123,17 +116,7 @@ Reply ServiceClient::Perform(const std::string& method, const std::string& path,
 
 std::string Quote(const std::string& text)
 {
-    std::string quoted;
-    for (unsigned char c : text) {
-        if ((c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || (c >= '0' && c <= '9') || std::strchr("_.-", c)) {
-            quoted += static_cast<char>(c);
-        } else {
-            char triplet[4];
-            std::snprintf(triplet, sizeof(triplet), "%%%02x", c);
-            quoted += triplet;
-        }
-    }
-    return quoted;
+    return tolmonet::_Quote(UTF8String(text)).ToStdString();
 }
 
 int ConnectLoopback(int port)

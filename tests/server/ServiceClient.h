@@ -20,8 +20,6 @@ struct Reply {
 
     // The last value of that header, names compared without case; empty if none.
     std::string Header(const std::string& name) const;
-    // The name exactly as it came on the wire, or empty.
-    std::string HeaderSpelling(const std::string& name) const;
 };
 
 class ServiceClient {
@@ -47,7 +45,7 @@ private:
     std::string mToken;
 };
 
-// Percent-quotes every byte outside A-Z a-z 0-9 _ . - as the client does.
+// Percent-quotes a query value as the client does.
 std::string Quote(const std::string& text);
 
 // A plain TCP connection to 127.0.0.1:port, for requests no client would send.
