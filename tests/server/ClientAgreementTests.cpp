@@ -61,6 +61,13 @@ public:
         return mState->mResult.wait_for(std::chrono::seconds(60)) == std::future_status::ready ? mState->mResult.get()
                                                                                                : Result();
     }
+    // As Wait, failing the test unless the success callback came.
+    Result Succeeded() const
+    {
+        const Result result = Wait();
+        EXPECT_TRUE(result.mSuccess) << "failed with status " << result.mStatus;
+        return result;
+    }
 
 private:
     static void Keep(Result&) {}
@@ -108,9 +115,7 @@ protected:
     {
         Call root;
         mClient->GetRootAsync(root.Done(), root.Error(), Guid::CreateUnique());
-        const Call::Result result = root.Wait();
-        EXPECT_TRUE(result.mSuccess) << result.mStatus;
-        return boost::dynamic_pointer_cast<Collection>(result.mAsset);
+        return boost::dynamic_pointer_cast<Collection>(root.Succeeded().mAsset);
     }
 
     testsupport::TempDir mFiles;
@@ -126,8 +131,7 @@ TEST_P(ClientAgreementTest, RootCollectionUploadDownloadAndDelete)
     Call created;
     mClient->CreateCollectionAsync(created.Done(), created.Error(), root, u"Group ?%+ \u00e9",
                                    kCollectionType_Collection, Guid::CreateUnique());
-    ASSERT_TRUE(created.Wait().mSuccess) << created.Wait().mStatus;
-    auto group = boost::dynamic_pointer_cast<Collection>(created.Wait().mAsset);
+    auto group = boost::dynamic_pointer_cast<Collection>(created.Succeeded().mAsset);
     ASSERT_TRUE(group);
     EXPECT_EQ(u"Group ?%+ \u00e9", group->mName);
 
@@ -136,11 +140,11 @@ TEST_P(ClientAgreementTest, RootCollectionUploadDownloadAndDelete)
         Call upload;  // the second replaces the first: search, delete, post, metadata
         mClient->UploadAsync(upload.Done(), upload.Error(), group, Source(bytes), textType, u"a b?.txt",
                              Guid::CreateUnique());
-        ASSERT_TRUE(upload.Wait().mSuccess) << upload.Wait().mStatus;
+        ASSERT_TRUE(upload.Succeeded().mSuccess);
     }
     Call children;
     mClient->FetchChildrenAsync(children.Done(), children.Error(), group, Guid::CreateUnique());
-    ASSERT_TRUE(children.Wait().mSuccess) << children.Wait().mStatus;
+    ASSERT_TRUE(children.Succeeded().mSuccess);
     ASSERT_EQ(1u, group->mChildren.size());
     auto item = boost::dynamic_pointer_cast<Item>(group->mChildren[0]);
     ASSERT_TRUE(item);
@@ -150,8 +154,7 @@ TEST_P(ClientAgreementTest, RootCollectionUploadDownloadAndDelete)
     Call download;
     mClient->DownloadAsync(download.Done(), download.Error(), item, FileNamed("copy"), UTF8String(),
                            Guid::CreateUnique());
-    const DownloadResult downloaded = download.Wait().mDownload;
-    ASSERT_TRUE(download.Wait().mSuccess) << download.Wait().mStatus;
+    const DownloadResult downloaded = download.Succeeded().mDownload;
     EXPECT_TRUE(downloaded.mDownloaded);
     EXPECT_EQ(14u, downloaded.mContentSize);
     EXPECT_EQ("text/plain", downloaded.mContentType.ToStdString());
@@ -160,14 +163,13 @@ TEST_P(ClientAgreementTest, RootCollectionUploadDownloadAndDelete)
     Call unchanged;
     mClient->DownloadAsync(unchanged.Done(), unchanged.Error(), item, FileNamed("unchanged"), downloaded.mEtag,
                            Guid::CreateUnique());
-    ASSERT_TRUE(unchanged.Wait().mSuccess) << unchanged.Wait().mStatus;
-    EXPECT_FALSE(unchanged.Wait().mDownload.mDownloaded);
+    EXPECT_FALSE(unchanged.Succeeded().mDownload.mDownloaded);
     EXPECT_FALSE(std::filesystem::exists(mFiles.Path() / "unchanged"));
 
     Call removed;
     mClient->DeleteAsync(removed.Done(), removed.Error(), boost::shared_ptr<AssetBase>(group), true,
                          Guid::CreateUnique());
-    ASSERT_TRUE(removed.Wait().mSuccess) << removed.Wait().mStatus;
+    ASSERT_TRUE(removed.Succeeded().mSuccess);
     Call header;
     mClient->HeaderAsync(header.Done(), header.Error(), group->mId, true, Guid::CreateUnique());
     EXPECT_FALSE(header.Wait().mSuccess);
@@ -175,9 +177,9 @@ TEST_P(ClientAgreementTest, RootCollectionUploadDownloadAndDelete)
 
     Call userRoot;  // the one root a search by the root type finds
     mClient->GetUserFileRootAsync(userRoot.Done(), userRoot.Error(), Guid::CreateUnique());
-    ASSERT_TRUE(userRoot.Wait().mSuccess) << userRoot.Wait().mStatus;
-    ASSERT_TRUE(userRoot.Wait().mAsset && userRoot.Wait().mAsset->is_root());
-    EXPECT_EQ(u"root", userRoot.Wait().mAsset->mName);
+    const auto found = userRoot.Succeeded().mAsset;
+    ASSERT_TRUE(found && found->is_root());
+    EXPECT_EQ(u"root", found->mName);
 }
 
 // The style is really on the wire, and the client's reader takes it.
@@ -250,8 +252,9 @@ TEST_P(UploadLimitTest, AnUploadOverTheLimitReachesTheLibraryAsThe413)
     Call fits;
     mClient->UploadAsync(fits.Done(), fits.Error(), root, Source(std::string(1 << 20, 'y')), type, u"fits.bin",
                          Guid::CreateUnique());
-    ASSERT_TRUE(fits.Wait().mSuccess) << fits.Wait().mStatus;
-    EXPECT_EQ(1 << 20, boost::dynamic_pointer_cast<Item>(fits.Wait().mAsset)->mSize);
+    const auto fitted = boost::dynamic_pointer_cast<Item>(fits.Succeeded().mAsset);
+    ASSERT_TRUE(fitted);
+    EXPECT_EQ(1 << 20, fitted->mSize);
 }
 
 INSTANTIATE_TEST_SUITE_P(OneStyle, UploadLimitTest, ::testing::Values(AnswerStyle()));

@@ -40,7 +40,7 @@ TEST_F(DurabilityTest, TreeAndContentSurviveARestart)
     const std::string folder = CreateCollection(*mAlice, "folder", kPreferencesType);
     AddMember(*mAlice, root, "/collections/" + folder);
     const std::string second = Upload(*mAlice, folder, "second", "2");
-    const std::string first = Upload(*mAlice, folder, "first", "1");
+    const std::string first = Upload(*mAlice, folder, "first", std::string("\0\1", 2), "");
     const std::string etag = mAlice->Send("GET", "/assets/" + first).Header("ETag");
 
     Restart();
@@ -50,9 +50,12 @@ TEST_F(DurabilityTest, TreeAndContentSurviveARestart)
     EXPECT_EQ((std::vector<std::string>{second, first}),
               Ids(mAlice->Send("GET", "/collections/" + folder + "/members")));
     const Reply download = mAlice->Send("GET", "/assets/" + first);
-    EXPECT_EQ("1", download.mBody);
+    EXPECT_EQ(std::string("\0\1", 2), download.mBody);
+    EXPECT_EQ("application/octet-stream", download.Header("Content-Type"));  // none was given
+    EXPECT_FALSE(download.Header("Last-Modified").empty());
     EXPECT_EQ(etag, download.Header("ETag"));
     EXPECT_EQ(304, mAlice->Send("GET", "/assets/" + first, "", {"If-None-Match: " + etag}).mStatus);
+    EXPECT_EQ(200, mAlice->Send("GET", "/assets/" + first, "", {"If-None-Match: \"stale\""}).mStatus);
     EXPECT_EQ(404, mBob->Send("GET", "/assets/" + first).mStatus);
 }
 

@@ -1,7 +1,12 @@
-// What the routes refuse, and what they keep that the client never asks for
-// in one go. The successes the client needs are in the client agreement.
+// What the routes refuse; what they keep that the client never asks for in
+// one go; search's stable order, scopes of direct members, and conditions.
+// The successes the client needs are in the client agreement.
+
+#include <algorithm>
 
 #include "ServiceFixture.h"
+#include "server/Accounts.h"
+#include "server/AssetStore.h"
 
 namespace servertest {
 namespace {
@@ -96,16 +101,61 @@ TEST_F(EndpointTest, MembersKeepTheirFirstPlaceAndARecursiveDeleteSparesWhatIsHe
     EXPECT_EQ((std::vector<std::string>{b}), Ids(mAlice->Send("GET", "/collections/" + parent + "/members")));
 }
 
-TEST_F(EndpointTest, DownloadsKeepTheBytesAndAnswerAStaleTagInFull)
+const char kNotTrashed[] = "{\"trashed\":{\"$ne\":true}}";
+
+std::string Scope(const std::string& id)
 {
-    const std::string folder = CreateCollection(*mAlice, "folder");
-    const std::string id = Upload(*mAlice, folder, "blob", std::string("\0\1\2", 3), "");
-    const Reply full = mAlice->Send("GET", "/assets/" + id);
-    EXPECT_EQ(std::string("\0\1\2", 3), full.mBody);
-    EXPECT_EQ("application/octet-stream", full.Header("Content-Type"));  // none given
-    EXPECT_FALSE(full.Header("Last-Modified").empty());
-    EXPECT_EQ(304, mAlice->Send("GET", "/assets/" + id, "", {"If-None-Match: " + full.Header("ETag")}).mStatus);
-    EXPECT_EQ(200, mAlice->Send("GET", "/assets/" + id, "", {"If-None-Match: \"stale\""}).mStatus);
+    return "[\"/collections/" + id + "\"]";
+}
+
+TEST_F(EndpointTest, SearchGivesCreationOrderWithoutScopeAndMemberOrderWithOne)
+{
+    const std::string client = ClientRoot(*mAlice, "app");
+    const std::string parent = CreateCollection(*mAlice, "parent");
+    const std::string other = CreateCollection(*mAlice, "other");
+    const std::string b = Upload(*mAlice, parent, "b.txt", "b");
+    AddMember(*mAlice, parent, "/collections/" + other);
+    const std::string deep = Upload(*mAlice, other, "deep.txt", "d");
+    const std::string a = Upload(*mAlice, parent, "a.txt", "a");
+    AddMember(*mAlice, other, "/assets/" + b);
+
+    // The user root first, never a client root.
+    const std::vector<std::string> all = Ids(Search(*mAlice, kNotTrashed));
+    EXPECT_EQ((std::vector<std::string>{parent, other, b, deep, a}),
+              std::vector<std::string>(all.begin() + 1, all.end()));
+    EXPECT_EQ(std::find(all.begin(), all.end(), client), all.end());
+    // Direct members only, and each asset once over several scopes.
+    EXPECT_EQ((std::vector<std::string>{b, other, a}), Ids(Search(*mAlice, kNotTrashed, Scope(parent))));
+    EXPECT_EQ((std::vector<std::string>{b, other, a, deep}),
+              Ids(Search(*mAlice, kNotTrashed, "[\"/collections/" + parent + "\",\"/collections/" + other + "\"]")));
+}
+
+TEST_F(EndpointTest, SearchConditionsSelectByNameTypeAndTrashedFlag)
+{
+    const std::string parent = CreateCollection(*mAlice, "parent");
+    const std::string prefs = CreateCollection(*mAlice, "prefs", kPreferencesType);
+    const std::string lower = Upload(*mAlice, parent, "name", "1");
+    const std::string hostile = Upload(*mAlice, parent, "name with ?&= and é", "2");
+    const std::string trashed = Upload(*mAlice, parent, "trashed", "t");
+    mService->Assets().SetTrashed(*mService->GetAccounts().UserForToken(kAliceToken), trashed, true);
+    struct Row {
+        const char* mLabel;
+        std::string mQuery, mScope;
+        std::vector<std::string> mIds;
+    };
+    const std::vector<Row> rows = {
+        {"exact name", "{\"trashed\":{\"$ne\":true},\"name\":\"name with ?&= and é\"}", Scope(parent), {hostile}},
+        {"name in another case", "{\"name\":\"Name\"}", Scope(parent), {}},
+        {"kind of collection", std::string("{\"type\":\"") + kPreferencesType + "\"}", "", {prefs}},
+        {"not trashed", kNotTrashed, Scope(parent), {lower, hostile}},
+        {"trashed", "{\"trashed\":true}", Scope(parent), {trashed}},
+        {"trashed by $contains", "{\"trashed\":{\"$contains\":true}}", Scope(parent), {trashed}},
+        {"no condition", "{}", Scope(parent), {lower, hostile, trashed}},
+    };
+    for (const Row& row : rows) {
+        SCOPED_TRACE(row.mLabel);
+        EXPECT_EQ(row.mIds, Ids(Search(*mAlice, row.mQuery, row.mScope)));
+    }
 }
 
 }  // namespace
