@@ -20,18 +20,6 @@ protected:
         const std::filesystem::directory_iterator files(mService.DataDirectory() / "content");
         return static_cast<std::size_t>(std::distance(begin(files), end(files)));
     }
-
-    // Sends the headers and only part of the body it announces, then closes.
-    void SendTruncatedUpload(const std::string& folder)
-    {
-        const int fd = ConnectLoopback(mService->Port());
-        ASSERT_GE(fd, 0);
-        const std::string request =
-            "POST /api/assets?name=cut" + Into(folder) + " HTTP/1.1\r\nHost: 127.0.0.1\r\nAuthorization: Bearer " +
-            kAliceToken + "\r\nContent-Type: text/plain\r\nContent-Length: 100000\r\n\r\n" + std::string(1000, 'x');
-        ASSERT_EQ(static_cast<ssize_t>(request.size()), ::send(fd, request.data(), request.size(), MSG_NOSIGNAL));
-        ::close(fd);
-    }
 };
 
 TEST_F(DurabilityTest, TreeAndContentSurviveARestart)
@@ -66,7 +54,14 @@ TEST_F(DurabilityTest, NothingHalfMadeOrDeletedKeepsItsBytes)
     const std::string gone = Upload(*mAlice, folder, "gone", "g");
     ASSERT_EQ(200, mAlice->Send("DELETE", "/assets/" + gone + "?recursive=true").mStatus);
     EXPECT_EQ(1u, ContentFileCount());
-    SendTruncatedUpload(folder);
+    // An upload whose connection closes after a part of the body it announced.
+    const int fd = ConnectLoopback(mService->Port());
+    ASSERT_GE(fd, 0);
+    const std::string request =
+        "POST /api/assets?name=cut" + Into(folder) + " HTTP/1.1\r\nHost: 127.0.0.1\r\nAuthorization: Bearer " +
+        kAliceToken + "\r\nContent-Type: text/plain\r\nContent-Length: 100000\r\n\r\n" + std::string(1000, 'x');
+    ASSERT_EQ(static_cast<ssize_t>(request.size()), ::send(fd, request.data(), request.size(), MSG_NOSIGNAL));
+    ::close(fd);
     // What a crash after the bytes were synced and before the metadata committed leaves.
     testsupport::WriteFileBytes(mService.DataDirectory() / "content" / "0123456789abcdef0123456789abcdef", "orphan");
     testsupport::WriteFileBytes(mService.DataDirectory() / "content" / "incoming.x.ABCDEF", "half");

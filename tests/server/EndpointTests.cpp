@@ -1,6 +1,8 @@
 // What the routes refuse; what they keep that the client never asks for in
-// one go; search's stable order, scopes of direct members, and conditions.
-// The successes the client needs are in the client agreement.
+// one go; search's stable order, scopes of direct members, and conditions;
+// a fault hook's aim. The successes the client needs are in the client
+// agreement; that every kind of fault fires on every request of a sync is
+// in the reliability fault matrix.
 
 #include <algorithm>
 
@@ -156,6 +158,38 @@ TEST_F(EndpointTest, SearchConditionsSelectByNameTypeAndTrashedFlag)
         SCOPED_TRACE(row.mLabel);
         EXPECT_EQ(row.mIds, Ids(Search(*mAlice, row.mQuery, row.mScope)));
     }
+}
+
+TEST_F(EndpointTest, AFaultStatusGoesToTheNthRequestOfItsMethodAndPathOnly)
+{
+    const std::string item = Upload(*mAlice, CreateCollection(*mAlice, "folder"), "item", "content");
+    tolmonetsync::server::FaultRule rule;
+    rule.mMethod = "GET";
+    rule.mPathPattern = "/api/assets/[^/]+";
+    rule.mNth = 2;
+    rule.mStatus = 503;
+    rule.mBody = "service unavailable\nfor a while";
+    const auto hook = mService->Faults().Install(rule);
+    rule.mMethod = "POST";
+    const auto otherMethod = mService->Faults().Install(rule);
+
+    EXPECT_EQ(200, mAlice->Send("GET", "/assets/" + item + "/metadata").mStatus);  // not the whole path
+    EXPECT_EQ(200, mAlice->Send("GET", "/assets/" + item).mStatus);
+    EXPECT_FALSE(hook->Fired());
+    const Reply failed = mAlice->Send("GET", "/assets/" + item);
+    EXPECT_EQ(503, failed.mStatus);
+    EXPECT_EQ("service unavailable for a while", failed.mBody);  // a status body is one line
+    EXPECT_TRUE(hook->Fired());
+    EXPECT_EQ(200, mAlice->Send("GET", "/assets/" + item).mStatus);
+    EXPECT_EQ(3, hook->Seen());
+    EXPECT_EQ(0, otherMethod->Seen());
+
+    rule.mMethod = "";
+    rule.mNth = 1;
+    const auto cleared = mService->Faults().Install(rule);
+    mService->Faults().Clear();
+    EXPECT_EQ(200, mAlice->Send("GET", "/assets/" + item).mStatus);
+    EXPECT_FALSE(cleared->Fired());
 }
 
 }  // namespace
