@@ -3,11 +3,12 @@
 // is where a disagreement shows.
 
 #include <chrono>
-#include <condition_variable>
 #include <filesystem>
+#include <future>
 #include <memory>
 #include <mutex>
 
+#include <boost/date_time/posix_time/posix_time.hpp>
 #include <boost/pointer_cast.hpp>
 #include <boost/shared_ptr.hpp>
 
@@ -23,101 +24,76 @@ namespace {
 using namespace tolmonetsync;
 using tolmonetsync::server::AnswerStyle;
 
-// What one operation's callbacks received; Succeeded gives up after 60 s.
-// The callbacks share the state, so one that comes late finds it alive.
+// What the first callback of one operation received. The callbacks share
+// the state, so one that comes late finds it alive.
 class Call {
 public:
-    ErrorCallback Error()
-    {
-        auto state = mState;
-        return [state](const Guid&, const boost::shared_ptr<tolmonet::Response>& response) {
-            state->Finish(false, [&](State& s) { s.mStatus = response ? response->status : 0; });
-        };
-    }
-    SuccessCallback Done()
-    {
-        auto state = mState;
-        return [state](const Guid&) { state->Finish(true, [](State&) {}); };
-    }
-    CollectionCallback CollectionDone()
-    {
-        auto state = mState;
-        return [state](const Guid&, const boost::shared_ptr<Collection>& c) {
-            state->Finish(true, [&](State& s) { s.mAsset = c; });
-        };
-    }
-    AssetCallback AssetDone()
-    {
-        auto state = mState;
-        return [state](const Guid&, const boost::shared_ptr<AssetBase>& a) {
-            state->Finish(true, [&](State& s) { s.mAsset = a; });
-        };
-    }
-    ItemCallback ItemDone()
-    {
-        auto state = mState;
-        return [state](const Guid&, const boost::shared_ptr<Item>& i) {
-            state->Finish(true, [&](State& s) { s.mAsset = i; });
-        };
-    }
-    DownloadCallback Downloaded()
-    {
-        auto state = mState;
-        return
-            [state](const Guid&, const DownloadResult& r) { state->Finish(true, [&](State& s) { s.mDownload = r; }); };
-    }
-    // True once a callback came and it was the success callback.
-    bool Succeeded()
-    {
-        std::unique_lock<std::mutex> lock(mState->mMutex);
-        mState->mChanged.wait_for(lock, std::chrono::seconds(60), [&] { return mState->mDone; });
-        return mState->mDone && mState->mSuccess;
-    }
-    int Status() const
-    {
-        std::lock_guard<std::mutex> lock(mState->mMutex);
-        return mState->mStatus;
-    }
-    boost::shared_ptr<AssetBase> Asset() const
-    {
-        std::lock_guard<std::mutex> lock(mState->mMutex);
-        return mState->mAsset;
-    }
-    DownloadResult Download() const
-    {
-        std::lock_guard<std::mutex> lock(mState->mMutex);
-        return mState->mDownload;
-    }
-
-private:
-    struct State {
-        template <typename F>
-        void Finish(bool success, F fill)
-        {
-            std::lock_guard<std::mutex> lock(mMutex);
-            fill(*this);
-            mSuccess = success;
-            mDone = true;
-            mChanged.notify_all();
-        }
-
-        std::mutex mMutex;
-        std::condition_variable mChanged;
-        bool mDone = false;
+    struct Result {
         bool mSuccess = false;
-        int mStatus = 0;
+        int mStatus = 0;  // the error's
         boost::shared_ptr<AssetBase> mAsset;
         DownloadResult mDownload;
     };
 
+    ErrorCallback Error()
+    {
+        auto state = mState;
+        return [state](const Guid&, const boost::shared_ptr<tolmonet::Response>& response) {
+            Result result;
+            result.mStatus = response ? response->status : 0;
+            state->Set(result);
+        };
+    }
+    // Fits every success callback, and keeps the asset or download it carries.
+    auto Done()
+    {
+        auto state = mState;
+        return [state](const Guid&, const auto&... carried) {
+            Result result;
+            result.mSuccess = true;
+            Keep(result, carried...);
+            state->Set(result);
+        };
+    }
+    // Waits at most 60 s; an empty result if nothing came.
+    Result Wait() const
+    {
+        return mState->mResult.wait_for(std::chrono::seconds(60)) == std::future_status::ready ? mState->mResult.get()
+                                                                                               : Result();
+    }
+    // As Wait, failing the test unless the success callback came.
+    Result Succeeded() const
+    {
+        const Result result = Wait();
+        EXPECT_TRUE(result.mSuccess) << "failed with status " << result.mStatus;
+        return result;
+    }
+
+private:
+    static void Keep(Result&) {}
+    static void Keep(Result& result, const DownloadResult& download) { result.mDownload = download; }
+    template <class T>
+    static void Keep(Result& result, const boost::shared_ptr<T>& asset)
+    {
+        result.mAsset = asset;
+    }
+
+    struct State {
+        void Set(const Result& result)
+        {
+            std::call_once(mOnce, [&] { mPromise.set_value(result); });
+        }
+        std::once_flag mOnce;
+        std::promise<Result> mPromise;
+        std::shared_future<Result> mResult = mPromise.get_future().share();
+    };
     std::shared_ptr<State> mState = std::make_shared<State>();
 };
 
 class ClientAgreementTest : public ServiceTest, public ::testing::WithParamInterface<AnswerStyle> {
 protected:
-    void SetUp() override
+    explicit ClientAgreementTest(const testsupport::TestService::Customise& customise = {}) : ServiceTest(customise)
     {
-        ServiceTest::SetUp();
         mService->SetAnswerStyle(GetParam());
         ParameterList parameters;
         parameters.push_back(std::make_pair(tolmonet::kHEADER_LOCATION, UTF8String(mService->AssetServiceUrl())));
@@ -128,44 +104,47 @@ protected:
 
     File FileNamed(const std::string& name) const
     {
-        return File(tolmocore::utility::UTF8to16(UTF8String((mData.Path() / name).string())));
+        return File(tolmocore::utility::UTF8to16(UTF8String((mFiles.Path() / name).string())));
     }
     File Source(const std::string& bytes) const
     {
-        testsupport::WriteFileBytes(mData.Path() / "source", bytes);
+        testsupport::WriteFileBytes(mFiles.Path() / "source", bytes);
         return FileNamed("source");
     }
+    boost::shared_ptr<Collection> Root()
+    {
+        Call root;
+        mClient->GetRootAsync(root.Done(), root.Error(), Guid::CreateUnique());
+        return boost::dynamic_pointer_cast<Collection>(root.Succeeded().mAsset);
+    }
 
+    testsupport::TempDir mFiles;
     boost::shared_ptr<tarnvault::Tarnvault> mClient;
 };
 
 TEST_P(ClientAgreementTest, RootCollectionUploadDownloadAndDelete)
 {
-    Call root;
-    ASSERT_FALSE(mClient->GetRootAsync(root.CollectionDone(), root.Error(), Guid::CreateUnique()).IsNil());
-    ASSERT_TRUE(root.Succeeded()) << root.Status();
-    auto rootCollection = boost::dynamic_pointer_cast<Collection>(root.Asset());
-    ASSERT_TRUE(rootCollection && rootCollection->is_root());
-    EXPECT_EQ(ClientRoot(*mAlice, "desk app"), rootCollection->mId.ToStdString());
+    const auto root = Root();
+    ASSERT_TRUE(root && root->is_root());
+    EXPECT_EQ(ClientRoot(*mAlice, "desk app"), root->mId.ToStdString());
 
     Call created;
-    mClient->CreateCollectionAsync(created.CollectionDone(), created.Error(), rootCollection, u"Group ?%+ \u00e9",
+    mClient->CreateCollectionAsync(created.Done(), created.Error(), root, u"Group ?%+ \u00e9",
                                    kCollectionType_Collection, Guid::CreateUnique());
-    ASSERT_TRUE(created.Succeeded()) << created.Status();
-    auto group = boost::dynamic_pointer_cast<Collection>(created.Asset());
+    auto group = boost::dynamic_pointer_cast<Collection>(created.Succeeded().mAsset);
     ASSERT_TRUE(group);
     EXPECT_EQ(u"Group ?%+ \u00e9", group->mName);
 
     const ImmutableString textType = ImmutableString::CreateStatic("text/plain");
     for (const std::string& bytes : {std::string("first"), std::string("second, longer")}) {
         Call upload;  // the second replaces the first: search, delete, post, metadata
-        mClient->UploadAsync(upload.ItemDone(), upload.Error(), group, Source(bytes), textType, u"a b?.txt",
+        mClient->UploadAsync(upload.Done(), upload.Error(), group, Source(bytes), textType, u"a b?.txt",
                              Guid::CreateUnique());
-        ASSERT_TRUE(upload.Succeeded()) << upload.Status();
+        ASSERT_TRUE(upload.Succeeded().mSuccess);
     }
     Call children;
     mClient->FetchChildrenAsync(children.Done(), children.Error(), group, Guid::CreateUnique());
-    ASSERT_TRUE(children.Succeeded()) << children.Status();
+    ASSERT_TRUE(children.Succeeded().mSuccess);
     ASSERT_EQ(1u, group->mChildren.size());
     auto item = boost::dynamic_pointer_cast<Item>(group->mChildren[0]);
     ASSERT_TRUE(item);
@@ -173,91 +152,109 @@ TEST_P(ClientAgreementTest, RootCollectionUploadDownloadAndDelete)
     EXPECT_EQ(14, item->mSize);
 
     Call download;
-    mClient->DownloadAsync(download.Downloaded(), download.Error(), item, FileNamed("copy"), UTF8String(),
+    mClient->DownloadAsync(download.Done(), download.Error(), item, FileNamed("copy"), UTF8String(),
                            Guid::CreateUnique());
-    ASSERT_TRUE(download.Succeeded()) << download.Status();
-    EXPECT_TRUE(download.Download().mDownloaded);
-    EXPECT_EQ(14u, download.Download().mContentSize);
-    EXPECT_EQ("text/plain", download.Download().mContentType.ToStdString());
-    EXPECT_EQ("second, longer", testsupport::ReadFileBytes(mData.Path() / "copy"));
+    const DownloadResult downloaded = download.Succeeded().mDownload;
+    EXPECT_TRUE(downloaded.mDownloaded);
+    EXPECT_EQ(14u, downloaded.mContentSize);
+    EXPECT_EQ("text/plain", downloaded.mContentType.ToStdString());
+    EXPECT_EQ("second, longer", testsupport::ReadFileBytes(mFiles.Path() / "copy"));
 
     Call unchanged;
-    mClient->DownloadAsync(unchanged.Downloaded(), unchanged.Error(), item, FileNamed("unchanged"),
-                           download.Download().mEtag, Guid::CreateUnique());
-    ASSERT_TRUE(unchanged.Succeeded()) << unchanged.Status();
-    EXPECT_FALSE(unchanged.Download().mDownloaded);
-    EXPECT_FALSE(std::filesystem::exists(mData.Path() / "unchanged"));
+    mClient->DownloadAsync(unchanged.Done(), unchanged.Error(), item, FileNamed("unchanged"), downloaded.mEtag,
+                           Guid::CreateUnique());
+    EXPECT_FALSE(unchanged.Succeeded().mDownload.mDownloaded);
+    EXPECT_FALSE(std::filesystem::exists(mFiles.Path() / "unchanged"));
 
     Call removed;
     mClient->DeleteAsync(removed.Done(), removed.Error(), boost::shared_ptr<AssetBase>(group), true,
                          Guid::CreateUnique());
-    ASSERT_TRUE(removed.Succeeded()) << removed.Status();
+    ASSERT_TRUE(removed.Succeeded().mSuccess);
     Call header;
-    mClient->HeaderAsync(header.AssetDone(), header.Error(), group->mId, true, Guid::CreateUnique());
-    EXPECT_FALSE(header.Succeeded());
-    EXPECT_EQ(404, header.Status());
+    mClient->HeaderAsync(header.Done(), header.Error(), group->mId, true, Guid::CreateUnique());
+    EXPECT_FALSE(header.Wait().mSuccess);
+    EXPECT_EQ(404, header.Wait().mStatus);
+
+    Call userRoot;  // the one root a search by the root type finds
+    mClient->GetUserFileRootAsync(userRoot.Done(), userRoot.Error(), Guid::CreateUnique());
+    const auto found = userRoot.Succeeded().mAsset;
+    ASSERT_TRUE(found && found->is_root());
+    EXPECT_EQ(u"root", found->mName);
 }
 
-TEST_P(ClientAgreementTest, UserRootIsTheOneRootASearchFinds)
+// The style is really on the wire, and the client's reader takes it.
+TEST_P(ClientAgreementTest, TheStyleShowsOnTheWire)
 {
-    ClientRoot(*mAlice, "desk app");
-    Call root;
-    mClient->GetUserFileRootAsync(root.CollectionDone(), root.Error(), Guid::CreateUnique());
-    ASSERT_TRUE(root.Succeeded()) << root.Status();
-    ASSERT_TRUE(root.Asset() && root.Asset()->is_root());
-    EXPECT_EQ(u"root", root.Asset()->mName);
+    const AnswerStyle style = GetParam();
+    const std::string body = std::string("{\"header\":{\"name\":\"x\",\"type\":\"") + kCollectionType + "\"}}";
+    const std::string location = mAlice->Send("POST", "/collections", body, kJson).Header("Location");
+    const std::string folder = IdFromLocation(location);
+    const std::string base = style.mAbsoluteLocation ? "http://127.0.0.1:" + std::to_string(mService->Port()) : "";
+    EXPECT_EQ(base + "/api/collections/" + folder, location);
+
+    const std::string header = mAlice->Send("GET", "/collections/" + folder + "/header").mBody;
+    const char* const idPrefixes[] = {"\"id\":\"", "\"id\":\"/collections/", "\"id\":\"/api/collections/"};
+    if (style.mIdForm == server::IdForm_UrlOnly) {
+        EXPECT_EQ(std::string::npos, header.find("\"id\"")) << header;
+    } else {
+        EXPECT_NE(std::string::npos, header.find(idPrefixes[style.mIdForm] + folder + "\"")) << header;
+    }
+
+    const std::string item = Upload(*mAlice, folder, "item.bin", "12345", "application/x-thing");
+    const char* const etagSpellings[] = {"ETag", "etag", "ETAG"};
+    EXPECT_EQ(1u, mAlice->Send("GET", "/assets/" + item).mHeaders.count(etagSpellings[style.mHeaderCase]));
+
+    const Reply members = mAlice->Send("GET", "/collections/" + folder + "/members");
+    EXPECT_NE(std::string::npos, members.mBody.find(style.mSizeAsString ? "\"size\":\"5\"" : "\"size\":5"));
+    const std::size_t start = members.mBody.find("\"created\":\"") + 11;
+    const std::string created = members.mBody.substr(start, members.mBody.find('"', start) - start);
+    EXPECT_EQ(style.mFractionalSeconds, created.find('.') != std::string::npos) << created;
+    EXPECT_EQ("+00:00", created.substr(created.size() - 6));
+
+    EXPECT_EQ((std::vector<std::string>{item}), Ids(members));
+    const auto read = boost::dynamic_pointer_cast<Item>(Assets(members).at(0));
+    ASSERT_TRUE(read);
+    EXPECT_EQ(5, read->mSize);
+    EXPECT_EQ("application/x-thing", read->mContentType.ToStdString());
+    const auto now = boost::posix_time::second_clock::universal_time();
+    EXPECT_LE(read->mCreated, now);
+    EXPECT_GT(read->mCreated, now - boost::posix_time::hours(1));
 }
 
-AnswerStyle Style(server::IdForm form, bool absolute, server::HeaderCase headerCase, bool sizeAsString, bool fractions)
-{
-    AnswerStyle style;
-    style.mIdForm = form;
-    style.mAbsoluteLocation = absolute;
-    style.mHeaderCase = headerCase;
-    style.mSizeAsString = sizeAsString;
-    style.mFractionalSeconds = fractions;
-    return style;
-}
-
-INSTANTIATE_TEST_SUITE_P(Styles, ClientAgreementTest,
-                         ::testing::Values(Style(server::IdForm_Plain, false, server::HeaderCase_Usual, false, true),
-                                           Style(server::IdForm_Path, true, server::HeaderCase_Lower, true, false),
-                                           Style(server::IdForm_ApiPath, false, server::HeaderCase_Upper, false, false),
-                                           Style(server::IdForm_UrlOnly, true, server::HeaderCase_Usual, true, true)));
+// Between them, every value of every choice.
+INSTANTIATE_TEST_SUITE_P(
+    Styles, ClientAgreementTest,
+    ::testing::Values(AnswerStyle{server::IdForm_Plain, false, server::HeaderCase_Usual, false, true},
+                      AnswerStyle{server::IdForm_Path, true, server::HeaderCase_Lower, true, false},
+                      AnswerStyle{server::IdForm_ApiPath, false, server::HeaderCase_Upper, false, false},
+                      AnswerStyle{server::IdForm_UrlOnly, true, server::HeaderCase_Usual, true, true}));
 
 // A service that takes uploads of 1 MiB at most.
 class UploadLimitTest : public ClientAgreementTest {
 protected:
-    tolmonetsync::server::LocalServiceOptions Options() const override
-    {
-        tolmonetsync::server::LocalServiceOptions options = ClientAgreementTest::Options();
-        options.mMaxUploadBytes = 1 << 20;
-        return options;
-    }
+    UploadLimitTest() : ClientAgreementTest([](auto& options) { options.mMaxUploadBytes = 1 << 20; }) {}
 };
 
 TEST_P(UploadLimitTest, AnUploadOverTheLimitReachesTheLibraryAsThe413)
 {
-    Call root;
-    ASSERT_FALSE(mClient->GetRootAsync(root.CollectionDone(), root.Error(), Guid::CreateUnique()).IsNil());
-    ASSERT_TRUE(root.Succeeded()) << root.Status();
-    auto rootCollection = boost::dynamic_pointer_cast<Collection>(root.Asset());
-    ASSERT_TRUE(rootCollection);
+    const auto root = Root();
+    ASSERT_TRUE(root);
     const ImmutableString type = ImmutableString::CreateStatic("application/octet-stream");
 
     // Not a connection reset (-100): the service reads 1 MiB of it, answers and closes gracefully.
     Call tooLarge;
-    mClient->UploadAsync(tooLarge.ItemDone(), tooLarge.Error(), rootCollection, Source(std::string(2 << 20, 'x')), type,
-                         u"big.bin", Guid::CreateUnique());
-    EXPECT_FALSE(tooLarge.Succeeded());
-    EXPECT_EQ(413, tooLarge.Status());
+    mClient->UploadAsync(tooLarge.Done(), tooLarge.Error(), root, Source(std::string(2 << 20, 'x')), type, u"big.bin",
+                         Guid::CreateUnique());
+    EXPECT_FALSE(tooLarge.Wait().mSuccess);
+    EXPECT_EQ(413, tooLarge.Wait().mStatus);
     EXPECT_EQ(0u, mService->Content().TemporaryCount());
 
     Call fits;
-    mClient->UploadAsync(fits.ItemDone(), fits.Error(), rootCollection, Source(std::string(1 << 20, 'y')), type,
-                         u"fits.bin", Guid::CreateUnique());
-    ASSERT_TRUE(fits.Succeeded()) << fits.Status();
-    EXPECT_EQ(1 << 20, boost::dynamic_pointer_cast<Item>(fits.Asset())->mSize);
+    mClient->UploadAsync(fits.Done(), fits.Error(), root, Source(std::string(1 << 20, 'y')), type, u"fits.bin",
+                         Guid::CreateUnique());
+    const auto fitted = boost::dynamic_pointer_cast<Item>(fits.Succeeded().mAsset);
+    ASSERT_TRUE(fitted);
+    EXPECT_EQ(1 << 20, fitted->mSize);
 }
 
 INSTANTIATE_TEST_SUITE_P(OneStyle, UploadLimitTest, ::testing::Values(AnswerStyle()));

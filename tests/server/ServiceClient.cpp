@@ -1,8 +1,15 @@
 #include "ServiceClient.h"
 
-#include <strings.h>
+#include "foundation/net/QuoteURL.h"
 
-#include <cstdio>
+#include <arpa/inet.h>
+#include <netinet/in.h>
+#include <strings.h>
+#include <sys/socket.h>
+#include <unistd.h>
+
+#include <algorithm>
+#include <cstring>
 
 namespace servertest {
 
@@ -19,14 +26,22 @@ size_t CollectHeader(char* data, size_t size, size_t count, void* target)
     const std::string line(data, size * count);
     const std::size_t colon = line.find(':');
     if (colon != std::string::npos) {
-        std::string value = line.substr(colon + 1);
-        while (!value.empty() && (value.front() == ' ')) value.erase(0, 1);
-        while (!value.empty() && (value.back() == '\r' || value.back() == '\n' || value.back() == ' ')) {
-            value.pop_back();
-        }
+        const std::size_t start = line.find_first_not_of(' ', colon + 1);
+        const std::size_t end = line.find_last_not_of(" \r\n");
+        const std::string value = end < start ? std::string() : line.substr(start, end + 1 - start);
         static_cast<std::multimap<std::string, std::string>*>(target)->emplace(line.substr(0, colon), value);
     }
     return size * count;
+}
+
+// Fills the buffer with 'x' until the bytes left run out.
+size_t GenerateBody(char* buffer, size_t size, size_t count, void* left)
+{
+    auto& remaining = *static_cast<std::uint64_t*>(left);
+    const std::size_t n = static_cast<std::size_t>(std::min<std::uint64_t>(size * count, remaining));
+    std::memset(buffer, 'x', n);
+    remaining -= n;
+    return n;
 }
 
 }  // namespace
@@ -38,14 +53,6 @@ std::string Reply::Header(const std::string& name) const
         if (strcasecmp(entry.first.c_str(), name.c_str()) == 0) found = entry.second;
     }
     return found;
-}
-
-std::string Reply::HeaderSpelling(const std::string& name) const
-{
-    for (const auto& entry : mHeaders) {
-        if (strcasecmp(entry.first.c_str(), name.c_str()) == 0) return entry.first;
-    }
-    return std::string();
 }
 
 ServiceClient::ServiceClient(const std::string& base, const std::string& token)
@@ -61,15 +68,37 @@ ServiceClient::~ServiceClient()
 Reply ServiceClient::Send(const std::string& method, const std::string& path, const std::string& body,
                           const std::vector<std::string>& headers)
 {
+    return Perform(method, path, headers, [&](CURL* curl) {
+        if (method != "POST" && method != "PUT") return;
+        curl_easy_setopt(curl, CURLOPT_POST, 1L);
+        curl_easy_setopt(curl, CURLOPT_POSTFIELDS, body.data());
+        curl_easy_setopt(curl, CURLOPT_POSTFIELDSIZE_LARGE, static_cast<curl_off_t>(body.size()));
+    });
+}
+
+Reply ServiceClient::PostGenerated(const std::string& path, std::uint64_t size)
+{
+    std::uint64_t left = size;
+    return Perform("POST", path, {"Content-Type: application/octet-stream"}, [&](CURL* curl) {
+        curl_easy_setopt(curl, CURLOPT_POST, 1L);
+        curl_easy_setopt(curl, CURLOPT_POSTFIELDSIZE_LARGE, static_cast<curl_off_t>(size));
+        curl_easy_setopt(curl, CURLOPT_READDATA, &left);
+        curl_easy_setopt(curl, CURLOPT_READFUNCTION, GenerateBody);
+    });
+}
+
+Reply ServiceClient::Perform(const std::string& method, const std::string& path,
+                             const std::vector<std::string>& headers, const std::function<void(CURL*)>& setBody)
+{
     Reply reply;
     const std::string url = mBase + path;
     curl_slist* list = nullptr;
     for (const std::string& header : headers) list = curl_slist_append(list, header.c_str());
     if (!mToken.empty()) list = curl_slist_append(list, ("Authorization: Bearer " + mToken).c_str());
+    // No "Expect: 100-continue": a body follows its headers unasked.
     list = curl_slist_append(list, "Expect:");
     curl_easy_reset(mCurl);
     curl_easy_setopt(mCurl, CURLOPT_URL, url.c_str());
-    curl_easy_setopt(mCurl, CURLOPT_CUSTOMREQUEST, method.c_str());
     curl_easy_setopt(mCurl, CURLOPT_HTTPHEADER, list);
     curl_easy_setopt(mCurl, CURLOPT_WRITEFUNCTION, CollectBody);
     curl_easy_setopt(mCurl, CURLOPT_WRITEDATA, &reply.mBody);
@@ -77,12 +106,8 @@ Reply ServiceClient::Send(const std::string& method, const std::string& path, co
     curl_easy_setopt(mCurl, CURLOPT_HEADERDATA, &reply.mHeaders);
     curl_easy_setopt(mCurl, CURLOPT_NOSIGNAL, 1L);
     curl_easy_setopt(mCurl, CURLOPT_NOPROXY, "*");
-    if (method == "POST" || method == "PUT") {
-        curl_easy_setopt(mCurl, CURLOPT_POST, 1L);
-        curl_easy_setopt(mCurl, CURLOPT_POSTFIELDS, body.data());
-        curl_easy_setopt(mCurl, CURLOPT_POSTFIELDSIZE_LARGE, static_cast<curl_off_t>(body.size()));
-        curl_easy_setopt(mCurl, CURLOPT_CUSTOMREQUEST, method.c_str());
-    }
+    setBody(mCurl);
+    curl_easy_setopt(mCurl, CURLOPT_CUSTOMREQUEST, method.c_str());
     reply.mCode = curl_easy_perform(mCurl);
     curl_easy_getinfo(mCurl, CURLINFO_RESPONSE_CODE, &reply.mStatus);
     curl_slist_free_all(list);
@@ -91,18 +116,21 @@ Reply ServiceClient::Send(const std::string& method, const std::string& path, co
 
 std::string Quote(const std::string& text)
 {
-    std::string quoted;
-    for (unsigned char c : text) {
-        if ((c >= 'A' && c <= 'Z') || (c >= 'a' && c <= 'z') || (c >= '0' && c <= '9') || c == '_' || c == '.' ||
-            c == '-') {
-            quoted += static_cast<char>(c);
-        } else {
-            char triplet[4];
-            std::snprintf(triplet, sizeof(triplet), "%%%02x", c);
-            quoted += triplet;
-        }
+    return tolmonet::_Quote(UTF8String(text)).ToStdString();
+}
+
+int ConnectLoopback(int port)
+{
+    sockaddr_in address{};
+    address.sin_family = AF_INET;
+    address.sin_port = htons(static_cast<std::uint16_t>(port));
+    address.sin_addr.s_addr = htonl(INADDR_LOOPBACK);
+    const int fd = ::socket(AF_INET, SOCK_STREAM, 0);
+    if (fd >= 0 && ::connect(fd, reinterpret_cast<const sockaddr*>(&address), sizeof address) != 0) {
+        ::close(fd);
+        return -1;
     }
-    return quoted;
+    return fd;
 }
 
 }  // namespace servertest

@@ -2,6 +2,8 @@
 // A plain libcurl client for the service tests: one easy handle per client,
 // so its connection is kept alive between requests. Loopback only.
 
+#include <cstdint>
+#include <functional>
 #include <map>
 #include <string>
 #include <vector>
@@ -18,8 +20,6 @@ struct Reply {
 
     // The last value of that header, names compared without case; empty if none.
     std::string Header(const std::string& name) const;
-    // The name exactly as it came on the wire, or empty.
-    std::string HeaderSpelling(const std::string& name) const;
 };
 
 class ServiceClient {
@@ -33,15 +33,22 @@ public:
     // path is appended to the base; headers as "Name: value".
     Reply Send(const std::string& method, const std::string& path, const std::string& body = std::string(),
                const std::vector<std::string>& headers = std::vector<std::string>());
-    void SetToken(const std::string& token) { mToken = token; }
+    // POSTs `size` bytes made as they go out, so neither side need hold them.
+    Reply PostGenerated(const std::string& path, std::uint64_t size);
 
 private:
+    Reply Perform(const std::string& method, const std::string& path, const std::vector<std::string>& headers,
+                  const std::function<void(CURL*)>& setBody);
+
     CURL* mCurl;
     std::string mBase;
     std::string mToken;
 };
 
-// Percent-quotes every byte outside A-Z a-z 0-9 _ . - as the client does.
+// Percent-quotes a query value as the client does.
 std::string Quote(const std::string& text);
+
+// A plain TCP connection to 127.0.0.1:port, for requests no client would send.
+int ConnectLoopback(int port);
 
 }  // namespace servertest

@@ -5,53 +5,20 @@
 
 namespace servertest {
 
-const char kAliceToken[] = "alice-token_0123456789";
-const char kBobToken[] = "bob-token_9876543210";
 const char kCollectionType[] = "application/vnd.halvane.tarnvault.collection";
 const char kPreferencesType[] = "application/vnd.halvane.tarnvault.collection.preferences";
 const char kRootType[] = "application/vnd.halvane.tarnvault.collection.root";
+const std::vector<std::string> kJson = {"Content-Type: application/json"};
 
-using tolmonetsync::server::LocalService;
-using tolmonetsync::server::LocalServiceOptions;
-
-LocalServiceOptions ServiceTest::Options() const
-{
-    LocalServiceOptions options;
-    options.mDataDirectory = mData.Path().string() + "/data";
-    options.mTokens.push_back({"alice", kAliceToken});
-    options.mTokens.push_back({"bob", kBobToken});
-    return options;
-}
-
-void ServiceTest::SetUp()
-{
-    mService = std::make_unique<LocalService>(Options());
-    mService->Start();
-    mAlice = Client(kAliceToken);
-    mBob = Client(kBobToken);
-}
-
-void ServiceTest::TearDown()
-{
-    mAlice.reset();
-    mBob.reset();
-    mService.reset();
-}
+ServiceTest::ServiceTest(const testsupport::TestService::Customise& customise) : mService(customise) {}
 
 void ServiceTest::Restart()
 {
     mAlice.reset();
     mBob.reset();
-    mService.reset();
-    mService = std::make_unique<LocalService>(Options());
-    mService->Start();
+    mService.Restart();
     mAlice = Client(kAliceToken);
     mBob = Client(kBobToken);
-}
-
-std::unique_ptr<ServiceClient> ServiceTest::Client(const std::string& token) const
-{
-    return std::make_unique<ServiceClient>(mService->AssetServiceUrl(), token);
 }
 
 std::string ServiceTest::ClientRoot(ServiceClient& client, const std::string& clientId)
@@ -66,25 +33,22 @@ std::string ServiceTest::ClientRoot(ServiceClient& client, const std::string& cl
 std::string ServiceTest::CreateCollection(ServiceClient& client, const std::string& name, const std::string& type)
 {
     const std::string body = "{\"header\":{\"name\":\"" + name + "\",\"type\":\"" + type + "\"}}";
-    const Reply reply = client.Send("POST", "/collections", body, {"Content-Type: application/json"});
+    const Reply reply = client.Send("POST", "/collections", body, kJson);
     EXPECT_EQ(201, reply.mStatus) << reply.mBody;
     return IdFromLocation(reply.Header("Location"));
 }
 
 void ServiceTest::AddMember(ServiceClient& client, const std::string& collectionId, const std::string& path)
 {
-    const Reply reply = client.Send("PUT", "/collections/" + collectionId + "/members", "[\"" + path + "\"]",
-                                    {"Content-Type: application/json"});
+    const Reply reply = client.Send("PUT", "/collections/" + collectionId + "/members", "[\"" + path + "\"]", kJson);
     EXPECT_EQ(200, reply.mStatus) << reply.mBody;
 }
 
 std::string ServiceTest::Upload(ServiceClient& client, const std::string& collectionId, const std::string& name,
                                 const std::string& bytes, const std::string& type)
 {
-    const std::string query =
-        "?name=" + Quote(name) + "&collections=" + Quote("[\"/api/collections/" + collectionId + "\"]");
-    const Reply reply =
-        client.Send("POST", "/assets" + query, bytes, {"Content-Type: " + type, "X-Persistence-Policy: ethereal"});
+    const Reply reply = client.Send("POST", "/assets?name=" + Quote(name) + Into(collectionId), bytes,
+                                    {"Content-Type: " + type, "X-Persistence-Policy: ethereal"});
     EXPECT_EQ(201, reply.mStatus) << reply.mBody;
     EXPECT_FALSE(reply.Header("ETag").empty());
     return IdFromLocation(reply.Header("Location"));
@@ -119,6 +83,11 @@ std::string IdFromLocation(const std::string& location)
 {
     const std::size_t slash = location.rfind('/');
     return slash == std::string::npos ? std::string() : location.substr(slash + 1);
+}
+
+std::string Into(const std::string& collectionId)
+{
+    return "&collections=" + Quote("[\"/api/collections/" + collectionId + "\"]");
 }
 
 }  // namespace servertest

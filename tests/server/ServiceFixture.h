@@ -1,6 +1,6 @@
 #pragma once
-// A local service on 127.0.0.1:0 with a fresh data directory and two users,
-// alice and bob, each with a fixed token; helpers that speak its routes.
+// The test service with two users, alice and bob, each with a client of
+// their own, and helpers that speak its routes.
 
 #include <memory>
 #include <string>
@@ -11,25 +11,27 @@
 
 #include "ServiceClient.h"
 #include "assets/Asset.h"
-#include "server/LocalService.h"
-#include "support/TempDir.h"
+#include "support/TestService.h"
 
 namespace servertest {
 
-extern const char kAliceToken[];
-extern const char kBobToken[];
+using testsupport::kAliceToken;
+using testsupport::kBobToken;
 extern const char kCollectionType[];
 extern const char kPreferencesType[];
 extern const char kRootType[];
+extern const std::vector<std::string> kJson;  // the Content-Type header of a JSON body
 
 class ServiceTest : public ::testing::Test {
 protected:
-    void SetUp() override;
-    void TearDown() override;
+    explicit ServiceTest(const testsupport::TestService::Customise& customise = {});
 
     // Stops the service and starts another on the same data directory.
     void Restart();
-    std::unique_ptr<ServiceClient> Client(const std::string& token) const;
+    std::unique_ptr<ServiceClient> Client(const std::string& token)
+    {
+        return std::make_unique<ServiceClient>(mService->AssetServiceUrl(), token);
+    }
 
     // Each helper expects success and fails the test otherwise.
     std::string ClientRoot(ServiceClient& client, const std::string& clientId);
@@ -44,15 +46,14 @@ protected:
     std::vector<std::string> Ids(const Reply& reply);
     std::vector<boost::shared_ptr<tolmonetsync::AssetBase> > Assets(const Reply& reply);
 
-    virtual tolmonetsync::server::LocalServiceOptions Options() const;
-
-    testsupport::TempDir mData;
-    std::unique_ptr<tolmonetsync::server::LocalService> mService;
-    std::unique_ptr<ServiceClient> mAlice;
-    std::unique_ptr<ServiceClient> mBob;
+    testsupport::TestService mService;
+    std::unique_ptr<ServiceClient> mAlice = Client(kAliceToken);
+    std::unique_ptr<ServiceClient> mBob = Client(kBobToken);
 };
 
 // The last piece of a Location, as the client takes an id from it.
 std::string IdFromLocation(const std::string& location);
+// The collections query of an upload into that collection.
+std::string Into(const std::string& collectionId);
 
 }  // namespace servertest
