@@ -73,6 +73,9 @@ public:
     std::size_t RemoveUnreferencedContent();
     // For tests and tools: the service has no request that trashes.
     void SetTrashed(std::int64_t owner, const std::string& id, bool trashed);
+    // For tests and tools: dates an item as another computer's clock would
+    // (microseconds since 1970), where the service's own stamps are unique.
+    void SetModified(std::int64_t owner, const std::string& id, std::int64_t microsecondsSince1970);
 
 private:
     void EnsureUserRoot(std::int64_t owner);

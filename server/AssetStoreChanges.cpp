@@ -164,5 +164,13 @@ void AssetStore::SetTrashed(std::int64_t owner, const std::string& id, bool tras
     transaction.Commit();
 }
 
+void AssetStore::SetModified(std::int64_t owner, const std::string& id, std::int64_t microsecondsSince1970)
+{
+    std::lock_guard<std::mutex> writer(mDatabase.WriteLock());
+    Database::Lease db = mDatabase.Acquire();
+    rows::Require(*db, owner, id);
+    Statement(*db, "UPDATE assets SET modified = ?1 WHERE id = ?2").Bind(1, microsecondsSince1970).Bind(2, id).Run();
+}
+
 }  // namespace server
 }  // namespace tolmonetsync

@@ -18,7 +18,6 @@
 #include "foundation/net/HeaderConstants.h"
 #include "server/Accounts.h"
 #include "server/AssetStore.h"
-#include "server/Database.h"
 #include "server/TreeSeeder.h"
 #include "support/TestScopes.h"
 #include "support/TestService.h"
@@ -188,11 +187,7 @@ private:
     {
         DeleteRemote(name);
         const AssetRecord item = mService->Assets().Upload(mOwner, {Group(true)}, name, kMediaType, bytes);
-        server::Connection store((mService.DataDirectory() / "service.sqlite3").string());
-        server::Statement(store, "UPDATE assets SET modified = ?1 WHERE id = ?2")
-            .Bind(1, secondsSince1970 * 1000000)
-            .Bind(2, item.mId)
-            .Run();
+        mService->Assets().SetModified(mOwner, item.mId, secondsSince1970 * 1000000);
         return item.mEtag;
     }
 
