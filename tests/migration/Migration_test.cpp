@@ -17,9 +17,9 @@
 #include "foundation/core/HostConfig.h"
 #include "foundation/net/HeaderConstants.h"
 #include "server/FaultHooks.h"
-#include "server/LocalService.h"
 #include "server/TreeSeeder.h"
 #include "support/TempDir.h"
+#include "support/TestService.h"
 #include "tarnvault/Tarnvault.h"
 
 namespace {
@@ -101,21 +101,8 @@ std::string RenamedTree(const std::string& tree, const std::string& from, const 
 
 class Migration : public ::testing::Test {
 protected:
-    Migration()
-    {
-        server::LocalServiceOptions options;
-        options.mDataDirectory = mData.Path().string();
-        options.mTokens.push_back({"ann", "tok"});
-        mService.reset(new server::LocalService(options));
-        mService->Start();
-        mSeed.reset(new TreeSeeder(*mService, "ann"));
-        setenv("TMPDIR", mTemp.Path().c_str(), 1);
-    }
-    ~Migration() override
-    {
-        unsetenv("TMPDIR");
-        mService->Stop();
-    }
+    Migration() { setenv("TMPDIR", mTemp.Path().c_str(), 1); }
+    ~Migration() override { unsetenv("TMPDIR"); }
 
     void Host(const char16_t* app, const char16_t* version)
     {
@@ -129,7 +116,7 @@ protected:
         const std::string url = mService->AssetServiceUrl();
         parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(url.begin(), url.end()));
         parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, Text(kClient));
-        parameters.emplace_back(tolmonet::kHEADER_COOKIE, Text("tok"));
+        parameters.emplace_back(tolmonet::kHEADER_COOKIE, Text(testsupport::kAliceToken));
         if (major) parameters.emplace_back(tolmonet::kHEADER_CACHECONTROL, Text("migrate-major"));
         if (previousMajor) parameters.emplace_back(tolmonet::kHEADER_CACHECONTROL, Text("migrate-previous-major"));
         return boost::shared_ptr<tarnvault::Tarnvault>(new tarnvault::Tarnvault(parameters));
@@ -157,6 +144,26 @@ protected:
         const std::string root = mSeed->Find(mSeed->ClientRoot(kClient), "Co_" + app + "_" + version);
         return root.empty() ? "<no root>" : mSeed->Describe(root);
     }
+    // Copies `source` into `target` with no name map; waits for its end.
+    Ended Copy(const std::string& source, const std::string& target)
+    {
+        Waiter waiter;
+        auto client = Client(false, false);
+        client->CopyAsync(waiter.OnSuccess(), waiter.OnError(), CollectionWithId(source), CollectionWithId(target),
+                          Guid::CreateUnique(), tarnvault::Tarnvault::NameMap());
+        return waiter.Wait();
+    }
+    static boost::shared_ptr<Collection> CollectionWithId(const std::string& id)
+    {
+        const auto collection = boost::make_shared<Collection>();
+        collection->mId = UTF8String(id.begin(), id.end());
+        return collection;
+    }
+    bool WaitForNoTempFiles() const
+    {
+        for (int i = 0; i < 3000 && TempFiles() != 0; ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
+        return TempFiles() == 0;
+    }
     std::size_t TempFiles() const
     {
         std::size_t count = 0;
@@ -165,10 +172,9 @@ protected:
     }
     static UTF8String Text(const char* text) { return UTF8String(reinterpret_cast<const unsigned char*>(text)); }
 
-    testsupport::TempDir mData;
     testsupport::TempDir mTemp;
-    std::unique_ptr<server::LocalService> mService;
-    std::unique_ptr<TreeSeeder> mSeed;
+    testsupport::TestService mService;
+    std::unique_ptr<TreeSeeder> mSeed = std::make_unique<TreeSeeder>(*mService, "alice");
 };
 
 TEST_F(Migration, EachFormAndVersionCopiesTheRightEarlierTree)
@@ -197,9 +203,18 @@ TEST_F(Migration, EachFormAndVersionCopiesTheRightEarlierTree)
         for (const char* old : {"9.1", "8.5", "8.0"}) SeedVersion(clientRoot, app, old);
         Host(ToUTF16(app).c_str(), entry.mVersion);
         const std::string label = version + (entry.mMajor ? " major" : "") + (entry.mPrevious ? " previous-major" : "");
-        const Ended ended = PreferencesRoot(Client(entry.mMajor, entry.mPrevious));
+        const auto client = Client(entry.mMajor, entry.mPrevious);
+        std::vector<std::string> started;  // only the completion thread writes, before the root comes
+        client->SetMigrationStartedCallback([&](const UTF16String& fromVersion, const UTF16String& rootName) {
+            started.push_back(ToNarrow(fromVersion) + " " + ToNarrow(rootName));
+        });
+        const Ended ended = PreferencesRoot(client);
         ASSERT_TRUE(ended.mDone) << label;
         const std::string from = entry.mFrom;
+        const bool migrated = !from.empty() && from != "error";
+        EXPECT_EQ(started,
+                  migrated ? std::vector<std::string>{from + " Co_" + app + "_" + from} : std::vector<std::string>())
+            << label;
         if (from == "error") {
             EXPECT_EQ(ended.mError, "Could not migrate preferences, problem with client version") << label;
             EXPECT_EQ(NewRootTree(app, version), "<no root>") << label;
@@ -222,8 +237,11 @@ TEST_F(Migration, CinderalUpToEightTakesTheOldClientIdentifiersTree)
     SeedVersion(oldClientRoot, "Cinderal", "8.0");
     SeedVersion(mSeed->ClientRoot(kClient), "Cinderal", "9.1");
     Host(u"Cinderal", u"9.0");
-    ASSERT_TRUE(PreferencesRoot(Client(false, true)).mRoot);
+    const auto client = Client(false, true);
+    ASSERT_TRUE(PreferencesRoot(client).mRoot);
     EXPECT_NE(NewRootTree("Cinderal", "9.0").find("from-9.0.txt"), std::string::npos) << NewRootTree("Cinderal", "9.0");
+    // The older root is not cached in place of ours.
+    EXPECT_EQ(client->CachedRoot()->mId.ToStdString(), mSeed->ClientRoot(kClient));
 
     // Above 8.0 the current identifier's tree is the source.
     Host(u"Cinderal", u"9.2");
@@ -232,13 +250,26 @@ TEST_F(Migration, CinderalUpToEightTakesTheOldClientIdentifiersTree)
     EXPECT_EQ(mSeed->Describe(mSeed->Find(oldClientRoot, "Co_Cinderal_8.0")).find("9.0"), std::string::npos);
 }
 
-TEST_F(Migration, AnEmptyEarlierRootGivesAnEmptyNewOne)
+TEST_F(Migration, AnEmptyOrUnreadableEarlierRootGivesAnEmptyNewOne)
 {
     mSeed->Collection(mSeed->ClientRoot(kClient), "Co_App_9.1", server::kMediaPreferences);
     Host(u"App", u"9.2");
     const Ended ended = PreferencesRoot(Client(true, false));
     ASSERT_TRUE(ended.mRoot) << ended.mError;
     EXPECT_EQ(NewRootTree("App", "9.2"), "");
+
+    // The search for the earlier root fails: the new root still comes.
+    SeedVersion(mSeed->ClientRoot(kClient), "App", "9.2");
+    server::FaultRule broken;
+    broken.mMethod = "POST";
+    broken.mPathPattern = "/api/search";
+    broken.mQueryPattern = "9\\.2";
+    const auto fault = mService->Faults().Install(broken);
+    Host(u"App", u"9.3");
+    const Ended failed = PreferencesRoot(Client(true, false));
+    EXPECT_TRUE(fault->Fired());
+    ASSERT_TRUE(failed.mRoot) << failed.mError;
+    EXPECT_EQ(NewRootTree("App", "9.3"), "");
 }
 
 TEST_F(Migration, AFailedUploadLeavesTheNewRootPartlyFilledAndIsNotRetried)
@@ -260,8 +291,28 @@ TEST_F(Migration, AFailedUploadLeavesTheNewRootPartlyFilledAndIsNotRetried)
     for (std::size_t at = 0; (at = copied.find("): ", at)) != std::string::npos; ++at) ++items;
     EXPECT_EQ(items, 2u) << copied;
     EXPECT_EQ(mSeed->Describe(old), before);
-    for (int i = 0; i < 300 && TempFiles() != 0; ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    EXPECT_EQ(TempFiles(), 0u);
+    EXPECT_TRUE(WaitForNoTempFiles());
+}
+
+TEST_F(Migration, ACopyWithAFailedUploadLetsTheRestArriveAndReportsOnceAtTheEnd)
+{
+    const std::string clientRoot = mSeed->ClientRoot(kClient);
+    const std::string source = SeedVersion(clientRoot, "App", "9.1");
+    const std::string target = mSeed->Collection(clientRoot, "Target");
+    server::FaultRule refuse;
+    refuse.mMethod = "POST";
+    refuse.mPathPattern = "/api/assets";
+    refuse.mNth = 2;
+    refuse.mBody = "disk full";
+    mService->Faults().Install(refuse);
+    const Ended ended = Copy(source, target);
+    ASSERT_TRUE(ended.mDone);
+    EXPECT_NE(ended.mError.find("disk full"), std::string::npos) << ended.mError;
+    std::size_t items = 0;
+    const std::string copied = mSeed->Describe(target);
+    for (std::size_t at = 0; (at = copied.find("): ", at)) != std::string::npos; ++at) ++items;
+    EXPECT_EQ(items, 2u) << copied;
+    EXPECT_TRUE(WaitForNoTempFiles());
 }
 
 TEST_F(Migration, ACopyWhoseClientGoesMidwayEndsOnceAndLeavesNoTemporaryFile)
@@ -280,19 +331,14 @@ TEST_F(Migration, ACopyWhoseClientGoesMidwayEndsOnceAndLeavesNoTemporaryFile)
     Waiter waiter;
     {
         auto client = Client(false, false);
-        const auto sourceCollection = boost::make_shared<Collection>();
-        sourceCollection->mId = UTF8String(source.begin(), source.end());
-        const auto targetCollection = boost::make_shared<Collection>();
-        targetCollection->mId = UTF8String(target.begin(), target.end());
-        client->CopyAsync(waiter.OnSuccess(), waiter.OnError(), sourceCollection, targetCollection,
+        client->CopyAsync(waiter.OnSuccess(), waiter.OnError(), CollectionWithId(source), CollectionWithId(target),
                           Guid::CreateUnique(), tarnvault::Tarnvault::NameMap());
         while (!fault->Fired()) std::this_thread::sleep_for(std::chrono::milliseconds(5));
     }  // the client goes while the first download is held
     const Ended ended = waiter.Wait();
     ASSERT_TRUE(ended.mDone);
     EXPECT_EQ(ended.mError, "Tarnvault closed prematurely");
-    for (int i = 0; i < 300 && TempFiles() != 0; ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    EXPECT_EQ(TempFiles(), 0u);
+    EXPECT_TRUE(WaitForNoTempFiles());
 }
 
 }  // namespace

@@ -18,7 +18,7 @@ TEST_F(ClientTest, RootIsAskedForByNameOnceAndThenCached)
     mService.Script(200, "[" + CollectionJSON("plain", "client-1") + "," + kRoot + "]");
     Outcome first;
     const Guid id = Guid::CreateUnique();
-    EXPECT_EQ(mClient->GetRootAsync(first.CollectionDone(), first.Error(), id), id);
+    EXPECT_EQ(mClient->GetRootAsync(first.Success(), first.Error(), id), id);
     ASSERT_TRUE(first.Wait());
     const HttpRequest request = mService.Find("GET", "/api/collections?name=client-1");
     EXPECT_EQ(request.mTarget, "/api/collections?name=client-1");
@@ -29,7 +29,7 @@ TEST_F(ClientTest, RootIsAskedForByNameOnceAndThenCached)
 
     Outcome second;
     const Guid again = Guid::CreateUnique();
-    EXPECT_EQ(mClient->GetRootAsync(second.CollectionDone(), second.Error(), again), again);
+    EXPECT_EQ(mClient->GetRootAsync(second.Success(), second.Error(), again), again);
     EXPECT_EQ(second.Calls(), 1);  // before the call returned
     EXPECT_EQ(second.Id(), again);
     EXPECT_EQ(second.AssetSeen(), first.AssetSeen());
@@ -38,7 +38,7 @@ TEST_F(ClientTest, RootIsAskedForByNameOnceAndThenCached)
     // Signing out keeps the cached root.
     mClient->Logout([](SyncServer_ConnectionState) {});
     Outcome third;
-    mClient->GetRootAsync(third.CollectionDone(), third.Error(), Guid::CreateUnique());
+    mClient->GetRootAsync(third.Success(), third.Error(), Guid::CreateUnique());
     EXPECT_EQ(third.Calls(), 1);
     EXPECT_EQ(mService.Requests().size(), 1u);
 }
@@ -62,7 +62,7 @@ TEST_F(ClientTest, RootFailures)
         SCOPED_TRACE(c.mBody);
         mService.Script(c.mStatus, c.mBody);
         Outcome outcome;
-        mClient->GetRootAsync(outcome.CollectionDone(), outcome.Error(), Guid::CreateUnique());
+        mClient->GetRootAsync(outcome.Success(), outcome.Error(), Guid::CreateUnique());
         ASSERT_TRUE(outcome.Wait());
         EXPECT_FALSE(outcome.Succeeded());
         EXPECT_EQ(outcome.Status(), c.mExpectedStatus);
@@ -81,7 +81,7 @@ TEST(UserRoot, WithoutClientIdentifierEveryCallSearchesByTypeAndCachesNothing)
     service.Script(200, "[]");
     std::vector<Outcome> outcomes(4);
     for (Outcome& outcome : outcomes) {
-        client->GetRootAsync(outcome.CollectionDone(), outcome.Error(), Guid::CreateUnique());
+        client->GetRootAsync(outcome.Success(), outcome.Error(), Guid::CreateUnique());
         ASSERT_TRUE(outcome.Wait());
     }
     ASSERT_EQ(service.Requests().size(), 4u);
@@ -93,33 +93,26 @@ TEST(UserRoot, WithoutClientIdentifierEveryCallSearchesByTypeAndCachesNothing)
     EXPECT_FALSE(client->CachedRoot());
 }
 
-TEST(PreferencesRoot, NameJoinsCompanyClientAndVersion)
-{
-    HostIdentity host(u"A", u"B C", u"9.0");
-    boost::shared_ptr<Tarnvault> client(new Tarnvault(ParameterList()));
-    EXPECT_EQ(client->GetPreferencesRootName(), UTF16String(u"A_B C_9.0"));
-}
-
 TEST_F(ClientTest, PreferencesRootIsMadeOnFirstUseUnderAChainIdentifier)
 {
-    HostIdentity host(u"A", u"B", u"9.0");
+    HostIdentity host(u"A", u"B C", u"9.0");
     mService.Script(200, "[" + kRoot + "]");
     mService.Script(200, "[]");
     mService.Script(201, "", {{"Location", "/api/collections/pref1"}});
-    mService.Script(200, CollectionJSON("pref1", "A_B_9.0", kPreferencesMedia));
+    mService.Script(200, CollectionJSON("pref1", "A_B C_9.0", kPreferencesMedia));
     mService.Script(200, "");
     Outcome outcome;
     const Guid given = Guid::CreateUnique();
-    const Guid chain = mClient->GetPreferencesRootAsync(outcome.CollectionDone(), outcome.Error(), given);
+    const Guid chain = mClient->GetPreferencesRootAsync(outcome.Success(), outcome.Error(), given);
     EXPECT_NE(chain, given);
     ASSERT_TRUE(outcome.Wait());
     const auto requests = mService.Requests();
     ASSERT_EQ(requests.size(), 5u);
     EXPECT_EQ(mService.Find("GET", "/api/collections?name=client-1").mMethod, "GET");
-    EXPECT_EQ(mService.Find("POST", "/api/search?", R"("name":"A_B_9.0")").mMethod, "POST");
+    EXPECT_EQ(mService.Find("POST", "/api/search?", R"("name":"A_B C_9.0")").mMethod, "POST");
     EXPECT_EQ(mService.Find("POST", "/api/search?", R"(scope=["/collections/root1"])").mMethod, "POST");
     EXPECT_EQ(mService.Find("POST", "/api/collections").mBody,
-              std::string(R"({"header":{"name":"A_B_9.0","type":")") + kPreferencesMedia + "\"}}");
+              std::string(R"({"header":{"name":"A_B C_9.0","type":")") + kPreferencesMedia + "\"}}");
     EXPECT_EQ(mService.Find("GET", "/api/collections/pref1/header").mMethod, "GET");
     EXPECT_EQ(mService.Find("PUT", "/api/collections/root1/members").mBody, R"(["/collections/pref1"])");
     for (const HttpRequest& request : requests) ExpectAuthorised(request, chain);
@@ -128,9 +121,9 @@ TEST_F(ClientTest, PreferencesRootIsMadeOnFirstUseUnderAChainIdentifier)
     EXPECT_EQ(outcome.AssetSeen()->mId, "pref1");
 
     // Next time the root is cached and the search finds it.
-    mService.Script(200, "[" + CollectionJSON("pref1", "A_B_9.0", kPreferencesMedia) + "]");
+    mService.Script(200, "[" + CollectionJSON("pref1", "A_B C_9.0", kPreferencesMedia) + "]");
     Outcome again;
-    mClient->GetPreferencesRootAsync(again.CollectionDone(), again.Error(), Guid::CreateUnique());
+    mClient->GetPreferencesRootAsync(again.Success(), again.Error(), Guid::CreateUnique());
     ASSERT_TRUE(again.Wait());
     EXPECT_EQ(mService.Requests().size(), 6u);
     ASSERT_TRUE(again.Succeeded());
@@ -140,12 +133,12 @@ TEST_F(ClientTest, PreferencesRootIsMadeOnFirstUseUnderAChainIdentifier)
 TEST_F(ClientTest, PreferencesRootOfTheWrongKindOrTwiceIsRefused)
 {
     mService.Script(200, "[" + kRoot + "]");
-    mService.Script(200, "[" + ItemJSON("i", "A_B_9.0") + "]");
+    mService.Script(200, "[" + ItemJSON("i", "A_B C_9.0") + "]");
     mService.Script(200, "[" + CollectionJSON("p1", "n") + "," + CollectionJSON("p2", "n") + "]");
     Outcome item, two;
-    mClient->GetPreferencesRootAsync(item.CollectionDone(), item.Error(), Guid::CreateUnique());
+    mClient->GetPreferencesRootAsync(item.Success(), item.Error(), Guid::CreateUnique());
     ASSERT_TRUE(item.Wait());
-    mClient->GetPreferencesRootAsync(two.CollectionDone(), two.Error(), Guid::CreateUnique());
+    mClient->GetPreferencesRootAsync(two.Success(), two.Error(), Guid::CreateUnique());
     ASSERT_TRUE(two.Wait());
     EXPECT_EQ(item.ErrorText(), "Too many PreferencesRoot, or bad type, try resetting!");
     EXPECT_EQ(two.ErrorText(), "Too many PreferencesRoot, or bad type, try resetting!");
@@ -165,7 +158,7 @@ TEST(Ownership, AClientWithARequestInFlightLivesUntilItsCallback)
     boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(server.Url("/api"), "tok", "client-1")));
     const boost::weak_ptr<Tarnvault> watch(client);
     Outcome outcome;
-    ASSERT_FALSE(client->GetRootAsync(outcome.CollectionDone(), outcome.Error(), Guid::CreateUnique()).IsNil());
+    ASSERT_FALSE(client->GetRootAsync(outcome.Success(), outcome.Error(), Guid::CreateUnique()).IsNil());
     ASSERT_TRUE(server.WaitForRequests(1, std::chrono::seconds(30)));
     client.reset();
     EXPECT_FALSE(watch.expired());

@@ -38,7 +38,7 @@ TEST_F(TransferTest, UploadDeletesEveryNamesakeLastFirstThenPostsAndReadsBack)
     Outcome outcome;
     const Guid id = Guid::CreateUnique();
     EXPECT_EQ(
-        mClient->UploadAsync(outcome.ItemDone(), outcome.Error(), collection, FileAt(mDir / "a.txt"), kText, u"", id),
+        mClient->UploadAsync(outcome.Success(), outcome.Error(), collection, FileAt(mDir / "a.txt"), kText, u"", id),
         id);
     ASSERT_TRUE(outcome.Wait());
     const auto requests = mService.Requests();
@@ -76,7 +76,7 @@ TEST_F(TransferTest, UploadOfAnEmptyFileUnderItsGivenNameSendsNoBody)
     mService.Script(201, "", {{"Location", "/api/assets/n"}});
     mService.Script(200, ItemJSON("n", "given name"));
     Outcome outcome;
-    mClient->UploadAsync(outcome.ItemDone(), outcome.Error(), MakeCollection("C"), FileAt(mDir / "empty.bin"), kText,
+    mClient->UploadAsync(outcome.Success(), outcome.Error(), MakeCollection("C"), FileAt(mDir / "empty.bin"), kText,
                          u"given name", Guid::CreateUnique());
     ASSERT_TRUE(outcome.Wait());
     ASSERT_EQ(mService.Requests().size(), 3u);
@@ -93,8 +93,8 @@ TEST_F(TransferTest, UploadFailures)
     // A file that is not there: only the search went out.
     mService.Script(200, "[]");
     Outcome missing;
-    mClient->UploadAsync(missing.ItemDone(), missing.Error(), MakeCollection("C"), FileAt(mDir / "none.txt"), kText,
-                         u"", Guid::CreateUnique());
+    mClient->UploadAsync(missing.Success(), missing.Error(), MakeCollection("C"), FileAt(mDir / "none.txt"), kText, u"",
+                         Guid::CreateUnique());
     ASSERT_TRUE(missing.Wait());
     EXPECT_EQ(missing.Status(), -100);
     EXPECT_FALSE(missing.ErrorText().empty());
@@ -105,7 +105,7 @@ TEST_F(TransferTest, UploadFailures)
     mService.Script(200, "[" + ItemJSON("old", "a.txt") + "]");
     mService.Script(403, "locked");
     Outcome deleteFailed;
-    mClient->UploadAsync(deleteFailed.ItemDone(), deleteFailed.Error(), MakeCollection("C"), FileAt(mDir / "a.txt"),
+    mClient->UploadAsync(deleteFailed.Success(), deleteFailed.Error(), MakeCollection("C"), FileAt(mDir / "a.txt"),
                          kText, u"", Guid::CreateUnique());
     ASSERT_TRUE(deleteFailed.Wait());
     EXPECT_EQ(deleteFailed.Status(), 403);
@@ -115,26 +115,22 @@ TEST_F(TransferTest, UploadFailures)
     mService.Script(200, "[]");
     mService.Script(200, "");
     Outcome notCreated;
-    mClient->UploadAsync(notCreated.ItemDone(), notCreated.Error(), MakeCollection("C"), FileAt(mDir / "a.txt"), kText,
+    mClient->UploadAsync(notCreated.Success(), notCreated.Error(), MakeCollection("C"), FileAt(mDir / "a.txt"), kText,
                          u"", Guid::CreateUnique());
     ASSERT_TRUE(notCreated.Wait());
     EXPECT_EQ(notCreated.Status(), 200);
     EXPECT_EQ(mService.Requests().size(), 5u);
-}
 
-TEST_F(TransferTest, UploadWhoseMetadataIsACollectionFailsPlainly)
-{
-    WriteFileBytes(mDir / "a.txt", "abc");
+    // Metadata that describes a collection: a plain error, and no new member.
     const auto collection = MakeCollection("C");
     mService.Script(200, "[]");
     mService.Script(201, "", {{"Location", "/api/assets/n"}});
     mService.Script(200, CollectionJSON("n", "a.txt"));
-    Outcome outcome;
-    mClient->UploadAsync(outcome.ItemDone(), outcome.Error(), collection, FileAt(mDir / "a.txt"), kText, u"",
+    Outcome notAnItem;
+    mClient->UploadAsync(notAnItem.Success(), notAnItem.Error(), collection, FileAt(mDir / "a.txt"), kText, u"",
                          Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_FALSE(outcome.Succeeded());
-    EXPECT_EQ(outcome.ErrorText(), "Upload: the new asset's metadata is not an item");
+    ASSERT_TRUE(notAnItem.Wait());
+    EXPECT_EQ(notAnItem.ErrorText(), "Upload: the new asset's metadata is not an item");
     EXPECT_TRUE(collection->mChildren.empty());
 }
 
@@ -145,7 +141,7 @@ TEST_F(TransferTest, DownloadWritesTheBodyAndReportsTheHeaders)
         {{"Content-Type", "text/plain"}, {"ETag", "\"v2\""}, {"Last-Modified", "Mon, 02 Mar 2026 10:00:00 GMT"}});
     Outcome outcome;
     const Guid id = Guid::CreateUnique();
-    EXPECT_EQ(mClient->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i1"), FileAt(mDir / "f.txt"),
+    EXPECT_EQ(mClient->DownloadAsync(outcome.Success(), outcome.Error(), MakeItem("i1"), FileAt(mDir / "f.txt"),
                                      "\"v1\"", id),
               id);
     ASSERT_TRUE(outcome.Wait());
@@ -153,7 +149,7 @@ TEST_F(TransferTest, DownloadWritesTheBodyAndReportsTheHeaders)
     EXPECT_EQ(request.Header("If-None-Match"), "\"v1\"");
     ExpectAuthorised(request, id);
     ASSERT_TRUE(outcome.Succeeded());
-    const DownloadResult result = outcome.DownloadSeen();
+    const DownloadResult result = outcome.Last().mDownload;
     EXPECT_TRUE(result.mDownloaded);
     EXPECT_EQ(result.mContentType, "text/plain");
     EXPECT_EQ(result.mEtag, "\"v2\"");
@@ -162,34 +158,29 @@ TEST_F(TransferTest, DownloadWritesTheBodyAndReportsTheHeaders)
     EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "content");
 }
 
-TEST_F(TransferTest, DownloadWithoutEtagSendsNoConditionAndTakesAnEmptyBody)
+// No tag: no condition, and an empty body is a file. Unchanged (304): no file.
+TEST_F(TransferTest, DownloadWithoutEtagOrUnchanged)
 {
     mService.Script(200, "");
-    Outcome outcome;
-    mClient->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i1"), FileAt(mDir / "f.txt"), "",
-                           Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    const HttpRequest request = mService.Find("GET", "/api/assets/i1");
-    EXPECT_EQ(request.mMethod, "GET");
-    EXPECT_FALSE(request.HasHeader("If-None-Match"));
-    ASSERT_TRUE(outcome.Succeeded());
-    EXPECT_TRUE(outcome.DownloadSeen().mDownloaded);
-    EXPECT_EQ(outcome.DownloadSeen().mContentSize, 0u);
-    EXPECT_TRUE(outcome.DownloadSeen().mEtag.empty());
-    EXPECT_TRUE(std::filesystem::exists(mDir / "f.txt"));
-    EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "");
-}
-
-TEST_F(TransferTest, DownloadUnchangedLeavesTheFileAlone)
-{
     mService.Script(304, "");
-    Outcome unchanged;
-    mClient->DownloadAsync(unchanged.Downloaded(), unchanged.Error(), MakeItem("i1"), FileAt(mDir / "new.txt"), "e",
+    Outcome empty, unchanged;
+    mClient->DownloadAsync(empty.Success(), empty.Error(), MakeItem("i1"), FileAt(mDir / "f.txt"), "",
+                           Guid::CreateUnique());
+    ASSERT_TRUE(empty.Wait());
+    EXPECT_FALSE(mService.Find("GET", "/api/assets/i1").HasHeader("If-None-Match"));
+    ASSERT_TRUE(empty.Succeeded());
+    EXPECT_TRUE(empty.Last().mDownload.mDownloaded);
+    EXPECT_EQ(empty.Last().mDownload.mContentSize, 0u);
+    EXPECT_TRUE(empty.Last().mDownload.mEtag.empty());
+    EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "");
+
+    mClient->DownloadAsync(unchanged.Success(), unchanged.Error(), MakeItem("i2"), FileAt(mDir / "new.txt"), "e",
                            Guid::CreateUnique());
     ASSERT_TRUE(unchanged.Wait());
+    EXPECT_EQ(mService.Find("GET", "/api/assets/i2").Header("If-None-Match"), "e");
     ASSERT_TRUE(unchanged.Succeeded());
-    EXPECT_FALSE(unchanged.DownloadSeen().mDownloaded);
-    EXPECT_TRUE(unchanged.DownloadSeen().mEtag.empty());
+    EXPECT_FALSE(unchanged.Last().mDownload.mDownloaded);
+    EXPECT_TRUE(unchanged.Last().mDownload.mEtag.empty());
     EXPECT_FALSE(std::filesystem::exists(mDir / "new.txt"));
 }
 
@@ -205,8 +196,14 @@ TEST_F(TransferTest, DownloadFailuresLeaveTheFileAsItWas)
         const char* mText;  // null: any text but an empty one
     } cases[] = {
         {"refused", [&] { mService.Script(404, "no such asset"); }, mDir / "kept.txt", 404, "no such asset"},
-        {"cut off mid-body", [&] { mService.ScriptHangUp(std::string(100000, 'x')); }, mDir / "kept.txt", -100,
-         nullptr},
+        {"cut off mid-body",
+         [&] {
+             HttpAnswer cut;
+             cut.mBody = std::string(100000, 'x');
+             cut.mFault = HttpAnswer::Fault_HangUpMidBody;
+             mService.Push(cut);
+         },
+         mDir / "kept.txt", -100, nullptr},
         {"into a missing directory", [&] { mService.Script(200, "content"); }, mDir / "no" / "f.txt", -100, nullptr},
     };
     for (const auto& failure : cases) {
@@ -214,7 +211,7 @@ TEST_F(TransferTest, DownloadFailuresLeaveTheFileAsItWas)
         const bool existed = std::filesystem::exists(failure.mTarget);
         failure.mScript();
         Outcome outcome;
-        mClient->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i1"), FileAt(failure.mTarget), "",
+        mClient->DownloadAsync(outcome.Success(), outcome.Error(), MakeItem("i1"), FileAt(failure.mTarget), "",
                                Guid::CreateUnique());
         ASSERT_TRUE(outcome.Wait());
         EXPECT_FALSE(outcome.Succeeded());
@@ -240,19 +237,19 @@ TEST_F(TransferTest, DownloadReachingItsLimitFailsAndRemovesItsFile)
     // Far past the limit: stopped while it arrives.
     mService.ScriptLarge("", size_t(64) << 20);
     Outcome over;
-    mClient->DownloadAsync(over.Downloaded(), over.Error(), MakeItem("i1"), FileAt(mDir / "f.txt.temp"), "",
+    mClient->DownloadAsync(over.Success(), over.Error(), MakeItem("i1"), FileAt(mDir / "f.txt.temp"), "",
                            Guid::CreateUnique());
     ASSERT_TRUE(over.Wait());
     EXPECT_LT(mService.BodyBytesSent(), size_t(64) << 20);
     // At the limit exactly, and a byte below it.
     mService.ScriptLarge("", limit);
     Outcome at;
-    mClient->DownloadAsync(at.Downloaded(), at.Error(), MakeItem("i1"), FileAt(mDir / "f.txt.temp"), "",
+    mClient->DownloadAsync(at.Success(), at.Error(), MakeItem("i1"), FileAt(mDir / "f.txt.temp"), "",
                            Guid::CreateUnique());
     ASSERT_TRUE(at.Wait());
     mService.ScriptLarge("", limit - 1);
     Outcome below;
-    mClient->DownloadAsync(below.Downloaded(), below.Error(), MakeItem("i1"), FileAt(mDir / "g.txt.temp"), "",
+    mClient->DownloadAsync(below.Success(), below.Error(), MakeItem("i1"), FileAt(mDir / "g.txt.temp"), "",
                            Guid::CreateUnique());
     ASSERT_TRUE(below.Wait());
 
@@ -267,7 +264,7 @@ TEST_F(TransferTest, DownloadReachingItsLimitFailsAndRemovesItsFile)
     EXPECT_EQ(names, (std::set<std::string>{"f.txt", "g.txt.temp"}));
     EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "old");
     ASSERT_TRUE(below.Succeeded());
-    EXPECT_EQ(below.DownloadSeen().mContentSize, limit - 1);
+    EXPECT_EQ(below.Last().mDownload.mContentSize, limit - 1);
     EXPECT_EQ(ReadFileBytes(mDir / "g.txt.temp"), std::string(limit - 1, ' '));
     // Nobody else's business until the swap gives it the mode it will keep.
     EXPECT_EQ(std::filesystem::status(mDir / "g.txt.temp").permissions() & std::filesystem::perms::mask,
@@ -281,7 +278,7 @@ TEST_F(TransferTest, DownloadRefusedWithAHugeTextIsStoppedAtTheJSONBound)
     const size_t huge = size_t(128) << 20;
     mService.ScriptLarge("", huge, 404);
     Outcome refused;
-    mClient->DownloadAsync(refused.Downloaded(), refused.Error(), MakeItem("i1"), FileAt(mDir / "f.txt.temp"), "",
+    mClient->DownloadAsync(refused.Success(), refused.Error(), MakeItem("i1"), FileAt(mDir / "f.txt.temp"), "",
                            Guid::CreateUnique());
     ASSERT_TRUE(refused.Wait());
     EXPECT_FALSE(refused.Succeeded());
