@@ -216,6 +216,16 @@ private:
     boost::weak_ptr<int> mWatch = mAlive;
 };
 
+// Starts an operation with a fresh outcome and waits for its callback.
+template <typename Start>
+Outcome Await(Start start)
+{
+    Outcome outcome;
+    start(outcome);
+    EXPECT_TRUE(outcome.Wait());
+    return outcome;
+}
+
 inline ParameterList Parameters(const std::string& url, const std::string& token, const std::string& clientID)
 {
     ParameterList parameters;
