@@ -4,6 +4,8 @@
 #include <future>
 
 #include "ClientTestSupport.h"
+#include "server/TreeSeeder.h"
+#include "support/TestService.h"
 
 using namespace tvtest;
 
@@ -43,34 +45,6 @@ TEST_F(ClientTest, RootIsAskedForByNameOnceAndThenCached)
     EXPECT_EQ(mService.Requests().size(), 1u);
 }
 
-TEST_F(ClientTest, RootFailures)
-{
-    struct Case {
-        int mStatus;
-        std::string mBody;
-        int mExpectedStatus;
-        std::string mExpectedText;
-    };
-    const std::vector<Case> cases = {
-        {200, "[]", -100, "Could not find root collection!"},
-        {200, "[" + CollectionJSON("plain", "client-1") + "]", -100, "Could not find root collection!"},
-        {204, "", 204, ""},
-        {401, "token expired", 401, "token expired"},
-        {200, "{}", -100, "_HandleGetRoot: JSON parsing problem"},
-    };
-    for (const Case& c : cases) {
-        SCOPED_TRACE(c.mBody);
-        mService.Script(c.mStatus, c.mBody);
-        Outcome outcome;
-        mClient->GetRootAsync(outcome.Success(), outcome.Error(), Guid::CreateUnique());
-        ASSERT_TRUE(outcome.Wait());
-        EXPECT_FALSE(outcome.Succeeded());
-        EXPECT_EQ(outcome.Status(), c.mExpectedStatus);
-        EXPECT_EQ(outcome.ErrorText(), c.mExpectedText);
-        EXPECT_FALSE(mClient->CachedRoot());
-    }
-}
-
 TEST(UserRoot, WithoutClientIdentifierEveryCallSearchesByTypeAndCachesNothing)
 {
     ScriptedService service;
@@ -93,41 +67,32 @@ TEST(UserRoot, WithoutClientIdentifierEveryCallSearchesByTypeAndCachesNothing)
     EXPECT_FALSE(client->CachedRoot());
 }
 
-TEST_F(ClientTest, PreferencesRootIsMadeOnFirstUseUnderAChainIdentifier)
+TEST(PreferencesRoot, IsMadeOnFirstUseUnderTheClientRootAndFoundAfterwards)
 {
     HostIdentity host(u"A", u"B C", u"9.0");
-    mService.Script(200, "[" + kRoot + "]");
-    mService.Script(200, "[]");
-    mService.Script(201, "", {{"Location", "/api/collections/pref1"}});
-    mService.Script(200, CollectionJSON("pref1", "A_B C_9.0", kPreferencesMedia));
-    mService.Script(200, "");
-    Outcome outcome;
+    testsupport::TestService service;
+    server::TreeSeeder seed(*service, "alice");
+    boost::shared_ptr<Tarnvault> client(
+        new Tarnvault(Parameters(service->AssetServiceUrl(), testsupport::kAliceToken, "client-1")));
     const Guid given = Guid::CreateUnique();
-    const Guid chain = mClient->GetPreferencesRootAsync(outcome.Success(), outcome.Error(), given);
+    Guid chain;
+    const Outcome made =
+        Await([&](Outcome& o) { chain = client->GetPreferencesRootAsync(o.Success(), o.Error(), given); });
     EXPECT_NE(chain, given);
-    ASSERT_TRUE(outcome.Wait());
-    const auto requests = mService.Requests();
-    ASSERT_EQ(requests.size(), 5u);
-    EXPECT_EQ(mService.Find("GET", "/api/collections?name=client-1").mMethod, "GET");
-    EXPECT_EQ(mService.Find("POST", "/api/search?", R"("name":"A_B C_9.0")").mMethod, "POST");
-    EXPECT_EQ(mService.Find("POST", "/api/search?", R"(scope=["/collections/root1"])").mMethod, "POST");
-    EXPECT_EQ(mService.Find("POST", "/api/collections").mBody,
-              std::string(R"({"header":{"name":"A_B C_9.0","type":")") + kPreferencesMedia + "\"}}");
-    EXPECT_EQ(mService.Find("GET", "/api/collections/pref1/header").mMethod, "GET");
-    EXPECT_EQ(mService.Find("PUT", "/api/collections/root1/members").mBody, R"(["/collections/pref1"])");
-    for (const HttpRequest& request : requests) ExpectAuthorised(request, chain);
-    ASSERT_TRUE(outcome.Succeeded());
-    EXPECT_EQ(outcome.Id(), chain);
-    EXPECT_EQ(outcome.AssetSeen()->mId, "pref1");
+    ASSERT_TRUE(made.Succeeded()) << made.ErrorText();
+    EXPECT_EQ(made.Id(), chain);
+    const std::string clientRoot = seed.ClientRoot("client-1");
+    EXPECT_EQ(seed.Describe(clientRoot), "A_B C_9.0/\n");
+    const auto root = boost::dynamic_pointer_cast<Collection>(made.AssetSeen());
+    ASSERT_TRUE(root);
+    EXPECT_EQ(root->mId.ToStdString(), seed.Find(clientRoot, "A_B C_9.0"));
+    EXPECT_EQ(root->mType, kCollectionType_Preferences);
 
-    // Next time the root is cached and the search finds it.
-    mService.Script(200, "[" + CollectionJSON("pref1", "A_B C_9.0", kPreferencesMedia) + "]");
-    Outcome again;
-    mClient->GetPreferencesRootAsync(again.Success(), again.Error(), Guid::CreateUnique());
-    ASSERT_TRUE(again.Wait());
-    EXPECT_EQ(mService.Requests().size(), 6u);
-    ASSERT_TRUE(again.Succeeded());
-    EXPECT_EQ(again.AssetSeen()->mId, "pref1");
+    const Outcome found =
+        Await([&](Outcome& o) { client->GetPreferencesRootAsync(o.Success(), o.Error(), Guid::CreateUnique()); });
+    ASSERT_TRUE(found.Succeeded());
+    EXPECT_EQ(found.AssetSeen()->mId, root->mId);
+    EXPECT_EQ(seed.Describe(clientRoot), "A_B C_9.0/\n");
 }
 
 TEST_F(ClientTest, PreferencesRootOfTheWrongKindOrTwiceIsRefused)
