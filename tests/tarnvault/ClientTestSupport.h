@@ -56,6 +56,14 @@ inline HttpAnswer Answer(int status, const std::string& body = std::string(), co
     return answer;
 }
 
+// `prefix` and then `fillBytes` spaces, made as they go out.
+inline HttpAnswer Large(const std::string& prefix, size_t fillBytes, int status = 200)
+{
+    HttpAnswer answer = Answer(status, prefix);
+    answer.mFillBytes = fillBytes;
+    return answer;
+}
+
 // Answers from a queue, in order, and records every request. An unscripted
 // request gets 599.
 class ScriptedService {
@@ -65,13 +73,6 @@ public:
     void Script(int status, const std::string& body = std::string(), const HttpHeaders& headers = HttpHeaders())
     {
         Push(tvtest::Answer(status, body, headers));
-    }
-    // `prefix` and then `fillBytes` spaces, made as they go out.
-    void ScriptLarge(const std::string& prefix, size_t fillBytes, int status = 200)
-    {
-        HttpAnswer answer = tvtest::Answer(status, prefix);
-        answer.mFillBytes = fillBytes;
-        Push(answer);
     }
     void Push(const HttpAnswer& answer)
     {

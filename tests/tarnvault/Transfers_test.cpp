@@ -200,13 +200,13 @@ TEST_F(TransferTest, DownloadReachingItsLimitFailsAndRemovesItsFile)
     WriteFileBytes(mDir / "f.txt", "old");
 
     // Far past the limit: stopped while it arrives.
-    mService.ScriptLarge("", size_t(64) << 20);
+    mService.Push(Large("", size_t(64) << 20));
     const Outcome over = Download("f.txt.temp");
     EXPECT_LT(mService.BodyBytesSent(), size_t(64) << 20);
     // At the limit exactly, and a byte below it.
-    mService.ScriptLarge("", limit);
+    mService.Push(Large("", limit));
     const Outcome at = Download("f.txt.temp");
-    mService.ScriptLarge("", limit - 1);
+    mService.Push(Large("", limit - 1));
     const Outcome below = Download("g.txt.temp");
 
     for (const Outcome* refused : {&over, &at}) {
@@ -230,7 +230,7 @@ TEST_F(TransferTest, DownloadReachingItsLimitFailsAndRemovesItsFile)
     // other answer, not the download's.
     mClient->SetDownloadSizeLimit(Tarnvault::kMaxDownloadSize);
     const size_t huge = size_t(128) << 20;
-    mService.ScriptLarge("", huge, 404);
+    mService.Push(Large("", huge, 404));
     const size_t sentBefore = mService.BodyBytesSent();
     const Outcome refused = Download("h.txt.temp");
     EXPECT_FALSE(refused.Succeeded());
