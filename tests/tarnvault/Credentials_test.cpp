@@ -141,17 +141,6 @@ TEST_F(CredentialsTest, NothingUsableStoredIsNotLoggedInAtOnceWithoutARequest)
     EXPECT_EQ(Check(), StateList{SyncServer_NotLoggedIn});
 }
 
-TEST_F(CredentialsTest, AStoredTokenMakesAClientWithoutOneUsable)
-{
-    WriteFileBytes(LastUserFile(), R"({"mUserID":"u"})");
-    ASSERT_TRUE(tolmocore::Keychain::SetPassword(Domain(u"Access"), u"u", tolmocore::utility::ToUTF16(kAliceToken)));
-    EXPECT_EQ(Check(), StateList{SyncServer_Connected});
-    Outcome outcome;
-    mClient->SearchAsync(outcome.Success(), outcome.Error(), SearchQuery(), Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_TRUE(outcome.Succeeded()) << outcome.ErrorText();
-}
-
 TEST_F(CredentialsTest, ARejectedTokenFailsAndStaysStoredForTheNextCheck)
 {
     server::FaultRule expired;

@@ -1,7 +1,7 @@
 // The authorising layer as the wire sees it: every verb carries the client's
 // bearer token and the request's identifier, beside the caller's own headers.
 // (That the token is read at each request: a client made without one works
-// once signed in, in the sign-in tests.)
+// once its stored sign-in is proved, in the identity tests.)
 
 #include <gtest/gtest.h>
 

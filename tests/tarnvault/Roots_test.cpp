@@ -45,25 +45,20 @@ TEST_F(ClientTest, RootIsAskedForByNameOnceAndThenCached)
     EXPECT_EQ(mService.Requests().size(), 1u);
 }
 
+// (What an unusable answer gives: with the other reads' failures.)
 TEST(UserRoot, WithoutClientIdentifierEveryCallSearchesByTypeAndCachesNothing)
 {
     ScriptedService service;
     boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(service.ApiUrl(), "tok", "")));
-    service.Script(200, "[" + kRoot + "]");
-    service.Script(200, "[" + kRoot + "]");
-    service.Script(200, "[" + ItemJSON("i", "x") + "]");
-    service.Script(200, "[]");
-    std::vector<Outcome> outcomes(4);
-    for (Outcome& outcome : outcomes) {
-        client->GetRootAsync(outcome.Success(), outcome.Error(), Guid::CreateUnique());
-        ASSERT_TRUE(outcome.Wait());
+    for (int call = 0; call < 2; ++call) {
+        service.Script(200, "[" + kRoot + "]");
+        EXPECT_TRUE(
+            Await([&](Outcome& o) { client->GetRootAsync(o.Success(), o.Error(), Guid::CreateUnique()); }).Succeeded());
     }
-    ASSERT_EQ(service.Requests().size(), 4u);
-    EXPECT_EQ(service.Find("POST", "/api/search?", std::string(R"("type":")") + kRootMedia).mMethod, "POST");
-    EXPECT_TRUE(outcomes[0].Succeeded());
-    EXPECT_TRUE(outcomes[1].Succeeded());
-    EXPECT_EQ(outcomes[2].ErrorText(), "GetRoot missing or too many root");
-    EXPECT_EQ(outcomes[3].ErrorText(), "GetRoot missing or too many root");
+    const auto requests = service.Requests();
+    ASSERT_EQ(requests.size(), 2u);
+    for (const HttpRequest& request : requests)
+        EXPECT_NE(Decode(request.mTarget).find(std::string(R"("type":")") + kRootMedia), std::string::npos);
     EXPECT_FALSE(client->CachedRoot());
 }
 

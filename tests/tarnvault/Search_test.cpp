@@ -73,9 +73,15 @@ TEST_F(ClientTest, UnusableAnswersReachTheErrorCallback)
     const Call header = [](Tarnvault& c, Outcome& o, const Guid& id) {
         return c.HeaderAsync(o.Success(), o.Error(), "c1", true, id);
     };
+    // A client without an identifier looks for the user's root by type.
+    const boost::shared_ptr<Tarnvault> anyClient(new Tarnvault(Parameters(mService.ApiUrl(), "tok", "")));
+    const Call userRoot = [&](Tarnvault&, Outcome& o, const Guid& id) {
+        return anyClient->GetRootAsync(o.Success(), o.Error(), id);
+    };
     const std::string twoItems = "[" + ItemJSON("i1", "a") + "," + ItemJSON("i2", "a") + "]";
     const std::string searchText = "_HandleSearch: JSON parsing problem";
     const std::string notFound = "Could not find root collection!";
+    const std::string noUserRoot = "GetRoot missing or too many root";
     // Twice the bound: what a hostile server could send without end. It is
     // stopped while it arrives.
     const size_t huge = size_t(128) << 20;
@@ -99,6 +105,8 @@ TEST_F(ClientTest, UnusableAnswersReachTheErrorCallback)
         {"root: 204", root, Answer(204), 204, ""},
         {"root: refused", root, Answer(401, "token expired"), 401, "token expired"},
         {"root: an object", root, Answer(200, "{}"), -100, "_HandleGetRoot: JSON parsing problem"},
+        {"user root: an item", userRoot, Answer(200, "[" + ItemJSON("i", "x") + "]"), -100, noUserRoot},
+        {"user root: none", userRoot, Answer(200, "[]"), -100, noUserRoot},
         {"header: refused", header, Answer(500), 500, ""},
         {"header: an array", header, Answer(200, "[1]"), -100, "_HandleHeader: JSON parsing problem"},
         {"header: past the bound", header, Large("{", huge), -100, "_HandleHeader: JSON answer is larger than 64 MiB"},
