@@ -17,9 +17,9 @@
 #include "foundation/core/HostConfig.h"
 #include "foundation/net/HeaderConstants.h"
 #include "server/FaultHooks.h"
-#include "server/LocalService.h"
 #include "server/TreeSeeder.h"
 #include "support/TempDir.h"
+#include "support/TestService.h"
 #include "tarnvault/Tarnvault.h"
 
 namespace {
@@ -32,7 +32,7 @@ using tolmocore::utility::ToUTF16;
 const char kClient[] = "desk";
 const char kCinderalOldClient[] = "5d26c4f8-0ae1-47b3-9c15-c3e7b0926d41";
 
-// What a request of the client ended with.
+// What a request of the client ended with: its root, if it gives one, or its error.
 struct Ended {
     bool mDone = false;
     std::string mError;
@@ -41,24 +41,19 @@ struct Ended {
 
 class Waiter {
 public:
-    CollectionCallback OnRoot()
+    // Fits the root's callback and a copy's.
+    auto OnSuccess()
     {
-        return [this](const Guid&, const boost::shared_ptr<Collection>& root) { Finish(root, std::string()); };
-    }
-    SuccessCallback OnSuccess()
-    {
-        return [this](const Guid&) { Finish(nullptr, std::string()); };
+        return [this](const Guid&, const auto&... root) { Finish(std::string(), root...); };
     }
     ErrorCallback OnError()
     {
         return [this](const Guid& id, const boost::shared_ptr<tolmonet::Response>& response) {
-            std::string text = "no response";
             try {
                 ThrowResponse(id, response);
             } catch (const std::exception& e) {
-                text = e.what();
+                Finish(e.what());
             }
-            Finish(nullptr, text);
         };
     }
     Ended Wait()
@@ -69,12 +64,10 @@ public:
     }
 
 private:
-    void Finish(const boost::shared_ptr<Collection>& root, const std::string& error)
+    void Finish(const std::string& error, const boost::shared_ptr<Collection>& root = nullptr)
     {
         std::lock_guard<std::mutex> lock(mMutex);
-        mEnded.mDone = true;
-        mEnded.mRoot = root;
-        mEnded.mError = error;
+        mEnded = Ended{true, error, root};
         mCame.notify_all();
     }
     std::mutex mMutex;
@@ -101,21 +94,8 @@ std::string RenamedTree(const std::string& tree, const std::string& from, const 
 
 class Migration : public ::testing::Test {
 protected:
-    Migration()
-    {
-        server::LocalServiceOptions options;
-        options.mDataDirectory = mData.Path().string();
-        options.mTokens.push_back({"ann", "tok"});
-        mService.reset(new server::LocalService(options));
-        mService->Start();
-        mSeed.reset(new TreeSeeder(*mService, "ann"));
-        setenv("TMPDIR", mTemp.Path().c_str(), 1);
-    }
-    ~Migration() override
-    {
-        unsetenv("TMPDIR");
-        mService->Stop();
-    }
+    Migration() { setenv("TMPDIR", mTemp.Path().c_str(), 1); }
+    ~Migration() override { unsetenv("TMPDIR"); }
 
     void Host(const char16_t* app, const char16_t* version)
     {
@@ -129,7 +109,7 @@ protected:
         const std::string url = mService->AssetServiceUrl();
         parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(url.begin(), url.end()));
         parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, Text(kClient));
-        parameters.emplace_back(tolmonet::kHEADER_COOKIE, Text("tok"));
+        parameters.emplace_back(tolmonet::kHEADER_COOKIE, Text(testsupport::kAliceToken));
         if (major) parameters.emplace_back(tolmonet::kHEADER_CACHECONTROL, Text("migrate-major"));
         if (previousMajor) parameters.emplace_back(tolmonet::kHEADER_CACHECONTROL, Text("migrate-previous-major"));
         return boost::shared_ptr<tarnvault::Tarnvault>(new tarnvault::Tarnvault(parameters));
@@ -137,7 +117,7 @@ protected:
     Ended PreferencesRoot(const boost::shared_ptr<tarnvault::Tarnvault>& client)
     {
         Waiter waiter;
-        client->GetPreferencesRootAsync(waiter.OnRoot(), waiter.OnError(), Guid::CreateUnique());
+        client->GetPreferencesRootAsync(waiter.OnSuccess(), waiter.OnError(), Guid::CreateUnique());
         return waiter.Wait();
     }
     // An earlier version's preferences root: an item named for it at the top
@@ -157,6 +137,32 @@ protected:
         const std::string root = mSeed->Find(mSeed->ClientRoot(kClient), "Co_" + app + "_" + version);
         return root.empty() ? "<no root>" : mSeed->Describe(root);
     }
+    // Copies `source` into `target` with no name map; waits for its end.
+    Ended Copy(const std::string& source, const std::string& target)
+    {
+        Waiter waiter;
+        auto client = Client(false, false);
+        client->CopyAsync(waiter.OnSuccess(), waiter.OnError(), CollectionWithId(source), CollectionWithId(target),
+                          Guid::CreateUnique(), tarnvault::Tarnvault::NameMap());
+        return waiter.Wait();
+    }
+    static boost::shared_ptr<Collection> CollectionWithId(const std::string& id)
+    {
+        const auto collection = boost::make_shared<Collection>();
+        collection->mId = UTF8String(id.begin(), id.end());
+        return collection;
+    }
+    static std::size_t ItemsIn(const std::string& described)
+    {
+        std::size_t items = 0;
+        for (std::size_t at = 0; (at = described.find("): ", at)) != std::string::npos; ++at) ++items;
+        return items;
+    }
+    bool WaitForNoTempFiles() const
+    {
+        for (int i = 0; i < 3000 && TempFiles() != 0; ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
+        return TempFiles() == 0;
+    }
     std::size_t TempFiles() const
     {
         std::size_t count = 0;
@@ -165,10 +171,9 @@ protected:
     }
     static UTF8String Text(const char* text) { return UTF8String(reinterpret_cast<const unsigned char*>(text)); }
 
-    testsupport::TempDir mData;
     testsupport::TempDir mTemp;
-    std::unique_ptr<server::LocalService> mService;
-    std::unique_ptr<TreeSeeder> mSeed;
+    testsupport::TestService mService;
+    std::unique_ptr<TreeSeeder> mSeed = std::make_unique<TreeSeeder>(*mService, "alice");
 };
 
 TEST_F(Migration, EachFormAndVersionCopiesTheRightEarlierTree)
@@ -197,9 +202,18 @@ TEST_F(Migration, EachFormAndVersionCopiesTheRightEarlierTree)
         for (const char* old : {"9.1", "8.5", "8.0"}) SeedVersion(clientRoot, app, old);
         Host(ToUTF16(app).c_str(), entry.mVersion);
         const std::string label = version + (entry.mMajor ? " major" : "") + (entry.mPrevious ? " previous-major" : "");
-        const Ended ended = PreferencesRoot(Client(entry.mMajor, entry.mPrevious));
+        const auto client = Client(entry.mMajor, entry.mPrevious);
+        std::vector<std::string> started;  // only the completion thread writes, before the root comes
+        client->SetMigrationStartedCallback([&](const UTF16String& fromVersion, const UTF16String& rootName) {
+            started.push_back(ToNarrow(fromVersion) + " " + ToNarrow(rootName));
+        });
+        const Ended ended = PreferencesRoot(client);
         ASSERT_TRUE(ended.mDone) << label;
         const std::string from = entry.mFrom;
+        const bool migrated = !from.empty() && from != "error";
+        EXPECT_EQ(started,
+                  migrated ? std::vector<std::string>{from + " Co_" + app + "_" + from} : std::vector<std::string>())
+            << label;
         if (from == "error") {
             EXPECT_EQ(ended.mError, "Could not migrate preferences, problem with client version") << label;
             EXPECT_EQ(NewRootTree(app, version), "<no root>") << label;
@@ -222,8 +236,11 @@ TEST_F(Migration, CinderalUpToEightTakesTheOldClientIdentifiersTree)
     SeedVersion(oldClientRoot, "Cinderal", "8.0");
     SeedVersion(mSeed->ClientRoot(kClient), "Cinderal", "9.1");
     Host(u"Cinderal", u"9.0");
-    ASSERT_TRUE(PreferencesRoot(Client(false, true)).mRoot);
+    const auto client = Client(false, true);
+    ASSERT_TRUE(PreferencesRoot(client).mRoot);
     EXPECT_NE(NewRootTree("Cinderal", "9.0").find("from-9.0.txt"), std::string::npos) << NewRootTree("Cinderal", "9.0");
+    // The older root is not cached in place of ours.
+    EXPECT_EQ(client->CachedRoot()->mId.ToStdString(), mSeed->ClientRoot(kClient));
 
     // Above 8.0 the current identifier's tree is the source.
     Host(u"Cinderal", u"9.2");
@@ -232,36 +249,55 @@ TEST_F(Migration, CinderalUpToEightTakesTheOldClientIdentifiersTree)
     EXPECT_EQ(mSeed->Describe(mSeed->Find(oldClientRoot, "Co_Cinderal_8.0")).find("9.0"), std::string::npos);
 }
 
-TEST_F(Migration, AnEmptyEarlierRootGivesAnEmptyNewOne)
+TEST_F(Migration, AnEmptyOrUnreadableEarlierRootGivesAnEmptyNewOne)
 {
     mSeed->Collection(mSeed->ClientRoot(kClient), "Co_App_9.1", server::kMediaPreferences);
     Host(u"App", u"9.2");
     const Ended ended = PreferencesRoot(Client(true, false));
     ASSERT_TRUE(ended.mRoot) << ended.mError;
     EXPECT_EQ(NewRootTree("App", "9.2"), "");
+
+    // The search for the earlier root fails: the new root still comes.
+    SeedVersion(mSeed->ClientRoot(kClient), "App", "9.2");
+    server::FaultRule broken;
+    broken.mMethod = "POST";
+    broken.mPathPattern = "/api/search";
+    broken.mQueryPattern = "9\\.2";
+    const auto fault = mService->Faults().Install(broken);
+    Host(u"App", u"9.3");
+    const Ended failed = PreferencesRoot(Client(true, false));
+    EXPECT_TRUE(fault->Fired());
+    ASSERT_TRUE(failed.mRoot) << failed.mError;
+    EXPECT_EQ(NewRootTree("App", "9.3"), "");
 }
 
-TEST_F(Migration, AFailedUploadLeavesTheNewRootPartlyFilledAndIsNotRetried)
+// A failed upload: the other items still arrive and none is sent twice. A
+// copy reports it at its end; a migration still gives the new root.
+TEST_F(Migration, AFailedUploadLetsTheRestArrive)
 {
-    const std::string old = SeedVersion(mSeed->ClientRoot(kClient), "App", "9.1");
+    const std::string clientRoot = mSeed->ClientRoot(kClient);
+    const std::string old = SeedVersion(clientRoot, "App", "9.1");
     const std::string before = mSeed->Describe(old);
     server::FaultRule refuse;
     refuse.mMethod = "POST";
     refuse.mPathPattern = "/api/assets";
     refuse.mNth = 2;
-    const auto fault = mService->Faults().Install(refuse);
-    Host(u"App", u"9.2");
-    const Ended ended = PreferencesRoot(Client(true, false));
-    ASSERT_TRUE(ended.mRoot) << "a failed copy still gives the new root: " << ended.mError;
-    EXPECT_TRUE(fault->Fired());
+    refuse.mBody = "disk full";
+    auto fault = mService->Faults().Install(refuse);
+    const std::string target = mSeed->Collection(clientRoot, "Target");
+    const Ended copied = Copy(old, target);
+    EXPECT_NE(copied.mError.find("disk full"), std::string::npos) << copied.mError;
     EXPECT_EQ(fault->Seen(), 3);  // three items, each sent once
-    const std::string copied = NewRootTree("App", "9.2");
-    std::size_t items = 0;
-    for (std::size_t at = 0; (at = copied.find("): ", at)) != std::string::npos; ++at) ++items;
-    EXPECT_EQ(items, 2u) << copied;
+    EXPECT_EQ(ItemsIn(mSeed->Describe(target)), 2u);
+
+    fault = mService->Faults().Install(refuse);
+    Host(u"App", u"9.2");
+    const Ended migrated = PreferencesRoot(Client(true, false));
+    ASSERT_TRUE(migrated.mRoot) << "a failed copy still gives the new root: " << migrated.mError;
+    EXPECT_EQ(fault->Seen(), 3);
+    EXPECT_EQ(ItemsIn(NewRootTree("App", "9.2")), 2u);
     EXPECT_EQ(mSeed->Describe(old), before);
-    for (int i = 0; i < 300 && TempFiles() != 0; ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    EXPECT_EQ(TempFiles(), 0u);
+    EXPECT_TRUE(WaitForNoTempFiles());
 }
 
 TEST_F(Migration, ACopyWhoseClientGoesMidwayEndsOnceAndLeavesNoTemporaryFile)
@@ -280,19 +316,14 @@ TEST_F(Migration, ACopyWhoseClientGoesMidwayEndsOnceAndLeavesNoTemporaryFile)
     Waiter waiter;
     {
         auto client = Client(false, false);
-        const auto sourceCollection = boost::make_shared<Collection>();
-        sourceCollection->mId = UTF8String(source.begin(), source.end());
-        const auto targetCollection = boost::make_shared<Collection>();
-        targetCollection->mId = UTF8String(target.begin(), target.end());
-        client->CopyAsync(waiter.OnSuccess(), waiter.OnError(), sourceCollection, targetCollection,
+        client->CopyAsync(waiter.OnSuccess(), waiter.OnError(), CollectionWithId(source), CollectionWithId(target),
                           Guid::CreateUnique(), tarnvault::Tarnvault::NameMap());
         while (!fault->Fired()) std::this_thread::sleep_for(std::chrono::milliseconds(5));
     }  // the client goes while the first download is held
     const Ended ended = waiter.Wait();
     ASSERT_TRUE(ended.mDone);
     EXPECT_EQ(ended.mError, "Tarnvault closed prematurely");
-    for (int i = 0; i < 300 && TempFiles() != 0; ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    EXPECT_EQ(TempFiles(), 0u);
+    EXPECT_TRUE(WaitForNoTempFiles());
 }
 
 }  // namespace

@@ -1,6 +1,7 @@
 #pragma once
-// A scripted service on loopback, a client pointed at it, and a recorder of
-// what the client's callbacks receive.
+// A scripted service on loopback for answers the local service would never
+// give, a client pointed at it, and a recorder of what the client's callbacks
+// receive.
 
 #include <gtest/gtest.h>
 
@@ -13,13 +14,10 @@
 #include <thread>
 #include <vector>
 
-#include <boost/shared_ptr.hpp>
+#include <boost/make_shared.hpp>
 #include <boost/weak_ptr.hpp>
 
-#include "assets/RestException.h"
-#include "foundation/core/Dir.h"
 #include "foundation/core/HostConfig.h"
-#include "foundation/core/Trace.h"
 #include "foundation/net/HeaderConstants.h"
 #include "support/LoopbackHttpServer.h"
 #include "support/TempDir.h"
@@ -42,14 +40,28 @@ inline std::string Decode(const std::string& text)
 {
     std::string out;
     for (size_t i = 0; i < text.size(); ++i) {
-        if (text[i] == '%' && i + 2 < text.size()) {
-            out += static_cast<char>(std::stoi(text.substr(i + 1, 2), nullptr, 16));
-            i += 2;
-        } else {
-            out += text[i];
-        }
+        const bool escape = text[i] == '%' && i + 2 < text.size();
+        out += escape ? static_cast<char>(std::stoi(text.substr(i + 1, 2), nullptr, 16)) : text[i];
+        i += escape ? 2 : 0;
     }
     return out;
+}
+
+inline HttpAnswer Answer(int status, const std::string& body = std::string(), const HttpHeaders& headers = {})
+{
+    HttpAnswer answer;
+    answer.mStatus = status;
+    answer.mBody = body;
+    answer.mHeaders = headers;
+    return answer;
+}
+
+// `prefix` and then `fillBytes` spaces, made as they go out.
+inline HttpAnswer Large(const std::string& prefix, size_t fillBytes, int status = 200)
+{
+    HttpAnswer answer = Answer(status, prefix);
+    answer.mFillBytes = fillBytes;
+    return answer;
 }
 
 // Answers from a queue, in order, and records every request. An unscripted
@@ -60,28 +72,7 @@ public:
 
     void Script(int status, const std::string& body = std::string(), const HttpHeaders& headers = HttpHeaders())
     {
-        HttpAnswer answer;
-        answer.mStatus = status;
-        answer.mBody = body;
-        answer.mHeaders = headers;
-        Push(answer);
-    }
-    // A 200 with a body that the server cuts off half way.
-    void ScriptHangUp(const std::string& body)
-    {
-        HttpAnswer answer;
-        answer.mBody = body;
-        answer.mFault = HttpAnswer::Fault_HangUpMidBody;
-        Push(answer);
-    }
-    // `prefix` and then `fillBytes` spaces, made as they go out.
-    void ScriptLarge(const std::string& prefix, size_t fillBytes, int status = 200)
-    {
-        HttpAnswer answer;
-        answer.mStatus = status;
-        answer.mBody = prefix;
-        answer.mFillBytes = fillBytes;
-        Push(answer);
+        Push(tvtest::Answer(status, body, headers));
     }
     void Push(const HttpAnswer& answer)
     {
@@ -127,104 +118,19 @@ private:
     testsupport::LoopbackHttpServer mServer;  // last: its threads stop first
 };
 
+// Waits until the object is gone, at most 30 s; true if it went.
+template <typename T>
+bool WaitExpired(const boost::weak_ptr<T>& watch)
+{
+    for (int i = 0; i < 3000 && !watch.expired(); ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
+    return watch.expired();
+}
+
 // What one operation's callbacks received. Every callback made by it holds
 // the alive token, so a test can tell that the client let go of them.
 class Outcome {
 public:
-    Outcome() : mState(new State), mAlive(new int(0)), mWatch(mAlive) {}
-
-    ErrorCallback Error()
-    {
-        auto state = mState;
-        auto alive = mAlive;
-        return [state, alive](const Guid& id, const boost::shared_ptr<tolmonet::Response>& response) {
-            state->Finish(id, false, response, [](State&) {});
-        };
-    }
-    SuccessCallback Success()
-    {
-        auto state = mState;
-        auto alive = mAlive;
-        return [state, alive](const Guid& id) { state->Finish(id, true, nullptr, [](State&) {}); };
-    }
-    AssetsCallback Assets()
-    {
-        auto state = mState;
-        auto alive = mAlive;
-        return [state, alive](const Guid& id, const std::vector<boost::shared_ptr<AssetBase> >& assets) {
-            state->Finish(id, true, nullptr, [&](State& s) { s.mAssets = assets; });
-        };
-    }
-    AssetCallback Asset()
-    {
-        auto state = mState;
-        auto alive = mAlive;
-        return [state, alive](const Guid& id, const boost::shared_ptr<AssetBase>& asset) {
-            state->Finish(id, true, nullptr, [&](State& s) { s.mAsset = asset; });
-        };
-    }
-    CollectionCallback CollectionDone()
-    {
-        auto state = mState;
-        auto alive = mAlive;
-        return [state, alive](const Guid& id, const boost::shared_ptr<Collection>& collection) {
-            state->Finish(id, true, nullptr, [&](State& s) { s.mAsset = collection; });
-        };
-    }
-    ItemCallback ItemDone()
-    {
-        auto state = mState;
-        auto alive = mAlive;
-        return [state, alive](const Guid& id, const boost::shared_ptr<Item>& item) {
-            state->Finish(id, true, nullptr, [&](State& s) { s.mAsset = item; });
-        };
-    }
-    DownloadCallback Downloaded()
-    {
-        auto state = mState;
-        auto alive = mAlive;
-        return [state, alive](const Guid& id, const DownloadResult& result) {
-            state->Finish(id, true, nullptr, [&](State& s) { s.mDownload = result; });
-        };
-    }
-    // Drops the test's own hold on the token: from now on only callbacks keep it.
-    void LetGo() { mAlive.reset(); }
-
-    // Waits for a callback, at most 30 s; false if none came.
-    bool Wait()
-    {
-        std::unique_lock<std::mutex> lock(mState->mMutex);
-        return mState->mChanged.wait_for(lock, std::chrono::seconds(30), [&] { return mState->mCalls > 0; });
-    }
-    // Waits until every callback made here is gone (LetGo first), at most 30 s.
-    bool WaitReleased() const
-    {
-        for (int i = 0; i < 3000 && !mWatch.expired(); ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
-        return mWatch.expired();
-    }
-
-    int Calls() const { return Locked().mCalls; }
-    bool Succeeded() const { return Locked().mSuccess; }
-    Guid Id() const { return Locked().mId; }
-    boost::shared_ptr<tolmonet::Response> Response() const { return Locked().mResponse; }
-    int Status() const
-    {
-        const auto response = Response();
-        return response ? response->status : 0;
-    }
-    std::string ErrorText() const
-    {
-        const auto response = Response();
-        return response ? response->BodyText().ToStdString() : std::string("(null response)");
-    }
-    std::vector<boost::shared_ptr<AssetBase> > AssetsSeen() const { return Locked().mAssets; }
-    boost::shared_ptr<AssetBase> AssetSeen() const { return Locked().mAsset; }
-    DownloadResult DownloadSeen() const { return Locked().mDownload; }
-
-private:
-    struct State {
-        std::mutex mMutex;
-        std::condition_variable mChanged;
+    struct Seen {
         int mCalls = 0;
         bool mSuccess = false;
         Guid mId;
@@ -233,45 +139,92 @@ private:
         boost::shared_ptr<AssetBase> mAsset;
         DownloadResult mDownload;
 
+        void Keep() {}
+        void Keep(const std::vector<boost::shared_ptr<AssetBase> >& assets) { mAssets = assets; }
+        void Keep(const boost::shared_ptr<AssetBase>& asset) { mAsset = asset; }
+        void Keep(const DownloadResult& download) { mDownload = download; }
+    };
+
+    // Fits every success callback of the client; the payload, if any, is kept.
+    auto Success()
+    {
+        auto state = mState;
+        auto alive = mAlive;
+        return [state, alive](const Guid& id, const auto&... payload) {
+            state->Finish(id, true, nullptr, [&](Seen& seen) { seen.Keep(payload...); });
+        };
+    }
+    ErrorCallback Error()
+    {
+        auto state = mState;
+        auto alive = mAlive;
+        return [state, alive](const Guid& id, const boost::shared_ptr<tolmonet::Response>& response) {
+            state->Finish(id, false, response, [](Seen&) {});
+        };
+    }
+    // Drops the test's own hold on the token: from now on only callbacks keep it.
+    void LetGo() { mAlive.reset(); }
+    // Waits until every callback made here is gone (LetGo first), at most 30 s.
+    bool WaitReleased() const { return WaitExpired(mWatch); }
+    // Waits for a callback, at most 30 s; false if none came.
+    bool Wait()
+    {
+        std::unique_lock<std::mutex> lock(mState->mMutex);
+        return mState->mChanged.wait_for(lock, std::chrono::seconds(30), [&] { return mState->mSeen.mCalls > 0; });
+    }
+
+    Seen Last() const
+    {
+        std::lock_guard<std::mutex> lock(mState->mMutex);
+        return mState->mSeen;
+    }
+    int Calls() const { return Last().mCalls; }
+    bool Succeeded() const { return Last().mSuccess; }
+    Guid Id() const { return Last().mId; }
+    boost::shared_ptr<AssetBase> AssetSeen() const { return Last().mAsset; }
+    int Status() const
+    {
+        const auto response = Last().mResponse;
+        return response ? response->status : 0;
+    }
+    std::string ErrorText() const
+    {
+        const auto response = Last().mResponse;
+        return response ? response->BodyText().ToStdString() : std::string("(null response)");
+    }
+
+private:
+    struct State {
+        std::mutex mMutex;
+        std::condition_variable mChanged;
+        Seen mSeen;
+
         template <typename Fill>
         void Finish(const Guid& id, bool success, const boost::shared_ptr<tolmonet::Response>& response, Fill fill)
         {
             std::lock_guard<std::mutex> lock(mMutex);
-            ++mCalls;
-            mSuccess = success;
-            mId = id;
-            mResponse = response;
-            fill(*this);
+            ++mSeen.mCalls;
+            mSeen.mSuccess = success;
+            mSeen.mId = id;
+            mSeen.mResponse = response;
+            fill(mSeen);
             mChanged.notify_all();
         }
     };
-    struct Snapshot {
-        int mCalls;
-        bool mSuccess;
-        Guid mId;
-        boost::shared_ptr<tolmonet::Response> mResponse;
-        std::vector<boost::shared_ptr<AssetBase> > mAssets;
-        boost::shared_ptr<AssetBase> mAsset;
-        DownloadResult mDownload;
-    };
-    Snapshot Locked() const
-    {
-        std::lock_guard<std::mutex> lock(mState->mMutex);
-        return Snapshot{mState->mCalls,  mState->mSuccess, mState->mId,      mState->mResponse,
-                        mState->mAssets, mState->mAsset,   mState->mDownload};
-    }
 
-    boost::shared_ptr<State> mState;
-    boost::shared_ptr<int> mAlive;
-    boost::weak_ptr<int> mWatch;
+    boost::shared_ptr<State> mState = boost::make_shared<State>();
+    boost::shared_ptr<int> mAlive = boost::make_shared<int>(0);
+    boost::weak_ptr<int> mWatch = mAlive;
 };
 
-// Waits until the object is gone, at most 30 s; true if it went.
-template <typename T>
-bool WaitExpired(const boost::weak_ptr<T>& watch)
+// Starts an operation with a fresh outcome and waits for its callback.
+template <typename Start>
+Outcome Await(Start start)
 {
-    for (int i = 0; i < 3000 && !watch.expired(); ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    return watch.expired();
+    Outcome outcome;
+    start(outcome);
+    EXPECT_TRUE(outcome.Wait());
+    return outcome;
 }
 
 inline ParameterList Parameters(const std::string& url, const std::string& token, const std::string& clientID)
@@ -293,19 +246,21 @@ inline std::string ItemJSON(const std::string& id, const std::string& name)
     return R"({"id":")" + id + R"(","name":")" + name + R"(","type":"text/plain","size":3})";
 }
 
+template <typename Asset>
+boost::shared_ptr<Asset> Make(const std::string& id)
+{
+    const auto asset = boost::make_shared<Asset>();
+    asset->mId = UTF8String(id);
+    asset->mName = tolmocore::utility::ToUTF16(id);
+    return asset;
+}
 inline boost::shared_ptr<Collection> MakeCollection(const std::string& id)
 {
-    boost::shared_ptr<Collection> collection(new Collection);
-    collection->mId = UTF8String(id);
-    collection->mName = tolmocore::utility::ToUTF16(id);
-    return collection;
+    return Make<Collection>(id);
 }
 inline boost::shared_ptr<Item> MakeItem(const std::string& id)
 {
-    boost::shared_ptr<Item> item(new Item);
-    item->mId = UTF8String(id);
-    item->mName = tolmocore::utility::ToUTF16(id);
-    return item;
+    return Make<Item>(id);
 }
 
 // The fixture of most client tests: a scripted service and a client of it
@@ -333,23 +288,20 @@ public:
           mClient(tolmocore::config::GetClientName()),
           mVersion(tolmocore::config::GetClientInternalVersion())
     {
-        tolmocore::config::SetCompanyName(UTF16String(company));
-        tolmocore::config::SetClientName(UTF16String(client));
-        tolmocore::config::SetClientInternalVersion(UTF16String(version));
+        Set(company, client, version);
     }
-    ~HostIdentity()
+    ~HostIdentity() { Set(mCompany, mClient, mVersion); }
+    static void Set(const UTF16String& company, const UTF16String& client, const UTF16String& version)
     {
-        tolmocore::config::SetCompanyName(mCompany);
-        tolmocore::config::SetClientName(mClient);
-        tolmocore::config::SetClientInternalVersion(mVersion);
+        tolmocore::config::SetCompanyName(company);
+        tolmocore::config::SetClientName(client);
+        tolmocore::config::SetClientInternalVersion(version);
     }
 
 private:
     UTF16String mCompany, mClient, mVersion;
 };
 
-// A preference directory of its own (last-user file, keychain store) and
-// trace capture, shared with the other tests.
 using PrefDirScope = testsupport::PrefDirScope;
 using TraceLines = testsupport::TraceCapture;
 

@@ -14,212 +14,169 @@ HttpHeaders Location(const std::string& value)
 
 }  // namespace
 
-TEST_F(ClientTest, CreateWithoutParentPostsTheHeaderThenReadsIt)
-{
-    mService.Script(201, "", Location("/api/collections/new1"));
-    mService.Script(200, CollectionJSON("ignored", "Gr\u00fcppe"));
-    Outcome outcome;
-    const Guid id = Guid::CreateUnique();
-    EXPECT_EQ(mClient->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), u"Grüppe",
-                                             kCollectionType_Collection, id),
-              id);
-    ASSERT_TRUE(outcome.Wait());
-    ASSERT_EQ(mService.Requests().size(), 2u);
-    const HttpRequest create = mService.Find("POST", "/api/collections");
-    EXPECT_EQ(create.mTarget, "/api/collections");
-    EXPECT_EQ(create.Header("Content-Type"), "application/json");
-    EXPECT_EQ(create.mBody,
-              "{\"header\":{\"name\":\"Gr\xc3\xbcppe\",\"type\":\"application/vnd.halvane.tarnvault.collection\"}}");
-    ExpectAuthorised(create, id);
-    ExpectAuthorised(mService.Find("GET", "/api/collections/new1/header"), id);
-    ASSERT_TRUE(outcome.Succeeded());
-    EXPECT_EQ(outcome.Id(), id);
-    EXPECT_EQ(outcome.AssetSeen()->mId, "new1");
-}
-
-TEST_F(ClientTest, CreateOfNoTypeSendsAnEmptyType)
-{
-    mService.Script(400, "bad");
-    Outcome outcome;
-    mClient->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), u"g", kCollectionType_None,
-                                   Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_EQ(mService.Find("POST", "/api/collections").mBody, R"({"header":{"name":"g","type":""}})");
-    EXPECT_EQ(outcome.Status(), 400);
-}
-
+// Each failure reaches the error callback, and nothing follows it.
 TEST_F(ClientTest, CreateFailures)
 {
-    // 200 is not the creation status; nothing follows it.
-    mService.Script(200, "", Location("/api/collections/new1"));
-    Outcome ok200;
-    mClient->CreateCollectionAsync(ok200.CollectionDone(), ok200.Error(), u"g", kCollectionType_Collection,
-                                   Guid::CreateUnique());
-    ASSERT_TRUE(ok200.Wait());
-    EXPECT_FALSE(ok200.Succeeded());
-    EXPECT_EQ(ok200.Status(), 200);
-    EXPECT_EQ(mService.Requests().size(), 1u);
-
-    // No identifier in the Location: the header request goes out without one
-    // and the service's refusal comes back.
-    mService.Script(201, "", Location("/"));
-    mService.Script(404, "no such collection");
-    Outcome noId;
-    mClient->CreateCollectionAsync(noId.CollectionDone(), noId.Error(), u"g", kCollectionType_Collection,
-                                   Guid::CreateUnique());
-    ASSERT_TRUE(noId.Wait());
+    const struct {
+        const char* mWhat;
+        std::vector<HttpAnswer> mReplies;
+        CollectionType mType;
+        int mStatus;
+        const char* mText;
+    } cases[] = {
+        {"200 is not the creation status",
+         {Answer(200, "", Location("/api/collections/new1"))},
+         kCollectionType_None,
+         200,
+         ""},
+        // The header request goes out without an identifier, and its refusal comes back.
+        {"no identifier in the Location",
+         {Answer(201, "", Location("/")), Answer(404, "no such collection")},
+         kCollectionType_Collection,
+         404,
+         "no such collection"},
+        {"a header that describes an item",
+         {Answer(201, "", Location("/api/collections/new2")), Answer(200, ItemJSON("new2", "g"))},
+         kCollectionType_Collection,
+         -100,
+         "CreateCollection: the new asset's header is not a collection"},
+    };
+    for (const auto& failure : cases) {
+        SCOPED_TRACE(failure.mWhat);
+        const size_t before = mService.Requests().size();
+        for (const HttpAnswer& reply : failure.mReplies) mService.Push(reply);
+        // Without a parent the chain keeps the caller's identifier.
+        const Guid id = Guid::CreateUnique();
+        const Outcome outcome = Await([&](Outcome& o) {
+            EXPECT_EQ(mClient->CreateCollectionAsync(o.Success(), o.Error(), u"g", failure.mType, id), id);
+        });
+        EXPECT_EQ(outcome.Id(), id);
+        EXPECT_FALSE(outcome.Succeeded());
+        EXPECT_EQ(outcome.Status(), failure.mStatus);
+        EXPECT_EQ(outcome.ErrorText(), failure.mText);
+        EXPECT_EQ(mService.Requests().size() - before, failure.mReplies.size());
+    }
+    EXPECT_EQ(mService.Find("POST", "/api/collections").mBody, R"({"header":{"name":"g","type":""}})");
     EXPECT_EQ(mService.Find("GET", "/api/collections//header").mMethod, "GET");
-    EXPECT_EQ(noId.Status(), 404);
-    EXPECT_EQ(noId.ErrorText(), "no such collection");
-
-    // The header describes an item: a plain error, not a null collection.
-    mService.Script(201, "", Location("/api/collections/new2"));
-    mService.Script(200, ItemJSON("new2", "g"));
-    Outcome item;
-    mClient->CreateCollectionAsync(item.CollectionDone(), item.Error(), u"g", kCollectionType_Collection,
-                                   Guid::CreateUnique());
-    ASSERT_TRUE(item.Wait());
-    EXPECT_FALSE(item.Succeeded());
-    EXPECT_EQ(item.Status(), -100);
-    EXPECT_EQ(item.ErrorText(), "CreateCollection: the new asset's header is not a collection");
 }
 
+// In a parent: create, read the header, add, all under a new identifier.
 TEST_F(ClientTest, CreateInAParentIsCreateHeaderAndAddUnderANewIdentifier)
 {
     const auto parent = MakeCollection("P");
     mService.Script(201, "", Location("http://elsewhere/api/collections/new1"));
-    mService.Script(200, CollectionJSON("new1", "g"));
+    mService.Script(200, CollectionJSON("ignored", "Gr\u00fcppe"));
     mService.Script(200, "");
-    Outcome outcome;
     const Guid given = Guid::CreateUnique();
-    const Guid chain = mClient->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), parent, u"g",
-                                                      kCollectionType_Collection, given);
+    Guid chain;
+    const Outcome outcome = Await([&](Outcome& o) {
+        chain = mClient->CreateCollectionAsync(o.Success(), o.Error(), parent, u"Grüppe", kCollectionType_Collection,
+                                               given);
+    });
     ASSERT_FALSE(chain.IsNil());
     EXPECT_NE(chain, given);
-    ASSERT_TRUE(outcome.Wait());
-    ASSERT_EQ(mService.Requests().size(), 3u);
+    std::vector<std::string> sent;
+    for (const HttpRequest& request : mService.Requests()) {
+        sent.push_back(request.mMethod + " " + request.mTarget);
+        ExpectAuthorised(request, chain);
+    }
+    EXPECT_EQ(sent, (std::vector<std::string>{"POST /api/collections", "GET /api/collections/new1/header",
+                                              "PUT /api/collections/P/members"}));
+    const HttpRequest create = mService.Find("POST", "/api/collections");
+    EXPECT_EQ(create.Header("Content-Type"), "application/json");
+    EXPECT_EQ(create.mBody,
+              "{\"header\":{\"name\":\"Gr\xc3\xbcppe\",\"type\":\"application/vnd.halvane.tarnvault.collection\"}}");
     const HttpRequest add = mService.Find("PUT", "/api/collections/P/members");
-    EXPECT_EQ(add.mTarget, "/api/collections/P/members");
     EXPECT_EQ(add.Header("Content-Type"), "application/json");
     EXPECT_EQ(add.mBody, R"(["/collections/new1"])");
-    for (const HttpRequest& request : mService.Requests()) ExpectAuthorised(request, chain);
     ASSERT_TRUE(outcome.Succeeded());
     EXPECT_EQ(outcome.Id(), chain);
     EXPECT_EQ(outcome.AssetSeen()->mId, "new1");
     ASSERT_EQ(parent->mChildren.size(), 1u);
     EXPECT_EQ(parent->mChildren[0], outcome.AssetSeen());
-}
 
-TEST_F(ClientTest, CreateInAParentStopsWhereTheAddFails)
-{
-    const auto parent = MakeCollection("P");
-    mService.Script(201, "", Location("/api/collections/new1"));
-    mService.Script(200, CollectionJSON("new1", "g"));
+    // The chain stops where the add fails, and the parent gains nothing.
+    mService.Script(201, "", Location("/api/collections/new2"));
+    mService.Script(200, CollectionJSON("new2", "g"));
     mService.Script(403, "not yours");
-    Outcome outcome;
-    const Guid chain = mClient->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), parent, u"g",
-                                                      kCollectionType_Collection, Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_FALSE(outcome.Succeeded());
-    EXPECT_EQ(outcome.Id(), chain);
-    EXPECT_EQ(outcome.Status(), 403);
-    EXPECT_TRUE(parent->mChildren.empty());
+    const Outcome refused = Await([&](Outcome& o) {
+        chain = mClient->CreateCollectionAsync(o.Success(), o.Error(), parent, u"g", kCollectionType_Collection,
+                                               Guid::CreateUnique());
+    });
+    EXPECT_FALSE(refused.Succeeded());
+    EXPECT_EQ(refused.Id(), chain);
+    EXPECT_EQ(refused.Status(), 403);
+    EXPECT_EQ(parent->mChildren.size(), 1u);
 }
 
-TEST_F(ClientTest, AddSendsThePathOfItsKindAndAppendsTheSameObject)
+// Add sends the path of its kind and appends the same object; delete sends
+// "recursive" and leaves the members alone.
+TEST_F(ClientTest, AddAndDelete)
 {
     const auto collection = MakeCollection("C");
     const auto item = MakeItem("i1");
     const auto child = MakeCollection("c2");
-    mService.Script(200, "");
-    mService.Script(200, "");
-    mService.Script(409, "conflict");
-    Outcome first, second, refused;
+    for (int status : {200, 200, 409, 200, 200, 404}) mService.Script(status, status == 200 ? "" : "refused");
     const Guid id = Guid::CreateUnique();
-    EXPECT_EQ(mClient->AddAsync(first.Success(), first.Error(), collection, item, id), id);
-    ASSERT_TRUE(first.Wait());
-    mClient->AddAsync(second.Success(), second.Error(), collection, child, Guid::CreateUnique());
-    ASSERT_TRUE(second.Wait());
-    mClient->AddAsync(refused.Success(), refused.Error(), collection, MakeItem("i3"), Guid::CreateUnique());
-    ASSERT_TRUE(refused.Wait());
+    const Outcome first = Await([&](Outcome& o) { mClient->AddAsync(o.Success(), o.Error(), collection, item, id); });
+    Await([&](Outcome& o) { mClient->AddAsync(o.Success(), o.Error(), collection, child, Guid::CreateUnique()); });
+    const Outcome refused = Await([&](Outcome& o) {
+        mClient->AddAsync(o.Success(), o.Error(), collection, MakeItem("i3"), Guid::CreateUnique());
+    });
+    const Outcome plain = Await([&](Outcome& o) { mClient->DeleteAsync(o.Success(), o.Error(), item, false, id); });
+    const Outcome recursive = Await(
+        [&](Outcome& o) { mClient->DeleteAsync(o.Success(), o.Error(), collection, true, Guid::CreateUnique()); });
+    const Outcome missing =
+        Await([&](Outcome& o) { mClient->DeleteAsync(o.Success(), o.Error(), item, false, Guid::CreateUnique()); });
 
+    std::vector<std::string> sent;
+    for (const HttpRequest& request : mService.Requests()) sent.push_back(request.mMethod + " " + request.mTarget);
+    EXPECT_EQ(sent, (std::vector<std::string>{"PUT /api/collections/C/members", "PUT /api/collections/C/members",
+                                              "PUT /api/collections/C/members", "DELETE /api/assets/i1?recursive=false",
+                                              "DELETE /api/collections/C?recursive=true",
+                                              "DELETE /api/assets/i1?recursive=false"}));
     std::vector<std::string> bodies;
-    for (const HttpRequest& request : mService.Requests()) {
-        EXPECT_EQ(request.mMethod + " " + request.mTarget, "PUT /api/collections/C/members");
-        bodies.push_back(request.mBody);
-    }
+    for (const HttpRequest& request : mService.Requests())
+        if (request.mMethod == "PUT") bodies.push_back(request.mBody);
     EXPECT_EQ(bodies, (std::vector<std::string>{R"(["/assets/i1"])", R"(["/collections/c2"])", R"(["/assets/i3"])"}));
     ExpectAuthorised(mService.Find("PUT", "/api/collections/C/members"), id);
-    EXPECT_TRUE(first.Succeeded());
+    ExpectAuthorised(mService.Find("DELETE", "/api/assets/i1"), id);
+    EXPECT_TRUE(first.Succeeded() && plain.Succeeded() && recursive.Succeeded());
     EXPECT_EQ(first.Id(), id);
-    EXPECT_FALSE(refused.Succeeded());
     EXPECT_EQ(refused.Status(), 409);
+    EXPECT_EQ(missing.Status(), 404);
     ASSERT_EQ(collection->mChildren.size(), 2u);
     EXPECT_EQ(collection->mChildren[0], item);
     EXPECT_EQ(collection->mChildren[1], child);
 }
 
-TEST_F(ClientTest, DeleteSendsRecursiveAndLeavesMembersAlone)
-{
-    const auto collection = MakeCollection("C");
-    const auto item = MakeItem("i1");
-    collection->mChildren.push_back(item);
-    mService.Script(200, "");
-    mService.Script(200, "");
-    mService.Script(404, "gone");
-    Outcome plain, recursive, missing;
-    const Guid id = Guid::CreateUnique();
-    EXPECT_EQ(mClient->DeleteAsync(plain.Success(), plain.Error(), item, false, id), id);
-    ASSERT_TRUE(plain.Wait());
-    mClient->DeleteAsync(recursive.Success(), recursive.Error(), collection, true, Guid::CreateUnique());
-    ASSERT_TRUE(recursive.Wait());
-    mClient->DeleteAsync(missing.Success(), missing.Error(), item, false, Guid::CreateUnique());
-    ASSERT_TRUE(missing.Wait());
-
-    ExpectAuthorised(mService.Find("DELETE", "/api/assets/i1?recursive=false"), id);
-    EXPECT_EQ(mService.Find("DELETE", "/api/collections/C?recursive=true").mMethod, "DELETE");
-    EXPECT_TRUE(plain.Succeeded());
-    EXPECT_TRUE(recursive.Succeeded());
-    EXPECT_FALSE(missing.Succeeded());
-    EXPECT_EQ(missing.Status(), 404);
-    EXPECT_EQ(collection->mChildren.size(), 1u);
-}
-
-TEST_F(ClientTest, DeleteByNameSearchesThenDeletesWhatItFound)
+// By name: one found is deleted; none calls neither callback; two delete nothing.
+TEST_F(ClientTest, DeleteByNameSearchesThenDeletesOnlyASingleFind)
 {
     mService.Script(200, "[" + ItemJSON("i7", "a.txt") + "]");
     mService.Script(200, "");
-    Outcome outcome;
+    mService.Script(200, "[]");
+    mService.Script(200, "[" + ItemJSON("i1", "a") + "," + ItemJSON("i2", "a") + "]");
     const Guid id = Guid::CreateUnique();
-    EXPECT_EQ(mClient->DeleteAsync(outcome.Success(), outcome.Error(), MakeCollection("C"), u"a.txt", true, id), id);
-    ASSERT_TRUE(outcome.Wait());
-    ASSERT_EQ(mService.Requests().size(), 2u);
+    const Outcome one = Await([&](Outcome& o) {
+        EXPECT_EQ(mClient->DeleteAsync(o.Success(), o.Error(), MakeCollection("C"), u"a.txt", true, id), id);
+    });
     EXPECT_EQ(mService.Find("POST", "/api/search?", R"("name":"a.txt")").mMethod, "POST");
     ExpectAuthorised(mService.Find("DELETE", "/api/assets/i7?recursive=true"), id);
-    EXPECT_TRUE(outcome.Succeeded());
-    EXPECT_EQ(outcome.Id(), id);
-}
+    EXPECT_TRUE(one.Succeeded());
+    EXPECT_EQ(one.Id(), id);
 
-TEST_F(ClientTest, DeleteByNameOfNothingCallsNeitherCallback)
-{
-    mService.Script(200, "[]");
-    Outcome outcome;
-    mClient->DeleteAsync(outcome.Success(), outcome.Error(), MakeCollection("C"), u"absent", false,
-                         Guid::CreateUnique());
-    outcome.LetGo();
-    ASSERT_TRUE(outcome.WaitReleased());
-    EXPECT_EQ(outcome.Calls(), 0);
-    EXPECT_EQ(mService.Requests().size(), 1u);
-}
+    Outcome none;
+    mClient->DeleteAsync(none.Success(), none.Error(), MakeCollection("C"), u"absent", false, Guid::CreateUnique());
+    none.LetGo();
+    ASSERT_TRUE(none.WaitReleased());
+    EXPECT_EQ(none.Calls(), 0);
 
-TEST_F(ClientTest, DeleteByNameOfTwoDeletesNothing)
-{
-    mService.Script(200, "[" + ItemJSON("i1", "a") + "," + ItemJSON("i2", "a") + "]");
-    Outcome outcome;
-    mClient->DeleteAsync(outcome.Success(), outcome.Error(), MakeCollection("C"), u"a", false, Guid::CreateUnique());
-    ASSERT_TRUE(outcome.Wait());
-    EXPECT_EQ(outcome.ErrorText(), "SearchOne: too many results");
-    EXPECT_EQ(mService.Requests().size(), 1u);
+    const Outcome two = Await([&](Outcome& o) {
+        mClient->DeleteAsync(o.Success(), o.Error(), MakeCollection("C"), u"a", false, Guid::CreateUnique());
+    });
+    EXPECT_EQ(two.ErrorText(), "SearchOne: too many results");
+    EXPECT_EQ(mService.Requests().size(), 4u);  // three searches, one delete
 }
 
 TEST_F(ClientTest, FetchChildrenReplacesTheMembersOrLeavesThemEmpty)
@@ -227,35 +184,18 @@ TEST_F(ClientTest, FetchChildrenReplacesTheMembersOrLeavesThemEmpty)
     const auto collection = MakeCollection("C");
     collection->mChildren.push_back(MakeItem("old"));
     mService.Script(200, "[" + ItemJSON("i1", "a") + "," + CollectionJSON("c1", "g") + "]");
-    Outcome fetched;
+    mService.Script(500, "down");
     const Guid id = Guid::CreateUnique();
-    EXPECT_EQ(mClient->FetchChildrenAsync(fetched.Success(), fetched.Error(), collection, id), id);
-    ASSERT_TRUE(fetched.Wait());
+    const Outcome fetched =
+        Await([&](Outcome& o) { EXPECT_EQ(mClient->FetchChildrenAsync(o.Success(), o.Error(), collection, id), id); });
     EXPECT_TRUE(fetched.Succeeded());
     ASSERT_EQ(collection->mChildren.size(), 2u);
     EXPECT_EQ(collection->mChildren[0]->mId, "i1");
     EXPECT_NE(mService.Find("POST", "/api/search?").mTarget.find("&scope=%5b%22%2fcollections%2fC%22%5d"),
               std::string::npos);
 
-    mService.Script(500, "down");
-    Outcome failed;
-    mClient->FetchChildrenAsync(failed.Success(), failed.Error(), collection, Guid::CreateUnique());
-    ASSERT_TRUE(failed.Wait());
+    const Outcome failed = Await(
+        [&](Outcome& o) { mClient->FetchChildrenAsync(o.Success(), o.Error(), collection, Guid::CreateUnique()); });
     EXPECT_EQ(failed.Status(), 500);
     EXPECT_TRUE(collection->mChildren.empty());
-}
-
-TEST(GetUIDFromLocation, LastPieceOfTheLastLocation)
-{
-    auto withLocation = [](std::vector<std::string> values) {
-        boost::shared_ptr<tolmonet::Response> response(new tolmonet::Response);
-        for (const std::string& value : values)
-            response->headers.insert(std::make_pair(tolmonet::kHEADER_LOCATION, ImmutableString::CreateDynamic(value)));
-        return Tarnvault::GetUIDFromLocation(response).ToStdString();
-    };
-    EXPECT_EQ(withLocation({"/api/collections/abc"}), "abc");
-    EXPECT_EQ(withLocation({"http://h:1/api/collections/abc"}), "abc");
-    EXPECT_EQ(withLocation({"/api/collections/abc/"}), "");
-    EXPECT_EQ(withLocation({"a/b"}), "");
-    EXPECT_EQ(withLocation({}), "");
 }

@@ -71,16 +71,15 @@ TEST_F(RefusalTest, RefusedFirstRequestsGiveANilIdentifierAndNoCallback)
     const auto client = ClientAccepting(0);
     Outcome outcome;
     const Guid id = Guid::CreateUnique();
-    EXPECT_TRUE(client->SearchAsync(outcome.Assets(), outcome.Error(), SearchQuery(), id).IsNil());
-    EXPECT_TRUE(client->HeaderAsync(outcome.Asset(), outcome.Error(), "x", true, id).IsNil());
-    EXPECT_TRUE(client->GetRootAsync(outcome.CollectionDone(), outcome.Error(), id).IsNil());
-    EXPECT_TRUE(
-        client->CreateCollectionAsync(outcome.CollectionDone(), outcome.Error(), u"g", kCollectionType_Collection, id)
-            .IsNil());
+    EXPECT_TRUE(client->SearchAsync(outcome.Success(), outcome.Error(), SearchQuery(), id).IsNil());
+    EXPECT_TRUE(client->HeaderAsync(outcome.Success(), outcome.Error(), "x", true, id).IsNil());
+    EXPECT_TRUE(client->GetRootAsync(outcome.Success(), outcome.Error(), id).IsNil());
+    EXPECT_TRUE(client->CreateCollectionAsync(outcome.Success(), outcome.Error(), u"g", kCollectionType_Collection, id)
+                    .IsNil());
     EXPECT_TRUE(client->AddAsync(outcome.Success(), outcome.Error(), MakeCollection("C"), MakeItem("i"), id).IsNil());
     EXPECT_TRUE(client->DeleteAsync(outcome.Success(), outcome.Error(), MakeItem("i"), false, id).IsNil());
     EXPECT_TRUE(
-        client->DownloadAsync(outcome.Downloaded(), outcome.Error(), MakeItem("i"), File(u"/tmp/x"), "", id).IsNil());
+        client->DownloadAsync(outcome.Success(), outcome.Error(), MakeItem("i"), File(u"/tmp/x"), "", id).IsNil());
     outcome.LetGo();
     EXPECT_TRUE(outcome.WaitReleased());
     EXPECT_EQ(outcome.Calls(), 0);
@@ -97,67 +96,59 @@ TEST_F(RefusalTest, RefusedFollowUpRequestsEndTheChainThroughTheErrorCallback)
     const ImmutableString type = ImmutableString::CreateStatic("text/plain");
     using Start = std::function<void(Tarnvault&, Outcome&)>;
     const HttpHeaders created{{"Location", "/api/collections/n1"}};
-    struct Reply {
-        int mStatus;
-        std::string mBody;
-        HttpHeaders mHeaders;
-    };
     const struct {
         const char* mStep;
         int mAccept;
-        std::vector<Reply> mReplies;
+        std::vector<HttpAnswer> mReplies;
         Start mStart;
         const char* mError;  // null: no response reaches the callback
     } cases[] = {
         {"header after a create",
          1,
-         {{201, "", created}},
+         {Answer(201, "", created)},
          [](Tarnvault& c, Outcome& o) {
-             c.CreateCollectionAsync(o.CollectionDone(), o.Error(), u"g", kCollectionType_Collection,
-                                     Guid::CreateUnique());
+             c.CreateCollectionAsync(o.Success(), o.Error(), u"g", kCollectionType_Collection, Guid::CreateUnique());
          },
          "CreateCollection Header failed"},
         {"add after a create in a parent",
          2,
-         {{201, "", created}, {200, CollectionJSON("n1", "g"), {}}},
+         {Answer(201, "", created), Answer(200, CollectionJSON("n1", "g"))},
          [](Tarnvault& c, Outcome& o) {
-             c.CreateCollectionAsync(o.CollectionDone(), o.Error(), MakeCollection("P"), u"g",
-                                     kCollectionType_Collection, Guid::CreateUnique());
+             c.CreateCollectionAsync(o.Success(), o.Error(), MakeCollection("P"), u"g", kCollectionType_Collection,
+                                     Guid::CreateUnique());
          },
          nullptr},
         {"delete after a search by name",
          1,
-         {{200, "[" + ItemJSON("i1", "a") + "]", {}}},
+         {Answer(200, "[" + ItemJSON("i1", "a") + "]")},
          [](Tarnvault& c, Outcome& o) {
              c.DeleteAsync(o.Success(), o.Error(), MakeCollection("C"), u"a", false, Guid::CreateUnique());
          },
          nullptr},
         {"upload's post after its search",
          1,
-         {{200, "[]", {}}},
+         {Answer(200, "[]")},
          [&](Tarnvault& c, Outcome& o) {
-             c.UploadAsync(o.ItemDone(), o.Error(), MakeCollection("C"), file, type, u"", Guid::CreateUnique());
+             c.UploadAsync(o.Success(), o.Error(), MakeCollection("C"), file, type, u"", Guid::CreateUnique());
          },
          nullptr},
         {"upload's metadata after its post",
          2,
-         {{200, "[]", {}}, {201, "", {{"Location", "/api/assets/n"}}}},
+         {Answer(200, "[]"), Answer(201, "", {{"Location", "/api/assets/n"}})},
          [&](Tarnvault& c, Outcome& o) {
-             c.UploadAsync(o.ItemDone(), o.Error(), MakeCollection("C"), file, type, u"", Guid::CreateUnique());
+             c.UploadAsync(o.Success(), o.Error(), MakeCollection("C"), file, type, u"", Guid::CreateUnique());
          },
          "Upload Header failed"},
         {"preferences root's search",
          1,
-         {{200, "[" + CollectionJSON("root1", "client-1", kRootMedia) + "]", {}}},
-         [](Tarnvault& c, Outcome& o) {
-             c.GetPreferencesRootAsync(o.CollectionDone(), o.Error(), Guid::CreateUnique());
-         },
+         {Answer(200, "[" + CollectionJSON("root1", "client-1", kRootMedia) + "]")},
+         [](Tarnvault& c, Outcome& o) { c.GetPreferencesRootAsync(o.Success(), o.Error(), Guid::CreateUnique()); },
          "SearchAsync failed"},
     };
     for (const auto& refused : cases) {
         SCOPED_TRACE(refused.mStep);
         const auto client = ClientAccepting(refused.mAccept);
-        for (const Reply& reply : refused.mReplies) mService.Script(reply.mStatus, reply.mBody, reply.mHeaders);
+        for (const HttpAnswer& reply : refused.mReplies) mService.Push(reply);
         Outcome outcome;
         refused.mStart(*client, outcome);
         ASSERT_TRUE(outcome.Wait());
@@ -168,6 +159,6 @@ TEST_F(RefusalTest, RefusedFollowUpRequestsEndTheChainThroughTheErrorCallback)
         if (refused.mError)
             EXPECT_EQ(outcome.ErrorText(), refused.mError);
         else
-            EXPECT_FALSE(outcome.Response());
+            EXPECT_FALSE(outcome.Last().mResponse);
     }
 }
