@@ -5,10 +5,8 @@
 #include <gtest/gtest.h>
 
 #include <chrono>
-#include <condition_variable>
 #include <cstdlib>
 #include <filesystem>
-#include <mutex>
 #include <thread>
 
 #include <boost/make_shared.hpp>
@@ -18,6 +16,7 @@
 #include "foundation/net/HeaderConstants.h"
 #include "server/FaultHooks.h"
 #include "server/TreeSeeder.h"
+#include "support/CallRecorder.h"
 #include "support/TempDir.h"
 #include "support/TestService.h"
 #include "tarnvault/Tarnvault.h"
@@ -39,58 +38,35 @@ struct Ended {
     boost::shared_ptr<Collection> mRoot;
 };
 
+// Callbacks that record how a request ended, and the wait for it.
 class Waiter {
 public:
     // Fits the root's callback and a copy's.
-    auto OnSuccess()
+    auto OnSuccess() const
     {
-        return [this](const Guid&, const auto&... root) { Finish(std::string(), root...); };
+        return [ends = mEnds](const Guid&, const auto&... root) {
+            ends.Add(Ended{true, std::string(), boost::shared_ptr<Collection>(root...)});
+        };
     }
-    ErrorCallback OnError()
+    ErrorCallback OnError() const
     {
-        return [this](const Guid& id, const boost::shared_ptr<tolmonet::Response>& response) {
+        return [ends = mEnds](const Guid& id, const boost::shared_ptr<tolmonet::Response>& response) {
             try {
                 ThrowResponse(id, response);
             } catch (const std::exception& e) {
-                Finish(e.what());
+                ends.Add(Ended{true, e.what(), nullptr});
             }
         };
     }
-    Ended Wait()
+    Ended Wait() const
     {
-        std::unique_lock<std::mutex> lock(mMutex);
-        mCame.wait_for(lock, std::chrono::seconds(30), [this] { return mEnded.mDone; });
-        return mEnded;
+        mEnds.WaitFor(1);
+        return mEnds.Last();
     }
 
 private:
-    void Finish(const std::string& error, const boost::shared_ptr<Collection>& root = nullptr)
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        mEnded = Ended{true, error, root};
-        mCame.notify_all();
-    }
-    std::mutex mMutex;
-    std::condition_variable mCame;
-    Ended mEnded;
+    testsupport::CallRecorder<Ended> mEnds;
 };
-
-// A described tree with `from` replaced by `to` in every name (not in contents).
-std::string RenamedTree(const std::string& tree, const std::string& from, const std::string& to)
-{
-    std::string renamed;
-    std::size_t start = 0;
-    while (start < tree.size()) {
-        const std::size_t end = tree.find('\n', start);
-        std::string line = tree.substr(start, end - start);
-        start = end + 1;
-        const std::size_t contents = line.find(" (");
-        std::string name = line.substr(0, contents);
-        for (std::size_t at; (at = name.find(from)) != std::string::npos;) name.replace(at, from.size(), to);
-        renamed += name + (contents == std::string::npos ? "" : line.substr(contents)) + "\n";
-    }
-    return renamed;
-}
 
 class Migration : public ::testing::Test {
 protected:
@@ -120,14 +96,17 @@ protected:
         client->GetPreferencesRootAsync(waiter.OnSuccess(), waiter.OnError(), Guid::CreateUnique());
         return waiter.Wait();
     }
-    // An earlier version's preferences root: an item named for it at the top
-    // and a nested group whose names carry the version too.
-    std::string SeedVersion(const std::string& clientRoot, const std::string& app, const std::string& version)
+    // A version's preferences root: an item named for it at the top and a
+    // nested group whose names carry the version too. The contents name
+    // `contentsOf`: a migrated tree is the earlier one with only names changed.
+    std::string SeedVersion(const std::string& clientRoot, const std::string& app, const std::string& version,
+                            const std::string& contentsOf = std::string())
     {
+        const std::string of = contentsOf.empty() ? version : contentsOf;
         const std::string root = mSeed->Collection(clientRoot, "Co_" + app + "_" + version, server::kMediaPreferences);
-        mSeed->Item(root, "from-" + version + ".txt", "settings of " + version, "text/plain");
+        mSeed->Item(root, "from-" + version + ".txt", "settings of " + of, "text/plain");
         const std::string group = mSeed->Collection(root, "Group " + version);
-        mSeed->Item(group, "a.json", "{\"v\":\"" + version + "\"}", "application/json");
+        mSeed->Item(group, "a.json", "{\"v\":\"" + of + "\"}", "application/json");
         const std::string deeper = mSeed->Collection(group, "Deeper");
         mSeed->Item(deeper, "b-" + version + ".bin", "b", "application/octet-stream");
         return root;
@@ -182,6 +161,7 @@ TEST_F(Migration, EachFormAndVersionCopiesTheRightEarlierTree)
     std::map<std::string, std::string> oldTrees;
     for (const char* version : {"9.1", "8.5", "8.0"})
         oldTrees[version] = mSeed->Describe(SeedVersion(clientRoot, "App", version));
+    const std::string expectedTrees = mSeed->Collection(clientRoot, "Expected");
 
     const struct {
         const char16_t* mVersion;
@@ -221,7 +201,8 @@ TEST_F(Migration, EachFormAndVersionCopiesTheRightEarlierTree)
         }
         ASSERT_TRUE(ended.mError.empty()) << label << ": " << ended.mError;
         ASSERT_TRUE(ended.mRoot) << label;
-        const std::string expected = from.empty() ? std::string() : RenamedTree(oldTrees[from], from, version);
+        const std::string expected =
+            from.empty() ? std::string() : mSeed->Describe(SeedVersion(expectedTrees, app, version, from));
         EXPECT_EQ(NewRootTree(app, version), expected) << label;
     }
     // The earlier trees were only read.

@@ -6,7 +6,6 @@
 #include <gtest/gtest.h>
 
 #include <chrono>
-#include <condition_variable>
 #include <deque>
 #include <filesystem>
 #include <mutex>
@@ -19,6 +18,7 @@
 
 #include "foundation/core/HostConfig.h"
 #include "foundation/net/HeaderConstants.h"
+#include "support/CallRecorder.h"
 #include "support/LoopbackHttpServer.h"
 #include "support/TempDir.h"
 #include "support/TestScopes.h"
@@ -131,7 +131,12 @@ bool WaitExpired(const boost::weak_ptr<T>& watch)
 class Outcome {
 public:
     struct Seen {
-        int mCalls = 0;
+        Seen() = default;
+        Seen(bool success, const Guid& id, const boost::shared_ptr<tolmonet::Response>& response = nullptr)
+            : mSuccess(success), mId(id), mResponse(response)
+        {
+        }
+
         bool mSuccess = false;
         Guid mId;
         boost::shared_ptr<tolmonet::Response> mResponse;
@@ -148,18 +153,16 @@ public:
     // Fits every success callback of the client; the payload, if any, is kept.
     auto Success()
     {
-        auto state = mState;
-        auto alive = mAlive;
-        return [state, alive](const Guid& id, const auto&... payload) {
-            state->Finish(id, true, nullptr, [&](Seen& seen) { seen.Keep(payload...); });
+        return [calls = mCalls, alive = mAlive](const Guid& id, const auto&... payload) {
+            Seen seen(true, id);
+            seen.Keep(payload...);
+            calls.Add(seen);
         };
     }
     ErrorCallback Error()
     {
-        auto state = mState;
-        auto alive = mAlive;
-        return [state, alive](const Guid& id, const boost::shared_ptr<tolmonet::Response>& response) {
-            state->Finish(id, false, response, [](Seen&) {});
+        return [calls = mCalls, alive = mAlive](const Guid& id, const boost::shared_ptr<tolmonet::Response>& response) {
+            calls.Add(Seen(false, id, response));
         };
     }
     // Drops the test's own hold on the token: from now on only callbacks keep it.
@@ -167,18 +170,10 @@ public:
     // Waits until every callback made here is gone (LetGo first), at most 30 s.
     bool WaitReleased() const { return WaitExpired(mWatch); }
     // Waits for a callback, at most 30 s; false if none came.
-    bool Wait()
-    {
-        std::unique_lock<std::mutex> lock(mState->mMutex);
-        return mState->mChanged.wait_for(lock, std::chrono::seconds(30), [&] { return mState->mSeen.mCalls > 0; });
-    }
+    bool Wait() const { return mCalls.WaitFor(1); }
 
-    Seen Last() const
-    {
-        std::lock_guard<std::mutex> lock(mState->mMutex);
-        return mState->mSeen;
-    }
-    int Calls() const { return Last().mCalls; }
+    Seen Last() const { return mCalls.Last(); }
+    size_t Calls() const { return mCalls.Count(); }
     bool Succeeded() const { return Last().mSuccess; }
     Guid Id() const { return Last().mId; }
     boost::shared_ptr<AssetBase> AssetSeen() const { return Last().mAsset; }
@@ -194,25 +189,7 @@ public:
     }
 
 private:
-    struct State {
-        std::mutex mMutex;
-        std::condition_variable mChanged;
-        Seen mSeen;
-
-        template <typename Fill>
-        void Finish(const Guid& id, bool success, const boost::shared_ptr<tolmonet::Response>& response, Fill fill)
-        {
-            std::lock_guard<std::mutex> lock(mMutex);
-            ++mSeen.mCalls;
-            mSeen.mSuccess = success;
-            mSeen.mId = id;
-            mSeen.mResponse = response;
-            fill(mSeen);
-            mChanged.notify_all();
-        }
-    };
-
-    boost::shared_ptr<State> mState = boost::make_shared<State>();
+    testsupport::CallRecorder<Seen> mCalls;
     boost::shared_ptr<int> mAlive = boost::make_shared<int>(0);
     boost::weak_ptr<int> mWatch = mAlive;
 };
@@ -246,21 +223,14 @@ inline std::string ItemJSON(const std::string& id, const std::string& name)
     return R"({"id":")" + id + R"(","name":")" + name + R"(","type":"text/plain","size":3})";
 }
 
-template <typename Asset>
+// An asset named for its identifier, as the client holds it.
+template <typename Asset = Collection>
 boost::shared_ptr<Asset> Make(const std::string& id)
 {
     const auto asset = boost::make_shared<Asset>();
     asset->mId = UTF8String(id);
     asset->mName = tolmocore::utility::ToUTF16(id);
     return asset;
-}
-inline boost::shared_ptr<Collection> MakeCollection(const std::string& id)
-{
-    return Make<Collection>(id);
-}
-inline boost::shared_ptr<Item> MakeItem(const std::string& id)
-{
-    return Make<Item>(id);
 }
 
 // The fixture of most client tests: a scripted service and a client of it

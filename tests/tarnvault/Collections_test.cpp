@@ -63,7 +63,7 @@ TEST_F(ClientTest, CreateFailures)
 // In a parent: create, read the header, add, all under a new identifier.
 TEST_F(ClientTest, CreateInAParentIsCreateHeaderAndAddUnderANewIdentifier)
 {
-    const auto parent = MakeCollection("P");
+    const auto parent = Make("P");
     mService.Script(201, "", Location("http://elsewhere/api/collections/new1"));
     mService.Script(200, CollectionJSON("ignored", "Gr\u00fcppe"));
     mService.Script(200, "");
@@ -113,15 +113,15 @@ TEST_F(ClientTest, CreateInAParentIsCreateHeaderAndAddUnderANewIdentifier)
 // "recursive" and leaves the members alone.
 TEST_F(ClientTest, AddAndDelete)
 {
-    const auto collection = MakeCollection("C");
-    const auto item = MakeItem("i1");
-    const auto child = MakeCollection("c2");
+    const auto collection = Make("C");
+    const auto item = Make<Item>("i1");
+    const auto child = Make("c2");
     for (int status : {200, 200, 409, 200, 200, 404}) mService.Script(status, status == 200 ? "" : "refused");
     const Guid id = Guid::CreateUnique();
     const Outcome first = Await([&](Outcome& o) { mClient->AddAsync(o.Success(), o.Error(), collection, item, id); });
     Await([&](Outcome& o) { mClient->AddAsync(o.Success(), o.Error(), collection, child, Guid::CreateUnique()); });
     const Outcome refused = Await([&](Outcome& o) {
-        mClient->AddAsync(o.Success(), o.Error(), collection, MakeItem("i3"), Guid::CreateUnique());
+        mClient->AddAsync(o.Success(), o.Error(), collection, Make<Item>("i3"), Guid::CreateUnique());
     });
     const Outcome plain = Await([&](Outcome& o) { mClient->DeleteAsync(o.Success(), o.Error(), item, false, id); });
     const Outcome recursive = Await(
@@ -159,7 +159,7 @@ TEST_F(ClientTest, DeleteByNameSearchesThenDeletesOnlyASingleFind)
     mService.Script(200, "[" + ItemJSON("i1", "a") + "," + ItemJSON("i2", "a") + "]");
     const Guid id = Guid::CreateUnique();
     const Outcome one = Await([&](Outcome& o) {
-        EXPECT_EQ(mClient->DeleteAsync(o.Success(), o.Error(), MakeCollection("C"), u"a.txt", true, id), id);
+        EXPECT_EQ(mClient->DeleteAsync(o.Success(), o.Error(), Make("C"), u"a.txt", true, id), id);
     });
     EXPECT_EQ(mService.Find("POST", "/api/search?", R"("name":"a.txt")").mMethod, "POST");
     ExpectAuthorised(mService.Find("DELETE", "/api/assets/i7?recursive=true"), id);
@@ -167,13 +167,13 @@ TEST_F(ClientTest, DeleteByNameSearchesThenDeletesOnlyASingleFind)
     EXPECT_EQ(one.Id(), id);
 
     Outcome none;
-    mClient->DeleteAsync(none.Success(), none.Error(), MakeCollection("C"), u"absent", false, Guid::CreateUnique());
+    mClient->DeleteAsync(none.Success(), none.Error(), Make("C"), u"absent", false, Guid::CreateUnique());
     none.LetGo();
     ASSERT_TRUE(none.WaitReleased());
-    EXPECT_EQ(none.Calls(), 0);
+    EXPECT_EQ(none.Calls(), 0u);
 
     const Outcome two = Await([&](Outcome& o) {
-        mClient->DeleteAsync(o.Success(), o.Error(), MakeCollection("C"), u"a", false, Guid::CreateUnique());
+        mClient->DeleteAsync(o.Success(), o.Error(), Make("C"), u"a", false, Guid::CreateUnique());
     });
     EXPECT_EQ(two.ErrorText(), "SearchOne: too many results");
     EXPECT_EQ(mService.Requests().size(), 4u);  // three searches, one delete
@@ -181,8 +181,8 @@ TEST_F(ClientTest, DeleteByNameSearchesThenDeletesOnlyASingleFind)
 
 TEST_F(ClientTest, FetchChildrenReplacesTheMembersOrLeavesThemEmpty)
 {
-    const auto collection = MakeCollection("C");
-    collection->mChildren.push_back(MakeItem("old"));
+    const auto collection = Make("C");
+    collection->mChildren.push_back(Make<Item>("old"));
     mService.Script(200, "[" + ItemJSON("i1", "a") + "," + CollectionJSON("c1", "g") + "]");
     mService.Script(500, "down");
     const Guid id = Guid::CreateUnique();

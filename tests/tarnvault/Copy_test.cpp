@@ -33,8 +33,8 @@ TEST(Copy, ACollectionInsideItselfIsCopiedOnceRoundAndTheCopyEnds)
     });
     boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(server.Url("/api"), "tok", "c")));
     Outcome outcome;
-    client->CopyAsync(outcome.Success(), outcome.Error(), MakeCollection("S"), MakeCollection("D"),
-                      Guid::CreateUnique(), Tarnvault::NameMap());
+    client->CopyAsync(outcome.Success(), outcome.Error(), Make("S"), Make("D"), Guid::CreateUnique(),
+                      Tarnvault::NameMap());
     ASSERT_TRUE(outcome.Wait());
     EXPECT_TRUE(outcome.Succeeded()) << outcome.ErrorText();
     EXPECT_EQ(creates.load(), 1);

@@ -6,6 +6,7 @@
 #include "ClientTestSupport.h"
 #include "foundation/core/Keychain.h"
 #include "server/FaultHooks.h"
+#include "support/CallRecorder.h"
 #include "support/TestService.h"
 
 using namespace tvtest;
@@ -16,28 +17,14 @@ using StateList = std::vector<SyncServer_ConnectionState>;
 
 namespace {
 
-// Records the reported states.
-struct States {
-    std::mutex mMutex;
-    std::condition_variable mChanged;
-    StateList mSeen;
-
-    ConnectionStateCallback Callback()
-    {
-        return [this](SyncServer_ConnectionState state) {
-            std::lock_guard<std::mutex> lock(mMutex);
-            mSeen.push_back(state);
-            mChanged.notify_all();
-        };
-    }
-    // The states seen once one came, at most 30 s on.
-    StateList Wait()
-    {
-        std::unique_lock<std::mutex> lock(mMutex);
-        mChanged.wait_for(lock, std::chrono::seconds(30), [&] { return !mSeen.empty(); });
-        return mSeen;
-    }
-};
+// The states reported to the callback `start` hands on, once one came (at most 30 s on).
+StateList Reported(const std::function<bool(const ConnectionStateCallback&)>& start)
+{
+    testsupport::CallRecorder<SyncServer_ConnectionState> states;
+    EXPECT_TRUE(start([states](SyncServer_ConnectionState state) { states.Add(state); }));
+    states.WaitFor(1);
+    return states.All();
+}
 
 OvraCredentials Credentials(const std::string& access, const char* refresh, const char* user)
 {
@@ -65,15 +52,12 @@ protected:
     }
     StateList SignIn(const std::string& access, const char* user = "user-7")
     {
-        States states;
-        EXPECT_TRUE(mClient->SetCredentials(states.Callback(), Credentials(access, "ref-1", user)));
-        return states.Wait();
+        return Reported(
+            [&](const auto& report) { return mClient->SetCredentials(report, Credentials(access, "ref-1", user)); });
     }
     StateList Check()
     {
-        States states;
-        EXPECT_TRUE(mClient->CheckConnection(states.Callback()));
-        return states.Wait();
+        return Reported([&](const auto& report) { return mClient->CheckConnection(report); });
     }
     std::filesystem::path LastUserFile() const { return mPrefs.Path() / "tarnvaultuser.txt"; }
 
@@ -103,9 +87,7 @@ TEST_F(CredentialsTest, SetCredentialsStoresThemPrivatelyAndProvesTheStoredToken
     EXPECT_FALSE(mClient->CachedRoot());
 
     // Signing out forgets the user and leaves the keychain; checking then asks nothing.
-    States out;
-    EXPECT_TRUE(mClient->Logout(out.Callback()));
-    EXPECT_EQ(out.Wait(), StateList{SyncServer_NotLoggedIn});
+    EXPECT_EQ(Reported([&](const auto& report) { return mClient->Logout(report); }), StateList{SyncServer_NotLoggedIn});
     EXPECT_TRUE(mClient->mAccessToken.empty() && mClient->mUserID.empty());
     EXPECT_FALSE(std::filesystem::exists(LastUserFile()));
     EXPECT_FALSE(tolmocore::Keychain::GetPassword(Domain(u"Access"), u"user-7").empty());
@@ -183,11 +165,12 @@ TEST_F(ClientTest, TraceLinesShowNoSecret)
     TraceLines trace("8");
     mService.Script(200, "[" + CollectionJSON("r", "client-1", kRootMedia) + "]");
     mService.Script(404, R"({"access_token":"secret-body-7"})", {{"Authorization", "Bearer secret-header-7"}});
-    States states;
-    mClient->SetCredentials(states.Callback(), Credentials("secret-access-7", "secret-refresh-7", "u"));
-    ASSERT_EQ(states.Wait(), StateList{SyncServer_Connected});
+    ASSERT_EQ(Reported([&](const auto& report) {
+                  return mClient->SetCredentials(report, Credentials("secret-access-7", "secret-refresh-7", "u"));
+              }),
+              StateList{SyncServer_Connected});
     Outcome outcome;
-    mClient->DownloadAsync(outcome.Success(), outcome.Error(), MakeItem("i1?token=secret-url-7"),
+    mClient->DownloadAsync(outcome.Success(), outcome.Error(), Make<Item>("i1?token=secret-url-7"),
                            File(u"/nonexistent/x"), "", Guid::CreateUnique());
     ASSERT_TRUE(outcome.Wait());
     EXPECT_TRUE(trace.Contains("SetCredentials: inAccessToken: <obfuscated>"));

@@ -76,13 +76,13 @@ TEST_F(RefusalTest, RefusedFirstRequestsGiveANilIdentifierAndNoCallback)
     EXPECT_TRUE(client->GetRootAsync(outcome.Success(), outcome.Error(), id).IsNil());
     EXPECT_TRUE(client->CreateCollectionAsync(outcome.Success(), outcome.Error(), u"g", kCollectionType_Collection, id)
                     .IsNil());
-    EXPECT_TRUE(client->AddAsync(outcome.Success(), outcome.Error(), MakeCollection("C"), MakeItem("i"), id).IsNil());
-    EXPECT_TRUE(client->DeleteAsync(outcome.Success(), outcome.Error(), MakeItem("i"), false, id).IsNil());
+    EXPECT_TRUE(client->AddAsync(outcome.Success(), outcome.Error(), Make("C"), Make<Item>("i"), id).IsNil());
+    EXPECT_TRUE(client->DeleteAsync(outcome.Success(), outcome.Error(), Make<Item>("i"), false, id).IsNil());
     EXPECT_TRUE(
-        client->DownloadAsync(outcome.Success(), outcome.Error(), MakeItem("i"), File(u"/tmp/x"), "", id).IsNil());
+        client->DownloadAsync(outcome.Success(), outcome.Error(), Make<Item>("i"), File(u"/tmp/x"), "", id).IsNil());
     outcome.LetGo();
     EXPECT_TRUE(outcome.WaitReleased());
-    EXPECT_EQ(outcome.Calls(), 0);
+    EXPECT_EQ(outcome.Calls(), 0u);
     EXPECT_TRUE(mService.Requests().empty());
 }
 
@@ -114,7 +114,7 @@ TEST_F(RefusalTest, RefusedFollowUpRequestsEndTheChainThroughTheErrorCallback)
          2,
          {Answer(201, "", created), Answer(200, CollectionJSON("n1", "g"))},
          [](Tarnvault& c, Outcome& o) {
-             c.CreateCollectionAsync(o.Success(), o.Error(), MakeCollection("P"), u"g", kCollectionType_Collection,
+             c.CreateCollectionAsync(o.Success(), o.Error(), Make("P"), u"g", kCollectionType_Collection,
                                      Guid::CreateUnique());
          },
          nullptr},
@@ -122,21 +122,21 @@ TEST_F(RefusalTest, RefusedFollowUpRequestsEndTheChainThroughTheErrorCallback)
          1,
          {Answer(200, "[" + ItemJSON("i1", "a") + "]")},
          [](Tarnvault& c, Outcome& o) {
-             c.DeleteAsync(o.Success(), o.Error(), MakeCollection("C"), u"a", false, Guid::CreateUnique());
+             c.DeleteAsync(o.Success(), o.Error(), Make("C"), u"a", false, Guid::CreateUnique());
          },
          nullptr},
         {"upload's post after its search",
          1,
          {Answer(200, "[]")},
          [&](Tarnvault& c, Outcome& o) {
-             c.UploadAsync(o.Success(), o.Error(), MakeCollection("C"), file, type, u"", Guid::CreateUnique());
+             c.UploadAsync(o.Success(), o.Error(), Make("C"), file, type, u"", Guid::CreateUnique());
          },
          nullptr},
         {"upload's metadata after its post",
          2,
          {Answer(200, "[]"), Answer(201, "", {{"Location", "/api/assets/n"}})},
          [&](Tarnvault& c, Outcome& o) {
-             c.UploadAsync(o.Success(), o.Error(), MakeCollection("C"), file, type, u"", Guid::CreateUnique());
+             c.UploadAsync(o.Success(), o.Error(), Make("C"), file, type, u"", Guid::CreateUnique());
          },
          "Upload Header failed"},
         {"preferences root's search",
@@ -154,7 +154,7 @@ TEST_F(RefusalTest, RefusedFollowUpRequestsEndTheChainThroughTheErrorCallback)
         ASSERT_TRUE(outcome.Wait());
         outcome.LetGo();
         ASSERT_TRUE(outcome.WaitReleased());
-        EXPECT_EQ(outcome.Calls(), 1);
+        EXPECT_EQ(outcome.Calls(), 1u);
         EXPECT_FALSE(outcome.Succeeded());
         if (refused.mError)
             EXPECT_EQ(outcome.ErrorText(), refused.mError);

@@ -32,7 +32,7 @@ TEST_F(ClientTest, RootIsAskedForByNameOnceAndThenCached)
     Outcome second;
     const Guid again = Guid::CreateUnique();
     EXPECT_EQ(mClient->GetRootAsync(second.Success(), second.Error(), again), again);
-    EXPECT_EQ(second.Calls(), 1);  // before the call returned
+    EXPECT_EQ(second.Calls(), 1u);  // before the call returned
     EXPECT_EQ(second.Id(), again);
     EXPECT_EQ(second.AssetSeen(), first.AssetSeen());
     EXPECT_EQ(mService.Requests().size(), 1u);
@@ -41,7 +41,7 @@ TEST_F(ClientTest, RootIsAskedForByNameOnceAndThenCached)
     mClient->Logout([](SyncServer_ConnectionState) {});
     Outcome third;
     mClient->GetRootAsync(third.Success(), third.Error(), Guid::CreateUnique());
-    EXPECT_EQ(third.Calls(), 1);
+    EXPECT_EQ(third.Calls(), 1u);
     EXPECT_EQ(mService.Requests().size(), 1u);
 }
 

@@ -42,8 +42,7 @@ TEST_F(ClientTest, SearchSendsItsQueryInTheTargetAndGivesEveryAsset)
     EXPECT_EQ(assets[0]->mId, "i1");
     EXPECT_TRUE(assets[1]->is_collection());
 
-    mClient->SearchAsync(scoped.Success(), scoped.Error(), SearchQuery(MakeCollection("abc"), u"n 1"),
-                         Guid::CreateUnique());
+    mClient->SearchAsync(scoped.Success(), scoped.Error(), SearchQuery(Make("abc"), u"n 1"), Guid::CreateUnique());
     ASSERT_TRUE(scoped.Wait());
     const std::string scopedQuery = Query(mService.Find("POST", "/api/search?", "abc"));
     const size_t scope = scopedQuery.find("&scope=");
@@ -181,5 +180,5 @@ TEST_F(ClientTest, BadSearchModifierThrowsOnTheCallersThreadAndSendsNothing)
     EXPECT_THROW(mClient->SearchAsync(outcome.Success(), outcome.Error(), query, Guid::CreateUnique()),
                  std::runtime_error);
     EXPECT_TRUE(mService.Requests().empty());
-    EXPECT_EQ(outcome.Calls(), 0);
+    EXPECT_EQ(outcome.Calls(), 0u);
 }

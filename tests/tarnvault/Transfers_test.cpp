@@ -14,7 +14,7 @@ namespace {
 class TransferTest : public ClientTest {
 protected:
     // Each waits for the operation's callback.
-    Outcome Upload(const std::string& name, const boost::shared_ptr<Collection>& collection = MakeCollection("C"),
+    Outcome Upload(const std::string& name, const boost::shared_ptr<Collection>& collection = Make("C"),
                    const Guid& id = Guid::CreateUnique())
     {
         Outcome outcome;
@@ -28,7 +28,7 @@ protected:
                      const Guid& id = Guid::CreateUnique())
     {
         Outcome outcome;
-        EXPECT_EQ(mClient->DownloadAsync(outcome.Success(), outcome.Error(), MakeItem("i1"), At(name), etag, id), id);
+        EXPECT_EQ(mClient->DownloadAsync(outcome.Success(), outcome.Error(), Make<Item>("i1"), At(name), etag, id), id);
         EXPECT_TRUE(outcome.Wait());
         return outcome;
     }
@@ -42,7 +42,7 @@ protected:
 TEST_F(TransferTest, UploadDeletesEveryNamesakeLastFirstThenPostsAndReadsBack)
 {
     WriteFileBytes(mDir / "a.txt", "abc");
-    const auto collection = MakeCollection("C");
+    const auto collection = Make("C");
     mService.Script(200, "[" + ItemJSON("old1", "a.txt") + "," + ItemJSON("old2", "a.txt") + "]");
     mService.Script(200, "");
     mService.Script(200, "");
@@ -108,7 +108,7 @@ TEST_F(TransferTest, UploadFailures)
         SCOPED_TRACE(failure.mWhat);
         const size_t before = mService.Requests().size();
         for (const HttpAnswer& reply : failure.mReplies) mService.Push(reply);
-        const auto collection = MakeCollection("C");
+        const auto collection = Make("C");
         const Outcome outcome = Upload(failure.mFile, collection);
         EXPECT_FALSE(outcome.Succeeded());
         EXPECT_EQ(outcome.Status(), failure.mStatus);
