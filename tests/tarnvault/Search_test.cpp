@@ -137,41 +137,6 @@ TEST_F(ClientTest, UnusableAnswersReachTheErrorCallback)
     EXPECT_EQ(unreachable.Status(), -100);
 }
 
-TEST_F(ClientTest, SearchOneGivesTheAssetOrNull)
-{
-    mService.Script(200, "[" + ItemJSON("i1", "a") + "]");
-    mService.Script(200, "[]");
-    const Outcome one = Await(
-        [&](Outcome& o) { mClient->SearchOneAsync(o.Success(), o.Error(), SearchQuery(), Guid::CreateUnique()); });
-    const Outcome none = Await(
-        [&](Outcome& o) { mClient->SearchOneAsync(o.Success(), o.Error(), SearchQuery(), Guid::CreateUnique()); });
-    ASSERT_TRUE(one.Succeeded());
-    EXPECT_EQ(one.AssetSeen()->mId, "i1");
-    EXPECT_TRUE(none.Succeeded());
-    EXPECT_FALSE(none.AssetSeen());
-}
-
-TEST_F(ClientTest, HeaderOfACollectionAndOfAnItem)
-{
-    mService.Script(200, CollectionJSON("other", "g"));
-    mService.Script(200, ItemJSON("other", "f.txt"));
-    Outcome collection, item;
-    const Guid id = Guid::CreateUnique();
-    EXPECT_EQ(mClient->HeaderAsync(collection.Success(), collection.Error(), "c9", true, id), id);
-    ASSERT_TRUE(collection.Wait());
-    mClient->HeaderAsync(item.Success(), item.Error(), "i9", false, Guid::CreateUnique());
-    ASSERT_TRUE(item.Wait());
-
-    ExpectAuthorised(mService.Find("GET", "/api/collections/c9/header"), id);
-    EXPECT_EQ(mService.Find("GET", "/api/assets/i9/metadata").mMethod, "GET");
-    ASSERT_TRUE(collection.Succeeded());
-    EXPECT_TRUE(collection.AssetSeen()->is_collection());
-    EXPECT_EQ(collection.AssetSeen()->mId, "c9");
-    ASSERT_TRUE(item.Succeeded());
-    EXPECT_FALSE(item.AssetSeen()->is_collection());
-    EXPECT_EQ(item.AssetSeen()->mId, "i9");
-}
-
 TEST_F(ClientTest, BadSearchModifierThrowsOnTheCallersThreadAndSendsNothing)
 {
     SearchQuery query;

@@ -194,7 +194,6 @@ TEST_F(TransferTest, DownloadFailuresLeaveTheFileAsItWas)
 
 TEST_F(TransferTest, DownloadReachingItsLimitFailsAndRemovesItsFile)
 {
-    EXPECT_EQ(mClient->DownloadSizeLimit(), std::uint64_t(1) << 32);
     const size_t limit = size_t(1) << 20;
     mClient->SetDownloadSizeLimit(limit);
     WriteFileBytes(mDir / "f.txt", "old");
