@@ -2,13 +2,14 @@
 
 #include <gtest/gtest.h>
 
+#include <stdexcept>
 #include <thread>
 #include <vector>
 
 #include "foundation/core/HostConfig.h"
 #include "foundation/core/Localizer.h"
-#include "foundation/core/Opener.h"
 #include "foundation/core/ThrowError.h"
+#include "support/OpenerRecorder.h"
 
 using namespace tolmocore;
 
@@ -47,18 +48,13 @@ TEST(HostConfig, AReferenceHeldByAReaderSurvivesALateSetter)
 
 TEST(ThrowError, AMessageOfTheWrongKindRaisesTheLocalisedConversionError)
 {
-    struct Message {
-        virtual ~Message() = default;
-    };
-    struct Click : Message {};
-    struct Edit : Message {};
     const char kKey[] = "$$$/tolmocore/utility/Error/InvalidTypeConversion=Invalid type conversion.";
-    Click click;
-    const Message* message = &click;
-    EXPECT_EQ(utility::NonOptionalDynamicCast<const Click>(message, kKey, 105, 21), &click);
-    for (const Message* wrong : {static_cast<const Message*>(nullptr), message}) {
+    const std::runtime_error click("click");
+    const std::exception* message = &click;
+    EXPECT_EQ(utility::NonOptionalDynamicCast<const std::runtime_error>(message, kKey, 105, 21), &click);
+    for (const std::exception* wrong : {static_cast<const std::exception*>(nullptr), message}) {
         try {
-            utility::NonOptionalDynamicCast<const Edit>(wrong, kKey, 105, 21);
+            utility::NonOptionalDynamicCast<const std::logic_error>(wrong, kKey, 105, 21);
             ADD_FAILURE() << "no error";
         } catch (const utility::LocalizedError& e) {
             EXPECT_STREQ(e.what(), "Invalid type conversion.");
@@ -68,20 +64,13 @@ TEST(ThrowError, AMessageOfTheWrongKindRaisesTheLocalisedConversionError)
     }
 }
 
-TEST(Opener, BrowserGetsASchemeWhenTheTextHasNoneAndFailuresAreReported)
+TEST(Opener, BrowserGetsASchemeWhenTheTextHasNone)
 {
-    std::vector<std::string> opened;
-    bool answer = true;
-    utility::SetOpener([&](const UTF16String& target) {
-        opened.push_back(utility::ToNarrow(target));
-        return answer;
-    });
+    testsupport::OpenerRecorder opener;
     EXPECT_TRUE(utility::OpenURLInDefaultBrowser(UTF16String(u"example.test/login")));
     EXPECT_TRUE(utility::OpenURLInDefaultBrowser(UTF16String(u"https://example.test/a?b=c")));
     EXPECT_FALSE(utility::OpenURLInDefaultBrowser(UTF16String()));
-    answer = false;
-    EXPECT_FALSE(utility::OpenFileInDefaultApplication(UTF16String(u"/tmp/file.txt")));
-    utility::SetOpener(utility::Opener());
-    EXPECT_EQ(opened,
+    EXPECT_TRUE(utility::OpenFileInDefaultApplication(UTF16String(u"/tmp/file.txt")));
+    EXPECT_EQ(opener.Opened(),
               (std::vector<std::string>{"http://example.test/login", "https://example.test/a?b=c", "/tmp/file.txt"}));
 }

@@ -2,10 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include <fcntl.h>
-#include <unistd.h>
-
-#include <cstdio>
 #include <filesystem>
 #include <thread>
 #include <vector>
@@ -83,18 +79,11 @@ TEST(Trace, TraceFileIsMadePrivateAppendsAndRefusesALinkToAFile)
     testsupport::TraceCapture capture("8");
     // What stderr got while `path` was the trace file and one line was traced.
     const auto traceTo = [&](const fs::path& path, const std::string& message) {
-        std::fflush(stderr);
-        const int saved = ::dup(2);
-        const int fd = ::open((dir / "stderr").c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
-        ::dup2(fd, 2);
-        ::close(fd);
+        ::testing::internal::CaptureStderr();
         SetTraceFile(path.string());
         TOLMO_TRACE("tolmonetsync", 8, message);
         SetTraceFile("/dev/null");
-        std::fflush(stderr);
-        ::dup2(saved, 2);
-        ::close(saved);
-        return testsupport::ReadFileBytes(dir / "stderr");
+        return ::testing::internal::GetCapturedStderr();
     };
     const auto mode = [](const fs::path& path) { return fs::status(path).permissions() & fs::perms::mask; };
 

@@ -72,17 +72,15 @@ TEST_F(JSONValuesTest, NumbersReadAcrossKindsAndWrongTypesThrow)
     EXPECT_THROW(Read<ptime>("b"), boost::bad_any_cast);
 }
 
-TEST_F(JSONValuesTest, GuidsGoAsTextAndBadTextIsRefused)
+TEST_F(JSONValuesTest, GuidsAndTimesGoAsTextAndBadTextIsRefused)
 {
     const Guid guid = Guid::CreateUnique();
     EXPECT_EQ(RoundTrip(guid), guid);
     EXPECT_EQ(Read<Guid>("g").AsUTF8String(), "0123ABCD-4567-89EF-0123-456789ABCDEF");
     EXPECT_THROW(JSONConvert<Guid>::FromJSON(boost::any(UTF8String("0123abcd"))), std::invalid_argument);
     EXPECT_THROW(Read<Guid>("empty"), std::invalid_argument);
-}
 
-TEST_F(JSONValuesTest, TimesUseTheSimpleFormAndEmptyForNotADateTime)
-{
+    // Times take the simple form, and an empty text for not-a-date-time.
     const ptime time(boost::gregorian::date(2014, 3, 5),
                      boost::posix_time::time_duration(9, 41, 7) + boost::posix_time::microseconds(123456));
     EXPECT_EQ(GetJSONUTF8String(JSONConvert<ptime>::ToJSON(time), false), "\"2014-Mar-05 09:41:07.123456\"");
