@@ -8,9 +8,7 @@
 #include <sys/wait.h>
 #include <cstdlib>
 
-#include "LocalScenarioServer.h"
-#include "SyncHarness.h"
-#include "SyncTestSupport.h"
+#include "FolderSync.h"
 
 using namespace synctest;
 using testsupport::ReadFileBytes;
@@ -32,7 +30,7 @@ const char kServiceVariable[] = "TOLMONETSYNC_EXIT_MID_PASS_SERVICE";
     fs::create_directories(work / "desk");
     for (int i = 0; i < 300; ++i) WriteFileBytes(work / "desk" / ("p" + std::to_string(i) + ".xmp"), "v1");
     auto newHost = [&] {
-        std::unique_ptr<SyncHarness> host(new SyncHarness(LocalScenarioServer::ClientOf(serviceUrl)));
+        std::unique_ptr<SyncHarness> host(new SyncHarness(ClientOf(serviceUrl)));
         host->Service().RegisterSyncDirectory(SyncDir(DirAt(work / "desk"), u".xmp", u"Presets",
                                                       ImmutableString::CreateStatic("text/xml"), SyncMetadata_Checksum,
                                                       1 << 20));
@@ -56,10 +54,10 @@ TEST(ExitMidPass, ProcessEndsCleanlyAndTheCacheFileIsUntouched)
 {
     if (const char* dir = std::getenv(kChildVariable)) RunChild(dir, std::getenv(kServiceVariable));
 
-    LocalScenarioServer server;
+    testsupport::TestService server;
     testsupport::TempDir work;
     const std::string setting = std::string(kChildVariable) + "=" + work.Path().string();
-    const std::string service = std::string(kServiceVariable) + "=" + server.Service().AssetServiceUrl();
+    const std::string service = std::string(kServiceVariable) + "=" + server->AssetServiceUrl();
     std::vector<char*> env;
     for (char** entry = environ; *entry; ++entry) env.push_back(*entry);
     env.push_back(const_cast<char*>(setting.c_str()));

@@ -7,7 +7,7 @@
 
 #include <boost/date_time/posix_time/posix_time.hpp>
 
-#include "SyncTestSupport.h"
+#include "support/SyncHarness.h"
 #include "assets/ChildrenMutex.h"
 
 using namespace synctest;

@@ -4,7 +4,7 @@
 
 #include <boost/date_time/posix_time/posix_time.hpp>
 
-#include "SyncTestSupport.h"
+#include "support/SyncHarness.h"
 #include "sync/SyncDecision.h"
 
 using namespace synctest;

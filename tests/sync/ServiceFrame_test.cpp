@@ -2,7 +2,7 @@
 
 #include <gtest/gtest.h>
 
-#include "SyncTestSupport.h"
+#include "support/SyncHarness.h"
 #include "sync/SyncFilesService.h"
 
 using namespace synctest;

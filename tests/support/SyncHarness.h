@@ -1,23 +1,44 @@
 #pragma once
-// Drives a whole sync from a test: a service over any SyncServer, and
-// blocking wrappers around the asynchronous prepare, pass and preview.
+// Drives whole syncs from a test: a service over any SyncServer, and blocking
+// wrappers around the asynchronous prepare, pass and preview that wait, as the
+// command does, until the last handler has let go of the run's callbacks.
+// Also a plan whose server is never asked, for the scan, the cache file and
+// the local file operations.
+//
+// Threads: call from one test thread; callbacks may come on any thread.
 
-#include <condition_variable>
-#include <mutex>
+#include <filesystem>
 #include <string>
 
+#include "support/TestScopes.h"
 #include "sync/SyncFilesService.h"
 #include "sync/SyncPreview.h"
 
 namespace synctest {
 
 using namespace tolmonetsync;
+using testsupport::PrefDirScope;
+using testsupport::TraceCapture;
+
+inline UTF16String Path(const std::filesystem::path& path)
+{
+    return tolmocore::utility::ToUTF16(path.string());
+}
+inline File FileAt(const std::filesystem::path& path)
+{
+    return File(Path(path));
+}
+inline Dir DirAt(const std::filesystem::path& path)
+{
+    return Dir(Path(path));
+}
 
 // The plan of a service over a given server.
 class ServerCache final : public SyncCache {
 public:
     ServerCache(const boost::shared_ptr<SyncServer>& server, const std::vector<SyncFile>& files,
-                const std::vector<SyncDir>& dirs, const ProgressCallback& progress, const ItemToFileCallback& itemToFile)
+                const std::vector<SyncDir>& dirs, const ProgressCallback& progress,
+                const ItemToFileCallback& itemToFile)
         : SyncCache(files, dirs, progress, itemToFile), mServer(server)
     {
     }
@@ -25,6 +46,19 @@ public:
 
 private:
     boost::shared_ptr<SyncServer> mServer;
+};
+
+// A plan whose server is never asked.
+class OfflineCache final : public SyncCache {
+public:
+    OfflineCache(const std::vector<SyncFile>& files, const std::vector<SyncDir>& dirs)
+        : SyncCache(files, dirs, ProgressCallback(), ItemToFileCallback())
+    {
+    }
+    const boost::shared_ptr<SyncServer>& GetApi() const override { return mNoServer; }
+
+private:
+    boost::shared_ptr<SyncServer> mNoServer;
 };
 
 class HarnessService final : public SyncFilesService {
@@ -46,14 +80,13 @@ private:
     boost::shared_ptr<SyncServer> mServer;
 };
 
-// What one asynchronous run ended with. Waits are bounded so a lost
-// callback fails the test instead of hanging it.
+// Everything one run's callbacks said, gathered once the run is over.
 struct RunResult {
     bool mStarted = false;
-    bool mFinished = false;     // success came
-    std::string mError;         // the first error, if any came
+    bool mFinished = false;  // success came (it may follow an error)
+    std::string mError;      // the first error, if any came
     int mErrorCount = 0;
-    int mMoved = -1;            // the pass's count
+    int mMoved = -1;  // the pass's count
     boost::shared_ptr<SyncCache> mCache;
     boost::shared_ptr<SyncPreview> mPreview;
 
@@ -66,11 +99,14 @@ public:
 
     HarnessService& Service() { return mService; }
 
-    RunResult Prepare(const ItemToFileCallback& itemToFile = ItemToFileCallback());
+    // Exceptions of PrepareSync pass out.
+    RunResult Prepare(const ProgressCallback& progress = ProgressCallback(),
+                      const ItemToFileCallback& itemToFile = ItemToFileCallback());
     RunResult Pass(const boost::shared_ptr<SyncCache>& cache, SyncMode mode);
     RunResult Preview(SyncMode mode);
     // Prepare, then the pass; the result of whichever failed first.
-    RunResult Sync(SyncMode mode);
+    RunResult Sync(SyncMode mode, const ProgressCallback& progress = ProgressCallback(),
+                   const ItemToFileCallback& itemToFile = ItemToFileCallback());
 
 private:
     HarnessService mService;
