@@ -1,8 +1,8 @@
-// The disk fails under a download, through the file-operation seam (as root,
-// permissions prove nothing, so the failure is an injected errno). After each
-// fault: the host hears of it, every local file holds its old or its new
-// bytes, what was replaced is in a backup, the cache file is as it was, and
-// the next sync without faults converges.
+// The disk fails under a download or under the cache file, through the
+// file-operation seam (as root, permissions prove nothing, so the failure is
+// an injected errno). After each fault: the host hears of it, every local
+// file holds its old or its new bytes, what was replaced is in a backup, the
+// cache file is as it was, and the next sync without faults converges.
 
 #include <gtest/gtest.h>
 
@@ -38,6 +38,7 @@ const DiskFault kDiskFaults[] = {
     {"syncing the folder fails", "dirsync", "Presets", EIO},
     {"read-only file system", "open", "", EROFS},
     {"directory not writable", "open", "", EACCES},
+    {"the cache file cannot be saved", "rename", "/tolmonetsynccache.json", EIO},
 };
 
 using DiskFaults = FolderSync;

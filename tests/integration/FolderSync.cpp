@@ -27,16 +27,6 @@ FolderSync::FolderSync() : mOwner(mService->GetAccounts().EnsureUser(kUser))
     fs::create_directories(Folder());
 }
 
-void FolderSync::Write(const std::string& name, const std::string& bytes)
-{
-    testsupport::WriteFileBytes(Folder() / name, bytes);
-}
-
-void FolderSync::Touch(const fs::path& path)
-{
-    fs::last_write_time(path, fs::last_write_time(path) + std::chrono::seconds(5));
-}
-
 boost::shared_ptr<SyncServer> ClientOf(const std::string& assetServiceUrl)
 {
     ParameterList parameters;
@@ -130,18 +120,6 @@ void FolderSync::RemoveItem(const std::string& group, const std::string& name)
     const std::string groupId = Group(group, false);
     const std::string existing = groupId.empty() ? "" : server::TreeSeeder(*mService, kUser).Find(groupId, name);
     if (!existing.empty()) mService->Assets().Delete(mOwner, existing, false);
-}
-
-std::shared_ptr<const server::FaultHandle> FolderSync::Fail(const char* method, const char* path, int status,
-                                                            const std::string& body, int nth)
-{
-    server::FaultRule rule;
-    rule.mNth = nth;
-    rule.mMethod = method;
-    rule.mPathPattern = path;
-    rule.mStatus = status;
-    rule.mBody = body;
-    return mService->Faults().Install(rule);
 }
 
 }  // namespace synctest

@@ -6,13 +6,13 @@
 
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <filesystem>
 #include <map>
 #include <memory>
 #include <string>
 #include <vector>
 
-#include "server/FaultHooks.h"
 #include "support/SyncHarness.h"
 #include "support/TestService.h"
 
@@ -29,9 +29,15 @@ protected:
 
     std::filesystem::path Folder() const { return mDesk.Path() / "Presets"; }
     std::filesystem::path SettingsPath() const { return mDesk.Path() / "settings.json"; }
-    void Write(const std::string& name, const std::string& bytes);
+    void Write(const std::string& name, const std::string& bytes)
+    {
+        testsupport::WriteFileBytes(Folder() / name, bytes);
+    }
     // Gives a local file a date clearly later than the one cached.
-    static void Touch(const std::filesystem::path& path);
+    static void Touch(const std::filesystem::path& path)
+    {
+        std::filesystem::last_write_time(path, std::filesystem::last_write_time(path) + std::chrono::seconds(5));
+    }
 
     // A new run of the host, with nothing cached but the cache file.
     std::unique_ptr<SyncHarness> NewHost(const boost::shared_ptr<SyncServer>& client);
@@ -52,9 +58,6 @@ protected:
     void PutItem(const std::string& group, const std::string& name, const std::string& bytes);
     void RemoveItem(const std::string& group, const std::string& name);
     void MakeGroup(const std::string& group) { Group(group, true); }
-    // Answers the nth matching request with `status` and `body`.
-    std::shared_ptr<const tolmonetsync::server::FaultHandle> Fail(const char* method, const char* path, int status,
-                                                                  const std::string& body, int nth = 1);
 
     PrefDirScope mPrefs;
     testsupport::TempDir mDesk;

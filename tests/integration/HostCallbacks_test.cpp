@@ -1,22 +1,17 @@
-// What the host gives the engine and hears back from it: its progress
-// callback through every batch, its itemToFile mapping, and a cache file that
-// cannot be saved.
+// What the host gives the engine: its progress callback, told through every
+// batch, and its itemToFile mapping.
 
 #include <algorithm>
-#include <cerrno>
-#include <cstring>
 #include <mutex>
 #include <vector>
 
 #include "FolderSync.h"
-#include "support/FileOpsRecorder.h"
 
 namespace synctest {
 
 namespace {
 
 namespace fs = std::filesystem;
-using testsupport::WriteFileBytes;
 using HostCallbacks = FolderSync;
 
 TEST_F(HostCallbacks, ProgressRisesToOneInEachBatchOfThePrepareChainAndThePass)
@@ -65,42 +60,6 @@ TEST_F(HostCallbacks, TheHostsItemToFileNamesTheFilesServerItemsArriveIn)
     ASSERT_TRUE(result.Ok()) << result.mError;
     EXPECT_EQ(asked, (std::vector<std::string>{"Remote.txt"}));
     EXPECT_EQ(Local(), (Files{{"Local.txt", "local"}, {"host-Remote.txt", "remote"}}));
-}
-
-TEST_F(HostCallbacks, ACacheFileThatCannotBeSavedReachesTheHostAndLosesNothing)
-{
-    struct Fault {
-        const char* mOperation;
-        const char* mPathEnd;
-        int mError;
-    };
-    for (const Fault& fault : {Fault{"rename", "/tolmonetsynccache.json", EIO}, Fault{"write", "", ENOSPC}}) {
-        SCOPED_TRACE(fault.mOperation);
-        Write("A.txt", "a1");
-        Touch(Folder() / "A.txt");
-        ASSERT_TRUE(Sync(SyncMode_TwoWay).Ok());
-        const std::string cacheBefore = CacheFile();
-        PutItem("Presets", "A.txt", "a2");
-        const std::string swapped = (Folder() / "A.txt").string();
-
-        RunResult failed;
-        {
-            // The cache file is saved after the download's swap.
-            testsupport::FileOpsRecorder disk;
-            disk.FailNext(fault.mOperation, fault.mPathEnd, fault.mError, "rename " + swapped + ".temp -> " + swapped);
-            failed = Sync(SyncMode_TwoWay);
-            EXPECT_TRUE(disk.AllFailuresMet());
-        }
-        EXPECT_FALSE(failed.mFinished);
-        EXPECT_NE(failed.mError.find(std::strerror(fault.mError)), std::string::npos) << failed.mError;
-        EXPECT_EQ(CacheFile(), cacheBefore);
-        EXPECT_EQ(Local(), (Files{{"A.txt", "a2"}}));
-        EXPECT_NE(Backups()["A.txt"].find("a1"), std::string::npos);
-
-        const RunResult again = Sync(SyncMode_TwoWay);
-        ASSERT_TRUE(again.Ok()) << again.mError;
-        EXPECT_EQ(Items("Presets"), Local());
-    }
 }
 
 }  // namespace

@@ -193,25 +193,12 @@ TEST_F(Scenarios, EachSideWinsInItsModeAndNothingIsReplacedWithoutABackup)
     EXPECT_EQ(settings->mCachedServerEtag.ToStdString(), "");
 }
 
-TEST_F(Scenarios, StaleGroupsGoItemsFromElsewhereArriveAndHostileNamesAreLeftOut)
-{
-    PutItem("Stale", "old.txt", "old");
-    PutItem("Presets", "FromOtherMachine.txt", "other");
-    PutItem("Presets", "../escape.txt", "outside");
-    PutItem("Presets", "..", "dots");
-    Write("Here.txt", "here");
-    const RunResult result = Sync(SyncMode_TwoWay);
-    ASSERT_TRUE(result.Ok()) << result.mError;
-    EXPECT_EQ(Groups(), (std::vector<std::string>{"Presets", "Settings"}));
-    EXPECT_EQ(Local(), (Files{{"FromOtherMachine.txt", "other"}, {"Here.txt", "here"}}));
-    EXPECT_FALSE(fs::exists(mDesk.Path() / "escape.txt"));
-    EXPECT_EQ(Items("Presets")["Here.txt"], "here");
-}
-
-TEST_F(Scenarios, PreviewPredictsThePassAndChangesNothing)
+TEST_F(Scenarios, PreviewPredictsThePassThatDeletesStaleGroupsAndLeavesHostileNamesOut)
 {
     Write("Up.txt", "up");
     PutItem("Presets", "Down.txt", "down");
+    PutItem("Presets", "../escape.txt", "outside");
+    PutItem("Presets", "..", "dots");
     PutItem("Stale", "x.txt", "x");
     const std::vector<std::string> groupsBefore = Groups();
 
@@ -219,7 +206,7 @@ TEST_F(Scenarios, PreviewPredictsThePassAndChangesNothing)
     ASSERT_TRUE(preview.Ok()) << preview.mError;
     EXPECT_EQ(Groups(), groupsBefore);
     EXPECT_FALSE(fs::exists(mPrefs.Path() / "SyncBackup"));
-    EXPECT_FALSE(fs::exists(Folder() / "Down.txt"));
+    EXPECT_EQ(Local(), (Files{{"Up.txt", "up"}}));
     EXPECT_EQ(preview.mPreview->mGroupsToDelete, GroupNameSet({u"Stale"}));
     Files predicted;
     const auto& records = preview.mPreview->mCache->mFiles;
@@ -231,6 +218,9 @@ TEST_F(Scenarios, PreviewPredictsThePassAndChangesNothing)
     ASSERT_TRUE(result.Ok()) << result.mError;
     EXPECT_EQ(result.mCache->mUploadCount, 1u);
     EXPECT_EQ(result.mCache->mDownloadCount, 1u);
+    EXPECT_EQ(Groups(), (std::vector<std::string>{"Presets", "Settings"}));
+    EXPECT_EQ(Local(), (Files{{"Down.txt", "down"}, {"Up.txt", "up"}}));
+    EXPECT_FALSE(fs::exists(mDesk.Path() / "escape.txt"));
 }
 
 }  // namespace

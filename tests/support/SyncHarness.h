@@ -2,8 +2,6 @@
 // Drives whole syncs from a test: a service over any SyncServer, and blocking
 // wrappers around the asynchronous prepare, pass and preview that wait, as the
 // command does, until the last handler has let go of the run's callbacks.
-// Also a plan whose server is never asked, for the scan, the cache file and
-// the local file operations.
 //
 // Threads: call from one test thread; callbacks may come on any thread.
 
@@ -33,12 +31,14 @@ inline Dir DirAt(const std::filesystem::path& path)
     return Dir(Path(path));
 }
 
-// The plan of a service over a given server.
-class ServerCache final : public SyncCache {
+// A plan over `server`; without one, a plan whose server is never asked (for
+// the scan, the cache file and the local file operations).
+class TestCache final : public SyncCache {
 public:
-    ServerCache(const boost::shared_ptr<SyncServer>& server, const std::vector<SyncFile>& files,
-                const std::vector<SyncDir>& dirs, const ProgressCallback& progress,
-                const ItemToFileCallback& itemToFile)
+    TestCache(const std::vector<SyncFile>& files, const std::vector<SyncDir>& dirs,
+              const boost::shared_ptr<SyncServer>& server = boost::shared_ptr<SyncServer>(),
+              const ProgressCallback& progress = ProgressCallback(),
+              const ItemToFileCallback& itemToFile = ItemToFileCallback())
         : SyncCache(files, dirs, progress, itemToFile), mServer(server)
     {
     }
@@ -46,19 +46,6 @@ public:
 
 private:
     boost::shared_ptr<SyncServer> mServer;
-};
-
-// A plan whose server is never asked.
-class OfflineCache final : public SyncCache {
-public:
-    OfflineCache(const std::vector<SyncFile>& files, const std::vector<SyncDir>& dirs)
-        : SyncCache(files, dirs, ProgressCallback(), ItemToFileCallback())
-    {
-    }
-    const boost::shared_ptr<SyncServer>& GetApi() const override { return mNoServer; }
-
-private:
-    boost::shared_ptr<SyncServer> mNoServer;
 };
 
 class HarnessService final : public SyncFilesService {
@@ -73,7 +60,7 @@ public:
                                              const ProgressCallback& progress,
                                              const ItemToFileCallback& itemToFile) override
     {
-        return boost::shared_ptr<SyncCache>(new ServerCache(mServer, files, dirs, progress, itemToFile));
+        return boost::shared_ptr<SyncCache>(new TestCache(files, dirs, mServer, progress, itemToFile));
     }
 
 private:
