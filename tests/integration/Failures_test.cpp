@@ -18,10 +18,8 @@ namespace synctest {
 namespace {
 
 namespace fs = std::filesystem;
-using testsupport::ReadFileBytes;
 using testsupport::RefusalRule;
 using testsupport::RefusingProcessor;
-using testsupport::WriteFileBytes;
 
 class Failures : public FolderSync {
 protected:

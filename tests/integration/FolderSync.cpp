@@ -20,13 +20,6 @@ namespace {
 const char kUser[] = "alice";
 const char kClientId[] = "folder-sync";
 
-}  // namespace
-
-FolderSync::FolderSync() : mOwner(mService->GetAccounts().EnsureUser(kUser))
-{
-    fs::create_directories(Folder());
-}
-
 boost::shared_ptr<SyncServer> ClientOf(const std::string& assetServiceUrl)
 {
     ParameterList parameters;
@@ -36,9 +29,16 @@ boost::shared_ptr<SyncServer> ClientOf(const std::string& assetServiceUrl)
     return boost::shared_ptr<SyncServer>(new tarnvault::Tarnvault(parameters));
 }
 
-std::unique_ptr<SyncHarness> FolderSync::NewHost(const boost::shared_ptr<SyncServer>& client)
+}  // namespace
+
+FolderSync::FolderSync() : mOwner(mService->GetAccounts().EnsureUser(kUser))
 {
-    auto host = std::make_unique<SyncHarness>(client);
+    fs::create_directories(Folder());
+}
+
+std::unique_ptr<SyncHarness> FolderSync::NewHost()
+{
+    auto host = std::make_unique<SyncHarness>(ClientOf(mService->AssetServiceUrl()));
     host->Service().RegisterSyncDirectory(SyncDir(DirAt(Folder()), u".txt", u"Presets",
                                                   ImmutableString::CreateStatic("text/plain"), SyncMetadata_ModDate,
                                                   1 << 20));

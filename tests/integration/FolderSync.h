@@ -20,9 +20,6 @@ namespace synctest {
 
 using Files = std::map<std::string, std::string>;
 
-// A client of the service at that URL, signed in as the fixture's user.
-boost::shared_ptr<SyncServer> ClientOf(const std::string& assetServiceUrl);
-
 class FolderSync : public ::testing::Test {
 protected:
     FolderSync();
@@ -39,9 +36,9 @@ protected:
         std::filesystem::last_write_time(path, std::filesystem::last_write_time(path) + std::chrono::seconds(5));
     }
 
-    // A new run of the host, with nothing cached but the cache file.
-    std::unique_ptr<SyncHarness> NewHost(const boost::shared_ptr<SyncServer>& client);
-    std::unique_ptr<SyncHarness> NewHost() { return NewHost(ClientOf(mService->AssetServiceUrl())); }
+    // A new run of the host, with nothing cached but the cache file; its
+    // client sends through the global request processor of the moment.
+    std::unique_ptr<SyncHarness> NewHost();
     RunResult Sync(SyncMode mode) { return NewHost()->Sync(mode); }
 
     // The folder's files by name, ".temp" files included.
