@@ -16,7 +16,6 @@ namespace synctest {
 
 namespace {
 
-using testsupport::WriteFileBytes;
 using tolmonetsync::server::FaultAction_Delay;
 using tolmonetsync::server::FaultHandle;
 using tolmonetsync::server::FaultRule;
@@ -27,10 +26,9 @@ using CancelPass = FolderSync;
 
 TEST_F(CancelPass, CancelAllEndsEveryHeldDownloadAndChangesNothing)
 {
-    std::filesystem::create_directories(Folder());
-    for (const char* name : kNames) WriteFileBytes(Folder() / name, std::string("old ") + name);
+    for (const char* name : kNames) Write(name, std::string("old ") + name);
     ASSERT_TRUE(Sync(SyncMode_TwoWay).Ok());
-    for (const char* name : kNames) mServer.PutItem("Presets", name, std::string("new ") + name);
+    for (const char* name : kNames) PutItem("Presets", name, std::string("new ") + name);
     const std::string cacheBefore = CacheFile();
     const Files before = Local();
 
@@ -44,16 +42,15 @@ TEST_F(CancelPass, CancelAllEndsEveryHeldDownloadAndChangesNothing)
         rule.mNth = nth;
         rule.mAction = FaultAction_Delay;
         rule.mDelay = std::chrono::seconds(8);
-        holds.push_back(mServer.Service().Faults().Install(rule));
+        holds.push_back(mService->Faults().Install(rule));
     }
 
-    SyncHarness host(mServer.Client());
-    Register(host);
-    const RunResult prepared = host.Prepare();
+    const std::unique_ptr<SyncHarness> host = NewHost();
+    const RunResult prepared = host->Prepare();
     ASSERT_TRUE(prepared.Ok()) << prepared.mError;
     testsupport::TraceCapture trace("Tarnvault:1");
     RunResult cancelled;
-    std::thread pass([&] { cancelled = host.Pass(prepared.mCache, SyncMode_TwoWay); });
+    std::thread pass([&] { cancelled = host->Pass(prepared.mCache, SyncMode_TwoWay); });
     // Waits until the service holds all three; the bound only keeps a lost
     // request from hanging the test.
     const auto deadline = std::chrono::steady_clock::now() + std::chrono::seconds(30);
@@ -62,7 +59,7 @@ TEST_F(CancelPass, CancelAllEndsEveryHeldDownloadAndChangesNothing)
         std::this_thread::sleep_for(std::chrono::milliseconds(5));
     prepared.mCache->CancelAll();
     pass.join();
-    mServer.Service().Faults().Clear();
+    mService->Faults().Clear();
 
     for (const auto& hold : holds) EXPECT_TRUE(hold->Fired());
     EXPECT_FALSE(cancelled.mFinished);
@@ -75,7 +72,7 @@ TEST_F(CancelPass, CancelAllEndsEveryHeldDownloadAndChangesNothing)
     const RunResult again = Sync(SyncMode_TwoWay);
     ASSERT_TRUE(again.Ok()) << again.mError;
     EXPECT_EQ(again.mMoved, 3);
-    EXPECT_EQ(Local(), mServer.Items("Presets"));
+    EXPECT_EQ(Local(), Items("Presets"));
 }
 
 }  // namespace

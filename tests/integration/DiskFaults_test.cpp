@@ -1,8 +1,8 @@
-// The disk fails under a download, through the file-operation seam (as root,
-// permissions prove nothing, so the failure is an injected errno). After each
-// fault: the host hears of it, every local file holds its old or its new
-// bytes, what was replaced is in a backup, the cache file is as it was, and
-// the next sync without faults converges.
+// The disk fails under a download or under the cache file, through the
+// file-operation seam (as root, permissions prove nothing, so the failure is
+// an injected errno). After each fault: the host hears of it, every local
+// file holds its old or its new bytes, what was replaced is in a backup, the
+// cache file is as it was, and the next sync without faults converges.
 
 #include <gtest/gtest.h>
 
@@ -19,7 +19,6 @@ namespace synctest {
 namespace {
 
 namespace fs = std::filesystem;
-using testsupport::WriteFileBytes;
 
 struct DiskFault {
     const char* mName;
@@ -36,27 +35,28 @@ const DiskFault kDiskFaults[] = {
     {"a download's fsync fails", "fsync", "", EIO},
     {"the fsync before the swap fails", "fsync", "Presets/A.txt.temp", EIO},
     {"the swap's rename fails", "rename", "Presets/A.txt", EIO},
+    {"syncing the folder fails", "dirsync", "Presets", EIO},
     {"read-only file system", "open", "", EROFS},
     {"directory not writable", "open", "", EACCES},
+    {"the cache file cannot be saved", "rename", "/tolmonetsynccache.json", EIO},
 };
 
 using DiskFaults = FolderSync;
 
 TEST_F(DiskFaults, AFailedWriteLosesNothingAndTheNextSyncConverges)
 {
-    fs::create_directories(Folder());
     for (const DiskFault& fault : kDiskFaults) {
         SCOPED_TRACE(fault.mName);
         // Two files come down in the faulted pass; only A meets the fault.
-        WriteFileBytes(Folder() / "A.txt", std::string("a old ") + fault.mName);
-        WriteFileBytes(Folder() / "B.txt", std::string("b old ") + fault.mName);
-        fs::last_write_time(Folder() / "A.txt", fs::last_write_time(Folder() / "A.txt") + std::chrono::seconds(5));
-        fs::last_write_time(Folder() / "B.txt", fs::last_write_time(Folder() / "B.txt") + std::chrono::seconds(5));
+        Write("A.txt", std::string("a old ") + fault.mName);
+        Write("B.txt", std::string("b old ") + fault.mName);
+        Touch(Folder() / "A.txt");
+        Touch(Folder() / "B.txt");
         ASSERT_TRUE(Sync(SyncMode_TwoWay).Ok());
         const std::string cacheBefore = CacheFile();
         const Files before = Local();
-        mServer.PutItem("Presets", "A.txt", std::string("a new ") + fault.mName);
-        mServer.PutItem("Presets", "B.txt", std::string("b new ") + fault.mName);
+        PutItem("Presets", "A.txt", std::string("a new ") + fault.mName);
+        PutItem("Presets", "B.txt", std::string("b new ") + fault.mName);
 
         RunResult failed;
         {
@@ -71,7 +71,7 @@ TEST_F(DiskFaults, AFailedWriteLosesNothingAndTheNextSyncConverges)
         EXPECT_EQ(CacheFile(), cacheBefore);
 
         const Files after = Local();
-        const Files server = mServer.Items("Presets");
+        const Files server = Items("Presets");
         const Files backups = Backups();
         // A failed swap leaves its ".temp" for the next download to overwrite;
         // nothing else new may appear.

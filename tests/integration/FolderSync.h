@@ -1,16 +1,20 @@
 #pragma once
-// One registered folder ("Presets", ".txt" files) synced against the local
-// service over loopback, and what a test looks at afterwards.
+// Whole syncs of one computer against the local service over loopback: the
+// folder "Presets" (".txt" files, group "Presets") and the file
+// "settings.json" (group "Settings", item "settings") are registered; the
+// service's store is the back door to the user's groups on the server.
 
 #include <gtest/gtest.h>
 
+#include <chrono>
 #include <filesystem>
 #include <map>
+#include <memory>
 #include <string>
+#include <vector>
 
-#include "LocalScenarioServer.h"
-#include "SyncHarness.h"
-#include "support/TestScopes.h"
+#include "support/SyncHarness.h"
+#include "support/TestService.h"
 
 namespace synctest {
 
@@ -18,50 +22,48 @@ using Files = std::map<std::string, std::string>;
 
 class FolderSync : public ::testing::Test {
 protected:
+    FolderSync();
+
     std::filesystem::path Folder() const { return mDesk.Path() / "Presets"; }
-
-    void Register(SyncHarness& host)
+    std::filesystem::path SettingsPath() const { return mDesk.Path() / "settings.json"; }
+    void Write(const std::string& name, const std::string& bytes)
     {
-        host.Service().RegisterSyncDirectory(SyncDir(Dir(tolmocore::utility::ToUTF16(Folder().string())), u".txt",
-                                                     u"Presets", ImmutableString::CreateStatic("text/plain"),
-                                                     SyncMetadata_ModDate, 1 << 20));
+        testsupport::WriteFileBytes(Folder() / name, bytes);
     }
-    // A whole sync by a new run of the host.
-    RunResult Sync(SyncMode mode)
+    // Gives a local file a date clearly later than the one cached.
+    static void Touch(const std::filesystem::path& path)
     {
-        SyncHarness host(mServer.Client());
-        Register(host);
-        return host.Sync(mode);
+        std::filesystem::last_write_time(path, std::filesystem::last_write_time(path) + std::chrono::seconds(5));
     }
 
-    // Every file of the folder by name, ".temp" files included.
-    Files Local() const
-    {
-        Files files;
-        for (const auto& entry : std::filesystem::directory_iterator(Folder()))
-            files[entry.path().filename().string()] = testsupport::ReadFileBytes(entry.path());
-        return files;
-    }
+    // A new run of the host, with nothing cached but the cache file; its
+    // client sends through the global request processor of the moment.
+    std::unique_ptr<SyncHarness> NewHost();
+    RunResult Sync(SyncMode mode) { return NewHost()->Sync(mode); }
 
+    // The folder's files by name, ".temp" files included.
+    Files Local() const;
     // Every backed-up copy of a name, joined by "|".
-    Files Backups() const
-    {
-        Files saved;
-        const std::filesystem::path root = mPrefs.Path() / "SyncBackup";
-        if (!std::filesystem::exists(root)) return saved;
-        for (const auto& dir : std::filesystem::directory_iterator(root))
-            for (const auto& file : std::filesystem::directory_iterator(dir.path())) {
-                std::string& copies = saved[file.path().filename().string()];
-                copies += (copies.empty() ? "" : "|") + testsupport::ReadFileBytes(file.path());
-            }
-        return saved;
-    }
+    Files Backups() const;
+    // The cache file's bytes; "<none>" without one.
+    std::string CacheFile() const;
 
-    std::string CacheFile() const { return testsupport::ReadFileBytes(mPrefs.Path() / "tolmonetsynccache.json"); }
+    // The groups under this host's preferences root, sorted.
+    std::vector<std::string> Groups();
+    Files Items(const std::string& group);
+    // A new upload of the name, dated at least a second after any before it.
+    void PutItem(const std::string& group, const std::string& name, const std::string& bytes);
+    void RemoveItem(const std::string& group, const std::string& name);
+    void MakeGroup(const std::string& group) { Group(group, true); }
 
-    testsupport::PrefDirScope mPrefs;
+    PrefDirScope mPrefs;
     testsupport::TempDir mDesk;
-    LocalScenarioServer mServer;
+    testsupport::TestService mService;
+
+private:
+    // The group's id (the preferences root's for ""); empty if missing.
+    std::string Group(const std::string& group, bool create);
+    std::int64_t mOwner;
 };
 
 }  // namespace synctest

@@ -16,7 +16,7 @@
 #include <set>
 #include <string>
 
-#include "SyncHarness.h"
+#include "support/SyncHarness.h"
 #include "server/LocalService.h"
 #include "server/TreeSeeder.h"
 #include "support/TempDir.h"

@@ -1,10 +1,11 @@
-// Every row of the pass's decision tables, in all three modes.
+// Every row of the pass's decision tables, in all three modes, for records
+// watched by date and by content.
 
 #include <gtest/gtest.h>
 
 #include <boost/date_time/posix_time/posix_time.hpp>
 
-#include "SyncTestSupport.h"
+#include "support/SyncHarness.h"
 #include "sync/SyncDecision.h"
 
 using namespace synctest;
@@ -12,7 +13,8 @@ using testsupport::WriteFileBytes;
 
 namespace {
 
-enum Local { Missing, Unchanged, Changed };
+// Touched: a new date, the same bytes; Changed: both new.
+enum Local { Missing, Unchanged, Touched, Changed };
 enum Remote { NoItem, ItemSameDate, ItemNewerDate };
 
 struct Row {
@@ -22,18 +24,20 @@ struct Row {
     bool mHistory;
     SyncAction mAction;
     bool mDropsTag;
+    bool mByContent = false;
 };
 
 std::ostream& operator<<(std::ostream& out, const Row& row)
 {
     return out << "mode " << row.mMode << ", local " << row.mLocal << ", remote " << row.mRemote << ", history "
-               << row.mHistory;
+               << row.mHistory << ", by content " << row.mByContent;
 }
 
 class DecisionTable : public ::testing::TestWithParam<Row> {
 protected:
     const boost::posix_time::ptime kServerDate = boost::posix_time::time_from_string("2024-02-03 04:05:06");
     const boost::posix_time::ptime kLocalDate = boost::posix_time::time_from_string("2024-02-01 00:00:00");
+    const Guid kChecksum = Guid(1, 2, 3, 4, 5, 6, 7, 8, 9, 10, 11);
     PrefDirScope mPrefs;
     testsupport::TempDir mWork;
 };
@@ -43,7 +47,7 @@ protected:
 TEST_P(DecisionTable, ActionFollowsTheTable)
 {
     const Row row = GetParam();
-    OfflineCache cache({}, {});
+    TestCache cache({}, {});
     boost::shared_ptr<Collection> group(new Collection);
     group->mName = u"G";
     cache.mCollections.push_back(group);
@@ -63,8 +67,13 @@ TEST_P(DecisionTable, ActionFollowsTheTable)
         record.mCachedServerEtag = "\"kept\"";
         record.mCachedLocalModDate = kLocalDate;
     }
-    if (row.mLocal != Missing)
-        record.mLocalModDate = row.mLocal == Changed ? kLocalDate + boost::posix_time::seconds(1) : kLocalDate;
+    record.mOptions = row.mByContent ? SyncMetadata_Checksum : SyncMetadata_ModDate;
+    record.mCachedLocalChecksum = kChecksum;
+    if (row.mLocal != Missing) {
+        // Dates compare by equality to the microsecond: an earlier one is a change too.
+        record.mLocalModDate = row.mLocal == Unchanged ? kLocalDate : kLocalDate - boost::posix_time::microseconds(1);
+        record.mLocalChecksum = row.mLocal == Changed ? Guid(9, 9, 9, 9, 9, 9, 9, 9, 9, 9, 9) : kChecksum;
+    }
 
     const SyncDecision decision = DecideRecord(cache, record, row.mMode);
     EXPECT_EQ(decision.mAction, row.mAction) << row << " (" << decision.ActionName() << ")";
@@ -99,13 +108,16 @@ INSTANTIATE_TEST_SUITE_P(
                       Row{SyncMode_LocalWins, Unchanged, ItemNewerDate, true, SyncAction_Upload, false},
                       Row{SyncMode_LocalWins, Unchanged, NoItem, false, SyncAction_Upload, false},
                       Row{SyncMode_LocalWins, Missing, ItemSameDate, false, SyncAction_DeleteRemote, false},
-                      Row{SyncMode_LocalWins, Missing, NoItem, false, SyncAction_SkipMissingLocal, false}));
+                      Row{SyncMode_LocalWins, Missing, NoItem, false, SyncAction_SkipMissingLocal, false},
+                      Row{SyncMode_LocalWins, Touched, ItemSameDate, true, SyncAction_Upload, false},
+                      Row{SyncMode_LocalWins, Touched, ItemSameDate, true, SyncAction_Nothing, false, true},
+                      Row{SyncMode_LocalWins, Changed, ItemSameDate, true, SyncAction_Upload, false, true}));
 
 TEST(DecisionLimits, UploadAtTheSizeLimitIsSkippedOneByteLessGoes)
 {
     PrefDirScope prefs;
     testsupport::TempDir work;
-    OfflineCache cache({}, {});
+    TestCache cache({}, {});
     CachedSyncFile record(SyncFile(FileAt(work / "big.bin"), u"big.bin", u"G", ImmutableString::CreateStatic("t/x"),
                                    SyncMetadata_ModDate, 10));
     WriteFileBytes(work / "big.bin", std::string(10, 'x'));

@@ -2,7 +2,7 @@
 
 #include <gtest/gtest.h>
 
-#include "SyncTestSupport.h"
+#include "support/SyncHarness.h"
 #include "sync/SyncFilesService.h"
 
 using namespace synctest;
@@ -19,7 +19,7 @@ public:
     boost::shared_ptr<SyncCache> CreateCache(const std::vector<SyncFile>& files, const std::vector<SyncDir>& dirs,
                                              const ProgressCallback&, const ItemToFileCallback&) override
     {
-        return boost::shared_ptr<SyncCache>(new OfflineCache(files, dirs));
+        return boost::shared_ptr<SyncCache>(new TestCache(files, dirs));
     }
 
 private:
@@ -46,7 +46,7 @@ protected:
 
 }  // namespace
 
-TEST_F(ServiceFrameTest, RegisteringAFileTwiceKeepsTheFirst)
+TEST_F(ServiceFrameTest, ASecondRegistrationOfAFileOrDirectoryKeepsTheFirst)
 {
     EXPECT_TRUE(mService.RegisterSyncFile(FileNamed("a.txt", "First")));
     EXPECT_FALSE(mService.RegisterSyncFile(FileNamed("a.txt", "Second")));
@@ -54,23 +54,12 @@ TEST_F(ServiceFrameTest, RegisteringAFileTwiceKeepsTheFirst)
     EXPECT_EQ(mService.SyncFiles()[0].mCollectionName, UTF16String(u"First"));
     EXPECT_TRUE(mService.UnregisterSyncFile(FileAt(mWork / "a.txt")));
     EXPECT_FALSE(mService.UnregisterSyncFile(FileAt(mWork / "a.txt")));
-    EXPECT_TRUE(mService.SyncFiles().empty());
-}
 
-TEST_F(ServiceFrameTest, RegisteringADirectoryAgainKeepsTheFirstExtension)
-{
     EXPECT_TRUE(mService.RegisterSyncDirectory(DirWith(".xmp")));
     EXPECT_FALSE(mService.RegisterSyncDirectory(DirWith(".txt")));
     EXPECT_EQ(mService.SyncDirs()[0].mExtension, UTF16String(u".xmp"));
     EXPECT_FALSE(mService.UnregisterSyncDirectory(DirAt(mWork / "elsewhere")));
     EXPECT_TRUE(mService.UnregisterSyncDirectory(DirAt(mWork.Path())));
-}
-
-TEST_F(ServiceFrameTest, NoCacheMeansStatusNoneAndProgressOne)
-{
-    EXPECT_EQ(mService.GetStatus(), SyncStatus_None);
-    EXPECT_FLOAT_EQ(mService.Progress(), 1.0f);
-    mService.CancelAll();  // nothing to cancel, nothing happens
 }
 
 TEST_F(ServiceFrameTest, LatestSyncDateFollowsTheCacheFile)
@@ -89,7 +78,7 @@ TEST_F(ServiceFrameTest, ScanGivesDirectoryFilesRecordsWithinTheirLimit)
     WriteFileBytes(mWork / "small.xmp", std::string(99, 'x'));
     WriteFileBytes(mWork / "limit.xmp", std::string(100, 'x'));  // exactly the limit: no record
     WriteFileBytes(mWork / "other.txt", "x");
-    OfflineCache cache({FileNamed("registered.txt")}, {DirWith(".xmp")});
+    TestCache cache({FileNamed("registered.txt")}, {DirWith(".xmp")});
     cache.PrepareSync();
     ASSERT_EQ(cache.mFiles.size(), 2u);
     EXPECT_EQ(cache.mFiles[0].mName, UTF16String(u"registered.txt"));
@@ -100,7 +89,7 @@ TEST_F(ServiceFrameTest, ScanGivesDirectoryFilesRecordsWithinTheirLimit)
 TEST_F(ServiceFrameTest, ServerItemsGetRecordsWithServerLimitsAndHostileNamesAreLeftOut)
 {
     WriteFileBytes(mWork / "local.xmp", "x");
-    OfflineCache cache({}, {DirWith(".xmp")});
+    TestCache cache({}, {DirWith(".xmp")});
     boost::shared_ptr<Collection> group(new Collection);
     group->mName = u"G";
     for (const char16_t* name : {u"local.xmp", u"remote.png", u"../escape.xmp", u"a/b.xmp", u""}) {
@@ -119,30 +108,10 @@ TEST_F(ServiceFrameTest, ServerItemsGetRecordsWithServerLimitsAndHostileNamesAre
     ASSERT_EQ(cache.mFiles.size(), 2u);
     EXPECT_EQ(cache.mFiles[0].mName, UTF16String(u"local.xmp"));  // the directory's record, no twin
     const CachedSyncFile& remote = cache.mFiles[1];
-    EXPECT_EQ(remote.mName, UTF16String(u"remote.png"));          // another extension still gets one
+    EXPECT_EQ(remote.mName, UTF16String(u"remote.png"));  // another extension still gets one
     EXPECT_EQ(remote.mMaxSize, kServerRecordMaxSize);
     EXPECT_EQ(remote.mMimeType.ToStdString(), "image/png");
     EXPECT_FALSE(std::filesystem::exists(mWork.Path().parent_path() / "escape.xmp"));
     EXPECT_TRUE(trace.Contains("escape.xmp"));
     EXPECT_TRUE(trace.Contains("Unexpected collection: "));
-}
-
-TEST_F(ServiceFrameTest, GroupDiffSplitsServerAndLocalNames)
-{
-    OfflineCache cache({FileNamed("a.txt", "Both"), FileNamed("b.txt", "LocalOnly")}, {});
-    cache.mServerGroupNames = {u"Both", u"ServerOnly"};
-    cache.DiffGroupNames();
-    EXPECT_EQ(cache.mGroupsToFetch, GroupNameSet({u"Both"}));
-    EXPECT_EQ(cache.mGroupsToAdd, GroupNameSet({u"LocalOnly"}));
-    EXPECT_EQ(cache.mGroupsToDelete, GroupNameSet({u"ServerOnly"}));
-}
-
-TEST(CreateSyncFilesService, OnlyTheAssetServiceTypeExists)
-{
-    try {
-        CreateSyncFilesService(static_cast<SyncServiceType>(1), ParameterList());
-        FAIL() << "type 1 was accepted";
-    } catch (const std::runtime_error& e) {
-        EXPECT_STREQ(e.what(), "Unimplemented");
-    }
 }

@@ -1,0 +1,125 @@
+#include "FolderSync.h"
+
+#include <algorithm>
+#include <chrono>
+#include <thread>
+
+#include "foundation/net/HeaderConstants.h"
+#include "server/Accounts.h"
+#include "server/AssetStore.h"
+#include "server/TreeSeeder.h"
+#include "tarnvault/Tarnvault.h"
+
+namespace synctest {
+
+namespace fs = std::filesystem;
+using testsupport::ReadFileBytes;
+
+namespace {
+
+const char kUser[] = "alice";
+const char kClientId[] = "folder-sync";
+
+boost::shared_ptr<SyncServer> ClientOf(const std::string& assetServiceUrl)
+{
+    ParameterList parameters;
+    parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(assetServiceUrl));
+    parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, UTF8String(kClientId));
+    parameters.emplace_back(tolmonet::kHEADER_COOKIE, UTF8String(testsupport::kAliceToken));
+    return boost::shared_ptr<SyncServer>(new tarnvault::Tarnvault(parameters));
+}
+
+}  // namespace
+
+FolderSync::FolderSync() : mOwner(mService->GetAccounts().EnsureUser(kUser))
+{
+    fs::create_directories(Folder());
+}
+
+std::unique_ptr<SyncHarness> FolderSync::NewHost()
+{
+    auto host = std::make_unique<SyncHarness>(ClientOf(mService->AssetServiceUrl()));
+    host->Service().RegisterSyncDirectory(SyncDir(DirAt(Folder()), u".txt", u"Presets",
+                                                  ImmutableString::CreateStatic("text/plain"), SyncMetadata_ModDate,
+                                                  1 << 20));
+    host->Service().RegisterSyncFile(SyncFile(FileAt(SettingsPath()), u"settings", u"Settings",
+                                              ImmutableString::CreateStatic("application/json"), SyncMetadata_Checksum,
+                                              1 << 20));
+    return host;
+}
+
+Files FolderSync::Local() const
+{
+    Files files;
+    for (const auto& entry : fs::directory_iterator(Folder()))
+        files[entry.path().filename().string()] = ReadFileBytes(entry.path());
+    return files;
+}
+
+Files FolderSync::Backups() const
+{
+    Files saved;
+    const fs::path root = mPrefs.Path() / "SyncBackup";
+    if (!fs::exists(root)) return saved;
+    for (const auto& dir : fs::directory_iterator(root))
+        for (const auto& file : fs::directory_iterator(dir.path())) {
+            std::string& copies = saved[file.path().filename().string()];
+            copies += (copies.empty() ? "" : "|") + ReadFileBytes(file.path());
+        }
+    return saved;
+}
+
+std::string FolderSync::CacheFile() const
+{
+    const fs::path path = mPrefs.Path() / "tolmonetsynccache.json";
+    return fs::exists(path) ? ReadFileBytes(path) : std::string("<none>");
+}
+
+std::string FolderSync::Group(const std::string& group, bool create)
+{
+    server::TreeSeeder seed(*mService, kUser);
+    const std::string clientRoot = seed.ClientRoot(kClientId);
+    const std::string rootName =
+        tolmocore::utility::ToNarrow(tarnvault::Tarnvault(ParameterList()).GetPreferencesRootName());
+    std::string root = seed.Find(clientRoot, rootName);
+    if (root.empty() && !create) return root;
+    if (root.empty()) root = seed.Collection(clientRoot, rootName, server::kMediaPreferences);
+    if (group.empty()) return root;
+    std::string id = seed.Find(root, group);
+    if (id.empty() && create) id = seed.Collection(root, group);
+    return id;
+}
+
+std::vector<std::string> FolderSync::Groups()
+{
+    std::vector<std::string> names;
+    const std::string root = Group("", false);
+    if (root.empty()) return names;
+    for (const server::AssetRecord& member : mService->Assets().Members(mOwner, root)) names.push_back(member.mName);
+    std::sort(names.begin(), names.end());
+    return names;
+}
+
+Files FolderSync::Items(const std::string& group)
+{
+    const std::string id = Group(group, false);
+    return id.empty() ? Files() : server::TreeSeeder(*mService, kUser).Contents(id);
+}
+
+void FolderSync::PutItem(const std::string& group, const std::string& name, const std::string& bytes)
+{
+    // Dates travel in whole seconds: a change staged in the second of the
+    // last sync would carry that sync's date.
+    std::this_thread::sleep_until(std::chrono::ceil<std::chrono::seconds>(std::chrono::system_clock::now()));
+    RemoveItem(group, name);
+    server::TreeSeeder(*mService, kUser).Item(Group(group, true), name, bytes);
+}
+
+void FolderSync::RemoveItem(const std::string& group, const std::string& name)
+{
+    const std::string groupId = Group(group, false);
+    const std::string existing = groupId.empty() ? "" : server::TreeSeeder(*mService, kUser).Find(groupId, name);
+    if (!existing.empty()) mService->Assets().Delete(mOwner, existing, false);
+}
+
+}  // namespace synctest
