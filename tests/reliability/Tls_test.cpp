@@ -7,122 +7,91 @@
 #include <gtest/gtest.h>
 
 #include <climits>
-#include <memory>
 
-#include "CliProcess.h"
 #include "SelfSignedCertificate.h"
 #include "foundation/net/CurlRequestProcessor.h"
-#include "server/LocalService.h"
+#include "support/CliProcess.h"
 #include "support/ResponseRecorder.h"
-#include "support/TempDir.h"
+#include "support/TestService.h"
 
 namespace {
 
 namespace fs = std::filesystem;
 using namespace tolmonet;
 using namespace tolmonet::http;
-using namespace tolmonetsync::server;
-using reliability::WriteSelfSignedCertificate;
 using testsupport::WriteFileBytes;
 
-const char kToken[] = "tls-token";
-
-class TlsService : public ::testing::Test {
+class Tls : public ::testing::Test {
 protected:
-    void SetUp() override { WriteSelfSignedCertificate(Certificate(), Key()); }
+    Tls() { reliability::WriteSelfSignedCertificate(Certificate(), Key()); }
 
     fs::path Certificate() const { return mFiles / "cert.pem"; }
     fs::path Key() const { return mFiles / "key.pem"; }
 
-    // The service in this process, serving HTTPS; a rule that counts every
-    // request reaching it and never fires.
-    void StartService()
-    {
-        LocalServiceOptions options;
-        options.mDataDirectory = (mFiles / "service").string();
-        options.mTokens.push_back({"tls", kToken});
-        options.mCertificateFile = Certificate().string();
-        options.mPrivateKeyFile = Key().string();
-        mService.reset(new LocalService(options));
-        mService->Start();
-        FaultRule counter;
-        counter.mPathPattern = ".*";
-        counter.mNth = INT_MAX;
-        mReached = mService->Faults().Install(counter);
-    }
-
-    // A signed-in GET of a client root through `processor`.
-    boost::shared_ptr<Response> GetRoot(RequestProcessor& processor)
+    // The answer to a signed-in GET of a client root under `base` through `processor`.
+    static boost::shared_ptr<Response> GetRoot(RequestProcessor& processor, const std::string& base)
     {
         testsupport::ResponseRecorder recorder(processor);
         HeaderList headers;
         headers.emplace(ImmutableString::CreateStatic("Authorization"),
-                        ImmutableString::CreateDynamic(std::string("Bearer ") + kToken));
-        const std::string url = mService->AssetServiceUrl() + "/collections?name=tls";
-        EXPECT_TRUE(processor.GET(Guid::CreateUnique(), recorder.Handler(), ImmutableString::CreateDynamic(url),
-                                  headers, Configuration()));
+                        ImmutableString::CreateDynamic(std::string("Bearer ") + testsupport::kAliceToken));
+        EXPECT_TRUE(processor.GET(Guid::CreateUnique(), recorder.Handler(),
+                                  ImmutableString::CreateDynamic(base + "/collections?name=tls"), headers,
+                                  Configuration()));
         if (!recorder.WaitFor(1)) return boost::shared_ptr<Response>();
         return recorder.Responses().at(0).mResponse;
     }
 
     testsupport::TempDir mFiles;
-    std::unique_ptr<LocalService> mService;
-    std::shared_ptr<const FaultHandle> mReached;
 };
 
-TEST_F(TlsService, ClientWithoutTheCaRefusesTheCertificateWithAReadableText)
+TEST_F(Tls, OnlyAClientThatTrustsTheCaIsAnswered)
 {
-    StartService();
-    CurlRequestProcessor processor;  // the system's store only
-    const boost::shared_ptr<Response> response = GetRoot(processor);
-    ASSERT_TRUE(response != nullptr) << "no handler call";
-    EXPECT_EQ(response->status, kStatusNoResponse);
-    const std::string text = response->BodyText().ToStdString();
+    testsupport::TestService service([&](tolmonetsync::server::LocalServiceOptions& options) {
+        options.mCertificateFile = Certificate().string();
+        options.mPrivateKeyFile = Key().string();
+    });
+    tolmonetsync::server::FaultRule counter;  // counts what reaches the service, never fires
+    counter.mPathPattern = ".*";
+    counter.mNth = INT_MAX;
+    const auto reached = service->Faults().Install(counter);
+    const std::string https = service->AssetServiceUrl();
+    ASSERT_EQ(https.rfind("https://127.0.0.1:", 0), 0u) << https;
+    EXPECT_EQ(service->IdentityServiceUrl().rfind("https://127.0.0.1:", 0), 0u);
+
+    CurlRequestProcessor systemStoreOnly;
+    const boost::shared_ptr<Response> refused = GetRoot(systemStoreOnly, https);
+    ASSERT_TRUE(refused != nullptr) << "no handler call";
+    EXPECT_EQ(refused->status, kStatusNoResponse);
+    const std::string text = refused->BodyText().ToStdString();
     EXPECT_NE(text.find("certificate"), std::string::npos) << text;
     EXPECT_EQ(text.find_first_of("\r\n"), std::string::npos) << text;
-    EXPECT_EQ(mReached->Seen(), 0);
-}
 
-TEST_F(TlsService, ClientGivenTheCaIsAnswered)
-{
-    StartService();
-    EXPECT_EQ(mService->AssetServiceUrl().rfind("https://127.0.0.1:", 0), 0u) << mService->AssetServiceUrl();
-    EXPECT_EQ(mService->IdentityServiceUrl().rfind("https://127.0.0.1:", 0), 0u);
+    const boost::shared_ptr<Response> plain = GetRoot(systemStoreOnly, "http" + https.substr(5));
+    ASSERT_TRUE(plain != nullptr) << "no handler call";
+    EXPECT_LE(plain->status, 0);
+    EXPECT_EQ(reached->Seen(), 0);
+
     CurlProcessorSettings settings;
     settings.mCAFile = Certificate().string();
-    CurlRequestProcessor processor(settings);
-    const boost::shared_ptr<Response> response = GetRoot(processor);
-    ASSERT_TRUE(response != nullptr) << "no handler call";
-    EXPECT_EQ(response->status, 200) << response->BodyText().ToStdString();
-    EXPECT_EQ(mReached->Seen(), 1);
+    CurlRequestProcessor trusting(settings);
+    const boost::shared_ptr<Response> answered = GetRoot(trusting, https);
+    ASSERT_TRUE(answered != nullptr) << "no handler call";
+    EXPECT_EQ(answered->status, 200) << answered->BodyText().ToStdString();
+    EXPECT_EQ(reached->Seen(), 1);
 }
 
-TEST_F(TlsService, PlainHttpClientIsNotAnsweredOnTheHttpsPort)
+TEST_F(Tls, CommandSyncsWithServeOverHttpsOnlyWhenItTrustsTheCaAndServeNeedsAUsableOne)
 {
-    StartService();
-    CurlRequestProcessor processor;
-    testsupport::ResponseRecorder recorder(processor);
-    std::string url = mService->AssetServiceUrl();
-    url.replace(0, 5, "http");  // "https" -> "http"
-    ASSERT_TRUE(processor.GET(Guid::CreateUnique(), recorder.Handler(),
-                              ImmutableString::CreateDynamic(url + "/collections?name=tls"), HeaderList(),
-                              Configuration()));
-    ASSERT_TRUE(recorder.WaitFor(1));
-    EXPECT_LE(recorder.Responses().at(0).mResponse->status, 0);
-    EXPECT_EQ(mReached->Seen(), 0);
-}
-
-TEST_F(TlsService, CommandSyncsWithServeOverHttpsOnlyWhenItTrustsTheCa)
-{
-    clitest::ServedService served(mFiles / "served", kToken,
+    clitest::ServedService served(mFiles / "served", "tls-token",
                                   {"--cert", Certificate().string(), "--key", Key().string()});
     ASSERT_EQ(served.Base().rfind("https://127.0.0.1:", 0), 0u) << served.Base();
     fs::create_directories(mFiles / "notes");
     WriteFileBytes(mFiles / "notes" / "a.txt", "over TLS");
     const std::vector<std::string> sync = {
-        "--server", served.ApiUrl(), "--token",
-        kToken,     "--pref-dir",    (mFiles / "prefs").string(),
-        "sync",     "--dir",         "path=" + (mFiles / "notes").string() + ",group=Notes,ext=.txt"};
+        "--server",  served.ApiUrl(), "--token",
+        "tls-token", "--pref-dir",    (mFiles / "prefs").string(),
+        "sync",      "--dir",         "path=" + (mFiles / "notes").string() + ",group=Notes,ext=.txt"};
 
     const clitest::Finished refused = clitest::RunCli(sync);
     EXPECT_EQ(refused.mStatus, 1) << refused.mOut << refused.mErr;
@@ -137,24 +106,12 @@ TEST_F(TlsService, CommandSyncsWithServeOverHttpsOnlyWhenItTrustsTheCa)
     const clitest::Finished fromEnvironment = clitest::RunCli(sync, {"TOLMONETSYNC_CA_FILE=" + Certificate().string()});
     EXPECT_EQ(fromEnvironment.mStatus, 0) << fromEnvironment.mOut << fromEnvironment.mErr;
     EXPECT_EQ(served.Stop(), 0);
-}
-
-TEST_F(TlsService, ServeAndCaFileRefuseWhatTheyCannotUse)
-{
-    const clitest::Finished keyless =
-        clitest::RunCli({"serve", "--data", mFiles.Path().string(), "--cert", Certificate().string()});
-    EXPECT_EQ(keyless.mStatus, 2);
-    EXPECT_NE(keyless.mErr.find("--cert and --key go together"), std::string::npos) << keyless.mErr;
 
     WriteFileBytes(mFiles / "garbage.pem", "not a certificate");
     const clitest::Finished unreadable = clitest::RunCli({"serve", "--data", (mFiles / "data").string(), "--cert",
                                                           (mFiles / "garbage.pem").string(), "--key", Key().string()});
     EXPECT_EQ(unreadable.mStatus, 1);
     EXPECT_NE(unreadable.mErr.find("cannot serve HTTPS"), std::string::npos) << unreadable.mErr;
-
-    const clitest::Finished missingCa = clitest::RunCli({"--ca-file", (mFiles / "missing.pem").string(), "status"});
-    EXPECT_EQ(missingCa.mStatus, 2);
-    EXPECT_NE(missingCa.mErr.find("--ca-file: no such file"), std::string::npos) << missingCa.mErr;
 }
 
 }  // namespace
