@@ -28,16 +28,6 @@ const int kFiles = 200;
 const int kRounds = 3;
 const int kChanges = 20;  // and a quarter as many additions and deletions
 
-std::string User(int user)
-{
-    return "user" + std::to_string(user);
-}
-
-std::string Token(int user)
-{
-    return "load-token-" + std::to_string(user);
-}
-
 // The files of a folder by name.
 Contents Folder(const fs::path& folder)
 {
@@ -51,7 +41,8 @@ class ServiceLoad : public ::testing::Test {
 protected:
     ServiceLoad()
         : mService([](tolmonetsync::server::LocalServiceOptions& options) {
-              for (int user = 0; user < kUsers; ++user) options.mTokens.push_back({User(user), Token(user)});
+              for (int user = 0; user < kUsers; ++user)
+                  options.mTokens.push_back({"user" + std::to_string(user), "token-" + std::to_string(user)});
           })
     {
         tolmonetsync::server::FaultRule counter;  // counts every request, never fires
@@ -60,8 +51,8 @@ protected:
         mCounter = mService->Faults().Install(counter);
     }
 
-    // Computer `computer` ("first" or "second") of every user's folder.
-    fs::path FolderOf(int user, const std::string& computer) const
+    // The user's folder on their first or second computer.
+    fs::path FolderOf(int user, const std::string& computer = "first") const
     {
         return mRoot / (computer + "-folder" + std::to_string(user));
     }
@@ -73,17 +64,17 @@ protected:
         const auto start = std::chrono::steady_clock::now();
         std::vector<pid_t> running;
         for (int user = 0; user < kUsers; ++user) {
-            const fs::path folder = FolderOf(user, computer);
-            const fs::path pref = mRoot / (computer + "-pref" + std::to_string(user));
-            fs::create_directories(folder);
+            const std::string pref = (mRoot / (computer + "-pref" + std::to_string(user))).string();
+            fs::create_directories(FolderOf(user, computer));
             running.push_back(clitest::StartCli(
-                {"--server", mService->AssetServiceUrl(), "--token", Token(user), "--pref-dir", pref.string(), "-q",
-                 "sync", "--dir", "path=" + folder.string() + ",group=Load,ext=.txt"},
-                "/dev/null", (mRoot / ("err" + std::to_string(user))).string()));
+                {"--server", mService->AssetServiceUrl(), "--token", "token-" + std::to_string(user), "--pref-dir",
+                 pref, "-q", "sync", "--dir", "path=" + FolderOf(user, computer).string() + ",group=Load,ext=.txt"},
+                "/dev/null", pref + ".err"));
         }
         for (int user = 0; user < kUsers; ++user)
             EXPECT_EQ(clitest::WaitCli(running[user]), 0)
-                << what << ": " << User(user) << " failed: " << ReadFileBytes(mRoot / ("err" + std::to_string(user)));
+                << what << ": user " << user
+                << " failed: " << ReadFileBytes(mRoot / (computer + "-pref" + std::to_string(user) + ".err"));
         const double seconds = std::chrono::duration<double>(std::chrono::steady_clock::now() - start).count();
         const int requests = mCounter->Seen() - requestsBefore;
         std::printf("%-34s %6d requests in %6.2f s: %7.0f requests/s\n", what.c_str(), requests, seconds,
@@ -93,7 +84,7 @@ protected:
     // The user's group on the service, as the command's defaults name it.
     Contents ServerContents(int user)
     {
-        tolmonetsync::server::TreeSeeder seed(*mService, User(user));
+        tolmonetsync::server::TreeSeeder seed(*mService, "user" + std::to_string(user));
         const std::string root = seed.Find(seed.ClientRoot("tolmonetsync"), "Tolmonet_tolmonetsync_1.0");
         const std::string group = root.empty() ? std::string() : seed.Find(root, "Load");
         return group.empty() ? Contents() : seed.Contents(group);
@@ -107,43 +98,40 @@ protected:
 TEST_F(ServiceLoad, SixteenUsersSyncTheirOwnFoldersAtOnceRoundAfterRoundAndLoseNothing)
 {
     std::vector<Contents> expected(kUsers);
-    for (int user = 0; user < kUsers; ++user) {
-        fs::create_directories(FolderOf(user, "first"));
-        for (int i = 0; i < kFiles; ++i)
-            WriteFileBytes(FolderOf(user, "first") / ("note" + std::to_string(1000 + i) + ".txt"),
-                           User(user) + " first " + std::to_string(i) + "\n");
-        expected[user] = Folder(FolderOf(user, "first"));
-    }
     for (int round = 0; round <= kRounds; ++round) {
-        for (int user = 0; round > 0 && user < kUsers; ++user) {
-            const fs::path folder = FolderOf(user, "first");
+        for (int user = 0; user < kUsers; ++user) {
+            const fs::path folder = FolderOf(user);
+            const std::string stamp = "user " + std::to_string(user) + " round " + std::to_string(round) + " ";
+            fs::create_directories(folder);
             std::vector<fs::path> files;
+            for (int i = 0; i < kFiles && round == 0; ++i)
+                WriteFileBytes(folder / ("note" + std::to_string(1000 + i) + ".txt"), stamp + std::to_string(i));
             for (const fs::directory_entry& entry : fs::directory_iterator(folder)) files.push_back(entry.path());
             std::sort(files.begin(), files.end());
             // Different files each round and for each user.
             const std::size_t offset = (round * 37 + user * 11) % files.size();
-            const std::string stamp = User(user) + " round " + std::to_string(round);
-            for (int k = 0; k < kChanges; ++k)
-                WriteFileBytes(files[(offset + k) % files.size()], stamp + " change " + std::to_string(k) + "\n");
-            for (int k = 0; k < kChanges / 4; ++k)
+            for (int k = 0; k < kChanges && round > 0; ++k)
+                WriteFileBytes(files[(offset + k) % files.size()], stamp + "change " + std::to_string(k));
+            for (int k = 0; k < kChanges / 4 && round > 0; ++k)
                 WriteFileBytes(folder / ("added-" + std::to_string(round) + "-" + std::to_string(k) + ".txt"), stamp);
             expected[user] = Folder(folder);
             // In two-way mode a file deleted here comes back from the service.
-            for (int k = 0; k < kChanges / 4; ++k) fs::remove(files[(offset + kChanges + k) % files.size()]);
+            for (int k = 0; k < kChanges / 4 && round > 0; ++k)
+                fs::remove(files[(offset + kChanges + k) % files.size()]);
         }
         const std::string what = round == 0 ? "first upload" : "round " + std::to_string(round);
         SyncAll("first", what + ", 16 x 200 files");
         // Compared whole, not printed: two hundred files each.
         for (int user = 0; user < kUsers; ++user) {
-            EXPECT_TRUE(Folder(FolderOf(user, "first")) == expected[user]) << what << ": " << User(user) << "'s folder";
-            EXPECT_TRUE(ServerContents(user) == expected[user]) << what << ": " << User(user) << "'s group";
+            EXPECT_TRUE(Folder(FolderOf(user)) == expected[user]) << what << ": user " << user << "'s folder";
+            EXPECT_TRUE(ServerContents(user) == expected[user]) << what << ": user " << user << "'s group";
         }
         if (HasFailure()) return;
     }
     // A second computer of every user, with nothing yet, brings the folder back.
     SyncAll("second", "second computers, 16 x 200 files");
     for (int user = 0; user < kUsers; ++user)
-        EXPECT_TRUE(Folder(FolderOf(user, "second")) == expected[user]) << User(user) << "'s second computer";
+        EXPECT_TRUE(Folder(FolderOf(user, "second")) == expected[user]) << "user " << user << "'s second computer";
 }
 
 }  // namespace

@@ -48,24 +48,13 @@ protected:
     // The command as the stage's host and client, on its Keep folder.
     std::vector<std::string> SyncArguments()
     {
-        return {"--server",
-                mStage.Service().AssetServiceUrl(),
-                "--token",
-                testsupport::kAliceToken,
-                "--client-id",
-                mStage.ClientId(),
-                "--company",
-                "Co",
-                "--app",
-                "Matrix",
-                "--app-version",
-                "1.0",
-                "--pref-dir",
-                mStage.PrefDir().string(),
-                "-q",
-                "sync",
-                "--dir",
-                "path=" + mStage.Keep().string() + ",group=Keep,ext=.txt"};
+        const std::string server = mStage.Service().AssetServiceUrl(), pref = mStage.PrefDir().string();
+        const std::string keep = "path=" + mStage.Keep().string() + ",group=Keep,ext=.txt";
+        return {"--server",      server, "--token",     testsupport::kAliceToken,
+                "--pref-dir",    pref,   "--client-id", mStage.ClientId(),
+                "--company",     "Co",   "--app",       "Matrix",
+                "--app-version", "1.0",  "-q",          "sync",
+                "--dir",         keep};
     }
 
     // Starts a sync and kills it once the service has seen `requests` more

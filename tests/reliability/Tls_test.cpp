@@ -1,51 +1,47 @@
 // HTTPS on loopback: the local service serves with a certificate made by the
-// test, and a client trusts it only when given its CA, through a processor's
-// settings or, for the command, --ca-file or TOLMONETSYNC_CA_FILE. Refused,
-// a request gets no answer (-100) with a text a person can read, and never
-// reaches the service.
+// test, and the command trusts it only when given its CA, by --ca-file or
+// TOLMONETSYNC_CA_FILE. Refused, a sync fails with one line a person can
+// read, and no request reaches the service; nor does plain HTTP on its port.
 
 #include <gtest/gtest.h>
 
+#include <algorithm>
 #include <climits>
 
 #include "SelfSignedCertificate.h"
-#include "foundation/net/CurlRequestProcessor.h"
 #include "support/CliProcess.h"
-#include "support/ResponseRecorder.h"
 #include "support/TestService.h"
 
 namespace {
 
 namespace fs = std::filesystem;
-using namespace tolmonet;
-using namespace tolmonet::http;
+using clitest::Contains;
+using clitest::Finished;
+using clitest::RunCli;
 using testsupport::WriteFileBytes;
 
 class Tls : public ::testing::Test {
 protected:
-    Tls() { reliability::WriteSelfSignedCertificate(Certificate(), Key()); }
+    Tls()
+    {
+        reliability::WriteSelfSignedCertificate(Certificate(), Key());
+        fs::create_directories(mFiles / "notes");
+        WriteFileBytes(mFiles / "notes" / "a.txt", "over TLS");
+    }
 
     fs::path Certificate() const { return mFiles / "cert.pem"; }
     fs::path Key() const { return mFiles / "key.pem"; }
-
-    // The answer to a signed-in GET of a client root under `base` through `processor`.
-    static boost::shared_ptr<Response> GetRoot(RequestProcessor& processor, const std::string& base)
+    std::vector<std::string> Sync(const std::string& apiUrl, const std::string& token) const
     {
-        testsupport::ResponseRecorder recorder(processor);
-        HeaderList headers;
-        headers.emplace(ImmutableString::CreateStatic("Authorization"),
-                        ImmutableString::CreateDynamic(std::string("Bearer ") + testsupport::kAliceToken));
-        EXPECT_TRUE(processor.GET(Guid::CreateUnique(), recorder.Handler(),
-                                  ImmutableString::CreateDynamic(base + "/collections?name=tls"), headers,
-                                  Configuration()));
-        if (!recorder.WaitFor(1)) return boost::shared_ptr<Response>();
-        return recorder.Responses().at(0).mResponse;
+        return {"--server", apiUrl,       "--token",
+                token,      "--pref-dir", (mFiles / "prefs").string(),
+                "sync",     "--dir",      "path=" + (mFiles / "notes").string() + ",group=Notes,ext=.txt"};
     }
 
     testsupport::TempDir mFiles;
 };
 
-TEST_F(Tls, OnlyAClientThatTrustsTheCaIsAnswered)
+TEST_F(Tls, CommandIsAnsweredOnlyOverHttpsAndOnlyWhenItTrustsTheCa)
 {
     testsupport::TestService service([&](tolmonetsync::server::LocalServiceOptions& options) {
         options.mCertificateFile = Certificate().string();
@@ -58,60 +54,40 @@ TEST_F(Tls, OnlyAClientThatTrustsTheCaIsAnswered)
     const std::string https = service->AssetServiceUrl();
     ASSERT_EQ(https.rfind("https://127.0.0.1:", 0), 0u) << https;
     EXPECT_EQ(service->IdentityServiceUrl().rfind("https://127.0.0.1:", 0), 0u);
+    const std::vector<std::string> sync = Sync(https, testsupport::kAliceToken);
 
-    CurlRequestProcessor systemStoreOnly;
-    const boost::shared_ptr<Response> refused = GetRoot(systemStoreOnly, https);
-    ASSERT_TRUE(refused != nullptr) << "no handler call";
-    EXPECT_EQ(refused->status, kStatusNoResponse);
-    const std::string text = refused->BodyText().ToStdString();
-    EXPECT_NE(text.find("certificate"), std::string::npos) << text;
-    EXPECT_EQ(text.find_first_of("\r\n"), std::string::npos) << text;
-
-    const boost::shared_ptr<Response> plain = GetRoot(systemStoreOnly, "http" + https.substr(5));
-    ASSERT_TRUE(plain != nullptr) << "no handler call";
-    EXPECT_LE(plain->status, 0);
+    const Finished refused = RunCli(sync);
+    EXPECT_EQ(refused.mStatus, 1) << refused.mErr;
+    EXPECT_TRUE(Contains(refused.mErr, "certificate")) << refused.mErr;
+    EXPECT_EQ(std::count(refused.mErr.begin(), refused.mErr.end(), '\n'), 2) << refused.mErr;  // and the warning
+    EXPECT_EQ(RunCli(Sync("http" + https.substr(5), testsupport::kAliceToken)).mStatus, 1);
     EXPECT_EQ(reached->Seen(), 0);
 
-    CurlProcessorSettings settings;
-    settings.mCAFile = Certificate().string();
-    CurlRequestProcessor trusting(settings);
-    const boost::shared_ptr<Response> answered = GetRoot(trusting, https);
-    ASSERT_TRUE(answered != nullptr) << "no handler call";
-    EXPECT_EQ(answered->status, 200) << answered->BodyText().ToStdString();
-    EXPECT_EQ(reached->Seen(), 1);
+    std::vector<std::string> trusting = {"--ca-file", Certificate().string()};
+    trusting.insert(trusting.end(), sync.begin(), sync.end());
+    const Finished accepted = RunCli(trusting);
+    EXPECT_EQ(accepted.mStatus, 0) << accepted.mOut << accepted.mErr;
+    EXPECT_TRUE(Contains(accepted.mOut, "Notes/a.txt")) << accepted.mOut;
+    EXPECT_GT(reached->Seen(), 0);
+    const Finished fromEnvironment = RunCli(sync, {"TOLMONETSYNC_CA_FILE=" + Certificate().string()});
+    EXPECT_EQ(fromEnvironment.mStatus, 0) << fromEnvironment.mOut << fromEnvironment.mErr;
 }
 
-TEST_F(Tls, CommandSyncsWithServeOverHttpsOnlyWhenItTrustsTheCaAndServeNeedsAUsableOne)
+TEST_F(Tls, ServeServesHttpsOnlyWithAUsableCertificate)
 {
     clitest::ServedService served(mFiles / "served", "tls-token",
                                   {"--cert", Certificate().string(), "--key", Key().string()});
     ASSERT_EQ(served.Base().rfind("https://127.0.0.1:", 0), 0u) << served.Base();
-    fs::create_directories(mFiles / "notes");
-    WriteFileBytes(mFiles / "notes" / "a.txt", "over TLS");
-    const std::vector<std::string> sync = {
-        "--server",  served.ApiUrl(), "--token",
-        "tls-token", "--pref-dir",    (mFiles / "prefs").string(),
-        "sync",      "--dir",         "path=" + (mFiles / "notes").string() + ",group=Notes,ext=.txt"};
-
-    const clitest::Finished refused = clitest::RunCli(sync);
-    EXPECT_EQ(refused.mStatus, 1) << refused.mOut << refused.mErr;
-    EXPECT_NE(refused.mErr.find("certificate"), std::string::npos) << refused.mErr;
-
-    std::vector<std::string> trusting = {"--ca-file", Certificate().string()};
-    trusting.insert(trusting.end(), sync.begin(), sync.end());
-    const clitest::Finished accepted = clitest::RunCli(trusting);
+    const Finished accepted =
+        RunCli(Sync(served.ApiUrl(), "tls-token"), {"TOLMONETSYNC_CA_FILE=" + Certificate().string()});
     EXPECT_EQ(accepted.mStatus, 0) << accepted.mOut << accepted.mErr;
-    EXPECT_NE(accepted.mOut.find("Notes/a.txt"), std::string::npos) << accepted.mOut;
-
-    const clitest::Finished fromEnvironment = clitest::RunCli(sync, {"TOLMONETSYNC_CA_FILE=" + Certificate().string()});
-    EXPECT_EQ(fromEnvironment.mStatus, 0) << fromEnvironment.mOut << fromEnvironment.mErr;
     EXPECT_EQ(served.Stop(), 0);
 
     WriteFileBytes(mFiles / "garbage.pem", "not a certificate");
-    const clitest::Finished unreadable = clitest::RunCli({"serve", "--data", (mFiles / "data").string(), "--cert",
-                                                          (mFiles / "garbage.pem").string(), "--key", Key().string()});
+    const Finished unreadable = RunCli({"serve", "--data", (mFiles / "data").string(), "--cert",
+                                        (mFiles / "garbage.pem").string(), "--key", Key().string()});
     EXPECT_EQ(unreadable.mStatus, 1);
-    EXPECT_NE(unreadable.mErr.find("cannot serve HTTPS"), std::string::npos) << unreadable.mErr;
+    EXPECT_TRUE(Contains(unreadable.mErr, "cannot serve HTTPS")) << unreadable.mErr;
 }
 
 }  // namespace
