@@ -40,8 +40,6 @@ public:
     // Stopping a service waits for its kept-alive connections to idle out (a
     // second), so a test that stages many runs shares one.
     Stage(testsupport::TestService& service, const std::string& clientId);
-    Stage(const Stage&) = delete;
-    Stage& operator=(const Stage&) = delete;
 
     // A whole two-way sync of Keep (and Fresh if asked) by a new host and client.
     synctest::RunResult Sync(bool withFresh);
