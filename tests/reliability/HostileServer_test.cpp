@@ -9,14 +9,19 @@
 
 #include <gtest/gtest.h>
 
+#include <httplib.h>
+
+#include <algorithm>
+#include <atomic>
+#include <cctype>
 #include <functional>
 #include <ostream>
 #include <regex>
 #include <set>
 
 #include "ServiceStage.h"
-#include "TamperingProxy.h"
 #include "server/AssetRecord.h"
+#include "support/LoopbackHttpServer.h"
 
 namespace {
 
@@ -25,6 +30,73 @@ using namespace reliability;
 using synctest::RunResult;
 using testsupport::ReadFileBytes;
 using testsupport::WriteFileBytes;
+
+std::string Lower(std::string text)
+{
+    std::transform(text.begin(), text.end(), text.begin(), [](unsigned char c) { return std::tolower(c); });
+    return text;
+}
+
+// Framing and the Host header are each hop's own business.
+bool HopByHop(const std::string& header)
+{
+    const std::string name = Lower(header);
+    return name == "content-length" || name == "transfer-encoding" || name == "connection" || name == "keep-alive" ||
+           name == "host";
+}
+
+// A hostile server made of a well-behaved one: a loopback HTTP server that
+// passes every request on to the local service and lets the test rewrite each
+// JSON answer before the client sees it (the bytes of a download pass
+// untouched). The rewrite runs on the proxy's connection threads.
+class TamperingProxy {
+public:
+    // Gives the JSON body the client is to see instead of `body`.
+    using Rewrite = std::function<std::string(const std::string& body)>;
+
+    TamperingProxy(int servicePort, Rewrite rewrite)
+        : mServicePort(servicePort),
+          mRewrite(std::move(rewrite)),
+          mServer([this](const testsupport::HttpRequest& request) { return Forward(request); })
+    {
+    }
+
+    // "http://127.0.0.1:PORT/api", the base URL for the client.
+    std::string ApiUrl() const { return mServer.Url("/api"); }
+    // Answers the rewrite changed so far: none means the case never met the client.
+    int Changed() const { return mChanged.load(); }
+
+private:
+    testsupport::HttpAnswer Forward(const testsupport::HttpRequest& request) const
+    {
+        httplib::Client service("127.0.0.1", mServicePort);
+        service.set_url_encode(false);  // the target goes on exactly as the client sent it
+        httplib::Request passed;
+        passed.method = request.mMethod;
+        passed.path = request.mTarget;
+        passed.body = request.mBody;
+        for (const auto& header : request.mHeaders)
+            if (!HopByHop(header.first)) passed.headers.emplace(header.first, header.second);
+        testsupport::HttpAnswer answer;
+        const httplib::Result result = service.send(passed);
+        answer.mStatus = result ? result->status : 502;
+        if (!result) return answer;
+        bool json = false;
+        for (const auto& header : result->headers) {
+            if (HopByHop(header.first)) continue;
+            json = json || (Lower(header.first) == "content-type" && header.second.find("json") != std::string::npos);
+            answer.mHeaders.emplace_back(header.first, header.second);
+        }
+        answer.mBody = json ? mRewrite(result->body) : result->body;
+        if (answer.mBody != result->body) ++mChanged;
+        return answer;
+    }
+
+    const int mServicePort;
+    const Rewrite mRewrite;
+    mutable std::atomic<int> mChanged{0};
+    testsupport::LoopbackHttpServer mServer;  // last: its threads use the above
+};
 
 struct Ids {
     std::string mKeep;   // the group's collection
