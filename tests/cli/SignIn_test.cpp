@@ -1,31 +1,23 @@
-// login, status, a sync on the stored sign-in, a restart, and logout, as processes.
+// login, status, a sync on the stored sign-in, and logout, as processes, traced.
 
 #include <gtest/gtest.h>
 
-#include <sys/stat.h>
-
-#include <memory>
 #include <regex>
 
-#include "CliProcess.h"
 #include "foundation/core/KeychainStoreFormat.h"
+#include "support/CliProcess.h"
 #include "support/TempDir.h"
 
 namespace {
 
+using clitest::Contains;
 using clitest::Finished;
 using clitest::RunCli;
 namespace fs = std::filesystem;
 
 unsigned ModeOf(const fs::path& path)
 {
-    struct stat info;
-    return ::stat(path.c_str(), &info) == 0 ? info.st_mode & 07777 : ~0u;
-}
-
-bool Contains(const std::string& text, const std::string& part)
-{
-    return text.find(part) != std::string::npos;
+    return static_cast<unsigned>(fs::status(path).permissions());
 }
 
 // Every value the keychain store of `pref` holds.
@@ -50,72 +42,24 @@ std::vector<std::string> TracedSecretValues(const std::string& trace)
     return values;
 }
 
-TEST(SignInCommands, LoginStatusSyncRestartSyncLogoutCycle)
+TEST(SignInCommands, LoginStatusSyncLogoutCycleKeepsItsFilesPrivateAndTracesNoSecret)
 {
     testsupport::TempDir root;
-    auto service = std::make_unique<clitest::ServedService>(root / "service", "unused-token");
-    std::filesystem::create_directories(root / "folder");
+    const std::string password = "Pw@7q/x";  // goes out percent-encoded as Pw%407q%2fx
+    const clitest::ServedService service(root / "service", "unused-token", {"--user", "bob:" + password});
+    fs::create_directories(root / "folder");
     testsupport::WriteFileBytes(root / "folder" / "a.txt", "a");
-    auto run = [&](std::vector<std::string> arguments, const std::vector<std::string>& environment = {}) {
-        const std::vector<std::string> where = {"--server",          service->ApiUrl(),
-                                                "--identity-server", service->Base() + "/ovra",
-                                                "--pref-dir",        (root / "pref").string()};
+    const auto run = [&](std::vector<std::string> arguments, const std::vector<std::string>& environment = {}) {
+        const std::vector<std::string> where = {
+            "--server",   service.ApiUrl(),         "--identity-server", service.Base() + "/ovra",
+            "--pref-dir", (root / "pref").string(), "--trace",           "8"};
         arguments.insert(arguments.begin(), where.begin(), where.end());
         return RunCli(arguments, environment);
     };
     const std::vector<std::string> sync = {"sync", "-q", "--dir",
                                            "path=" + (root / "folder").string() + ",group=G,ext=.txt"};
-
-    EXPECT_EQ(run({"status"}).mOut, "not-logged-in\n");
-    const Finished unsigned_ = run(sync);
-    EXPECT_EQ(unsigned_.mStatus, 1);
-    EXPECT_NE(unsigned_.mErr.find("not signed in"), std::string::npos) << unsigned_.mErr;
-
-    const Finished wrong = run({"login", "--user", "ann"}, {"TOLMONETSYNC_PASSWORD=wrong"});
-    EXPECT_EQ(wrong.mStatus, 1);
-    EXPECT_NE(wrong.mErr.find("Authentication failed"), std::string::npos) << wrong.mErr;
-    EXPECT_EQ(run({"login", "--user", "ann", "--password", "secret"}).mStatus, 2);  // never from an argument
-
-    const Finished login = run({"login", "--user", "ann"}, {"TOLMONETSYNC_PASSWORD=secret"});
-    ASSERT_EQ(login.mStatus, 0) << login.mErr;
-    // The command made the preference directory, and what it stores there is private.
-    EXPECT_EQ(ModeOf(root / "pref"), 0700u);
-    EXPECT_EQ(ModeOf(root / "pref" / "tarnvaultuser.txt"), 0600u);
-    EXPECT_EQ(ModeOf(root / "pref" / "keychain.store"), 0600u);
-    const Finished connected = run({"status"});
-    EXPECT_EQ(connected.mStatus, 0);
-    EXPECT_EQ(connected.mOut, "connected\n");
-    const Finished synced = run(sync);
-    EXPECT_EQ(synced.mStatus, 0) << synced.mErr;
-    EXPECT_EQ(ModeOf(root / "pref" / "tolmonetsynccache.json"), 0600u);
-    EXPECT_EQ(ModeOf(root / "pref" / "SyncBackup"), 0700u);
-
-    // Every command is a new process; the service restarts too, on its data.
-    service.reset();
-    service = std::make_unique<clitest::ServedService>(root / "service", "unused-token");
-    EXPECT_EQ(run({"status"}).mOut, "connected\n");
-    const Finished again = run(sync);
-    EXPECT_EQ(again.mStatus, 0) << again.mErr;
-
-    EXPECT_EQ(run({"logout"}).mStatus, 0);
-    const Finished after = run({"status"});
-    EXPECT_EQ(after.mStatus, 1);
-    EXPECT_EQ(after.mOut, "not-logged-in\n");
-}
-
-TEST(SignInCommands, TracingShowsNeitherThePasswordNorAnyTokenAndLogoutClearsTheKeychain)
-{
-    testsupport::TempDir root;
-    const std::string password = "Pw@7q/x";  // goes out percent-encoded as Pw%407q%2fx
-    clitest::ServedService service(root / "service", "unused-token", {"--user", "bob:" + password});
-    const std::vector<std::string> where = {
-        "--server",   service.ApiUrl(),         "--identity-server", service.Base() + "/ovra",
-        "--pref-dir", (root / "pref").string(), "--trace",           "8"};
-    const auto run = [&](std::vector<std::string> arguments, const std::vector<std::string>& environment) {
-        arguments.insert(arguments.begin(), where.begin(), where.end());
-        return RunCli(arguments, environment);
-    };
-    const auto expectNoSecret = [&](const std::string& trace, const std::vector<std::string>& known) {
+    std::vector<std::string> known = {password, "Pw%407q%2fx"};
+    const auto expectNoSecret = [&](const std::string& trace) {
         EXPECT_TRUE(Contains(trace, "Authenticate, url: ")) << "nothing traced: " << trace;
         EXPECT_TRUE(Contains(trace, "&password=***&")) << trace;
         for (const std::string& secret : known) EXPECT_FALSE(Contains(trace, secret)) << secret << " in " << trace;
@@ -126,23 +70,45 @@ TEST(SignInCommands, TracingShowsNeitherThePasswordNorAnyTokenAndLogoutClearsThe
         EXPECT_FALSE(Contains(trace, "Bearer ")) << trace;
     };
 
+    EXPECT_EQ(run({"status"}).mOut, "not-logged-in\n");
+    const Finished unsigned_ = run(sync);
+    EXPECT_EQ(unsigned_.mStatus, 1);
+    EXPECT_TRUE(Contains(unsigned_.mErr, "not signed in")) << unsigned_.mErr;
+    EXPECT_FALSE(fs::exists(root / "pref" / "tolmonetsynccache.json"));
+    const Finished wrong = run({"login", "--user", "bob"}, {"TOLMONETSYNC_PASSWORD=wrong"});
+    EXPECT_EQ(wrong.mStatus, 1);
+    EXPECT_TRUE(Contains(wrong.mErr, "Authentication failed")) << wrong.mErr;
+
     const Finished login = run({"login", "--user", "bob"}, {"TOLMONETSYNC_PASSWORD=" + password});
     ASSERT_EQ(login.mStatus, 0) << login.mErr;
-    std::vector<std::string> known = StoredSecrets(root / "pref");
-    ASSERT_EQ(known.size(), 3u);  // the access, refresh and device tokens
-    known.push_back(password);
-    known.push_back("Pw%407q%2fx");
-    expectNoSecret(login.mErr, known);
+    // The command made the preference directory, and what it stores there is private.
+    EXPECT_EQ(ModeOf(root / "pref"), 0700u);
+    EXPECT_EQ(ModeOf(root / "pref" / "tarnvaultuser.txt"), 0600u);
+    EXPECT_EQ(ModeOf(root / "pref" / "keychain.store"), 0600u);
+    const std::vector<std::string> stored = StoredSecrets(root / "pref");
+    ASSERT_EQ(stored.size(), 3u);  // the access, refresh and device tokens
+    known.insert(known.end(), stored.begin(), stored.end());
+    expectNoSecret(login.mErr);
 
-    const Finished autoLogin =
-        run({"--auto-login", "sync", "-q", "--dir", "path=" + root.Path().string() + ",group=G,ext=.none"},
-            {"TOLMONETSYNC_USERNAME=bob", "TOLMONETSYNC_PASSWORD=" + password});
+    const Finished connected = run({"status"});
+    EXPECT_EQ(connected.mStatus, 0);
+    EXPECT_EQ(connected.mOut, "connected\n");
+    const Finished synced = run(sync);
+    EXPECT_EQ(synced.mStatus, 0) << synced.mErr;
+    EXPECT_EQ(ModeOf(root / "pref" / "tolmonetsynccache.json"), 0600u);
+    EXPECT_EQ(ModeOf(root / "pref" / "SyncBackup"), 0700u);
+    std::vector<std::string> autoLoginSync = sync;
+    autoLoginSync.insert(autoLoginSync.begin(), "--auto-login");
+    const Finished autoLogin = run(autoLoginSync, {"TOLMONETSYNC_USERNAME=bob", "TOLMONETSYNC_PASSWORD=" + password});
     ASSERT_EQ(autoLogin.mStatus, 0) << autoLogin.mErr;
-    expectNoSecret(autoLogin.mErr, known);
+    expectNoSecret(autoLogin.mErr);
 
     // The access and refresh tokens go with the sign-in, and the device token too.
-    ASSERT_EQ(run({"logout"}, {}).mStatus, 0);
+    EXPECT_EQ(run({"logout"}).mStatus, 0);
     EXPECT_TRUE(StoredSecrets(root / "pref").empty());
+    const Finished after = run({"status"});
+    EXPECT_EQ(after.mStatus, 1);
+    EXPECT_EQ(after.mOut, "not-logged-in\n");
 }
 
 TEST(SignInCommands, APreferenceDirectoryOthersCanWriteIsRefusedUnlessAllowed)

@@ -14,7 +14,7 @@
 #include <sstream>
 
 #include "DecisionModel.h"
-#include "SyncHarness.h"
+#include "support/SyncHarness.h"
 #include "foundation/net/HeaderConstants.h"
 #include "server/Accounts.h"
 #include "server/AssetStore.h"

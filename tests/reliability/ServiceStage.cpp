@@ -14,26 +14,24 @@ namespace reliability {
 namespace fs = std::filesystem;
 using namespace tolmonetsync;
 using namespace tolmonetsync::server;
-using synctest::RunResult;
-using synctest::SyncHarness;
 using testsupport::ReadFileBytes;
+using testsupport::TestService;
 using testsupport::WriteFileBytes;
 
 namespace {
 
-const char kClient[] = "matrix";
 const char kRootName[] = "Co_Matrix_1.0";
-
-UTF8String Text(const char* text)
-{
-    return UTF8String(reinterpret_cast<const unsigned char*>(text));
-}
 
 SyncDir Registered(const fs::path& path, const char* group)
 {
     return SyncDir(tolmocore::filesupport::Dir(tolmocore::utility::ToUTF16(path.string())), u".txt",
                    tolmocore::utility::ToUTF16(group), ImmutableString::CreateStatic("text/plain"),
                    SyncMetadata_ModDate, 1 << 20);
+}
+
+UTF8String Utf8(const std::string& text)
+{
+    return UTF8String(text.begin(), text.end());
 }
 
 }  // namespace
@@ -51,51 +49,29 @@ void RestoreTimeouts()
     tolmonet::http::CurlRequestProcessor::SetProcessWideTimeouts(std::chrono::seconds(30), std::chrono::seconds(60));
 }
 
-std::unique_ptr<LocalService> StartStageService(const fs::path& dataDirectory)
+Stage::Stage() : Stage(std::make_unique<TestService>(), nullptr, "matrix") {}
+
+Stage::Stage(TestService& service, const std::string& clientId) : Stage(nullptr, &service, clientId) {}
+
+Stage::Stage(std::unique_ptr<TestService> own, TestService* shared, const std::string& clientId)
+    : mKeep(mRoot / "Keep"),
+      mFresh(mRoot / "Fresh"),
+      mClient(clientId),
+      mOwnService(std::move(own)),
+      mService(shared ? &**shared : &**mOwnService),
+      mSeed(*mService, "alice")
 {
-    LocalServiceOptions options;
-    options.mDataDirectory = dataDirectory.string();
-    options.mTokens.push_back({"matrix", "tok"});
-    std::unique_ptr<LocalService> service(new LocalService(options));
-    service->Start();
-    return service;
-}
-
-Stage::Stage() : Stage(nullptr, kClient) {}
-
-Stage::Stage(LocalService& service, const std::string& clientId) : Stage(&service, clientId) {}
-
-Stage::Stage(LocalService* service, const std::string& clientId)
-    : mKeep(mRoot / "Keep"), mFresh(mRoot / "Fresh"), mClient(clientId)
-{
-    if (!service) {
-        mOwnService = StartStageService(mRoot / "service");
-        service = mOwnService.get();
-    }
-    mService = service;
-    mSeed.reset(new TreeSeeder(*mService, "matrix"));
     fs::create_directories(mKeep);
     fs::create_directories(mFresh);
 }
 
-Stage::~Stage()
-{
-    if (mOwnService) mOwnService->Stop();
-}
-
-boost::shared_ptr<SyncServer> Stage::Client()
+synctest::RunResult Stage::Sync(bool withFresh)
 {
     ParameterList parameters;
-    const std::string url = mApiUrl.empty() ? mService->AssetServiceUrl() : mApiUrl;
-    parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(url.begin(), url.end()));
-    parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, UTF8String(mClient.begin(), mClient.end()));
-    parameters.emplace_back(tolmonet::kHEADER_COOKIE, Text("tok"));
-    return boost::shared_ptr<SyncServer>(new tarnvault::Tarnvault(parameters));
-}
-
-RunResult Stage::Sync(bool withFresh)
-{
-    SyncHarness host(Client());
+    parameters.emplace_back(tolmonet::kHEADER_LOCATION, Utf8(mApiUrl.empty() ? mService->AssetServiceUrl() : mApiUrl));
+    parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, Utf8(mClient));
+    parameters.emplace_back(tolmonet::kHEADER_COOKIE, Utf8(testsupport::kAliceToken));
+    synctest::SyncHarness host(boost::shared_ptr<SyncServer>(new tarnvault::Tarnvault(parameters)));
     host.Service().RegisterSyncDirectory(Registered(mKeep, "Keep"));
     if (withFresh) host.Service().RegisterSyncDirectory(Registered(mFresh, "Fresh"));
     return host.Sync(SyncMode_TwoWay);
@@ -115,20 +91,16 @@ void Stage::PrepareEveryRequestKind()
 
 void Stage::PutOnServer(const char* group, const std::string& name, const std::string& bytes)
 {
-    RemoveFromServer(group, name);
-    mService->Assets().Upload(Owner(), {GroupId(group)}, name, "text/plain", bytes);
-}
-
-void Stage::RemoveFromServer(const char* group, const std::string& name)
-{
-    for (const AssetRecord& member : mService->Assets().Members(Owner(), GroupId(group)))
-        if (member.mName == name) mService->Assets().Delete(Owner(), member.mId, false);
+    const std::int64_t owner = mService->GetAccounts().EnsureUser("alice");
+    for (const AssetRecord& member : mService->Assets().Members(owner, GroupId(group)))
+        if (member.mName == name) mService->Assets().Delete(owner, member.mId, false);
+    mSeed.Item(GroupId(group), name, bytes, "text/plain");
 }
 
 void Stage::AddStaleGroup()
 {
-    const std::string root = mSeed->Find(mSeed->ClientRoot(mClient), kRootName);
-    mSeed->Item(mSeed->Collection(root, "Stale"), "s.txt", "stale");
+    const std::string root = mSeed.Find(mSeed.ClientRoot(mClient), kRootName);
+    mSeed.Item(mSeed.Collection(root, "Stale"), "s.txt", "stale");
 }
 
 FileMap Stage::Local() const
@@ -147,11 +119,7 @@ FileMap Stage::Server()
     for (const char* group : {"Keep", "Fresh"}) {
         const std::string id = GroupId(group);
         if (id.empty()) continue;
-        for (const AssetRecord& member : mService->Assets().Members(Owner(), id)) {
-            AssetRecord record;
-            const std::string name = std::string(group) + "/" + member.mName;
-            if (!files.count(name)) files[name] = mService->Assets().Content(Owner(), member.mId, record);
-        }
+        for (const auto& item : mSeed.Contents(id)) files[std::string(group) + "/" + item.first] = item.second;
     }
     return files;
 }
@@ -182,15 +150,10 @@ std::string Stage::CacheFile() const
     return fs::exists(path) ? ReadFileBytes(path) : std::string("<none>");
 }
 
-std::int64_t Stage::Owner()
-{
-    return mService->GetAccounts().EnsureUser("matrix");
-}
-
 std::string Stage::GroupId(const char* group)
 {
-    const std::string root = mSeed->Find(mSeed->ClientRoot(mClient), kRootName);
-    return root.empty() ? std::string() : mSeed->Find(root, group);
+    const std::string root = mSeed.Find(mSeed.ClientRoot(mClient), kRootName);
+    return root.empty() ? std::string() : mSeed.Find(root, group);
 }
 
 void ExpectNothingLost(const FileMap& before, const FileMap& serverBefore, const FileMap& after, const FileMap& backups,

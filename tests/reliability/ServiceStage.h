@@ -3,10 +3,10 @@
 // "Fresh", staged for tests that fail a sync on the service's side; and the
 // check that such a failure lost nothing.
 //
-// The client signs in as the user "matrix" with a fixed token, under the
-// host identity UseStageHost() sets (the preferences root "Co_Matrix_1.0").
-// Every stage has its own preference directory and folders, removed with it,
-// and a service of its own or a client identifier of its own on a shared one.
+// The client signs in as the service's user "alice" under the host identity
+// UseStageHost() sets (the preferences root "Co_Matrix_1.0"). Every stage has
+// its own preference directory and folders, removed with it, and a service of
+// its own or a client identifier of its own on a shared one.
 //
 // Threads: the test's thread only; the service answers on its own threads.
 
@@ -16,11 +16,10 @@
 #include <set>
 #include <string>
 
-#include "support/SyncHarness.h"
-#include "server/LocalService.h"
 #include "server/TreeSeeder.h"
-#include "support/TempDir.h"
+#include "support/SyncHarness.h"
 #include "support/TestScopes.h"
+#include "support/TestService.h"
 
 namespace reliability {
 
@@ -33,24 +32,16 @@ using FileMap = std::map<std::string, std::string>;
 void UseStageHost();
 void RestoreTimeouts();
 
-// A running service for stages to share, keeping its data in `dataDirectory`.
-// Stopping one waits for its kept-alive connections to idle out (a second),
-// so a test that stages many runs shares one.
-std::unique_ptr<tolmonetsync::server::LocalService> StartStageService(const std::filesystem::path& dataDirectory);
-
 class Stage {
 public:
     // With a service of its own, as the client "matrix".
     Stage();
     // On `service`, which outlives the stage, as a client no other stage is.
-    Stage(tolmonetsync::server::LocalService& service, const std::string& clientId);
-    ~Stage();
-    Stage(const Stage&) = delete;
-    Stage& operator=(const Stage&) = delete;
+    // Stopping a service waits for its kept-alive connections to idle out (a
+    // second), so a test that stages many runs shares one.
+    Stage(testsupport::TestService& service, const std::string& clientId);
 
-    // A new client over the service, with nothing cached.
-    boost::shared_ptr<tolmonetsync::SyncServer> Client();
-    // A whole two-way sync of Keep (and Fresh if asked) by a new host.
+    // A whole two-way sync of Keep (and Fresh if asked) by a new host and client.
     synctest::RunResult Sync(bool withFresh);
 
     // A synced Keep group, then a change on each side, a stale group on the
@@ -60,10 +51,9 @@ public:
 
     const std::filesystem::path& Keep() const { return mKeep; }
     const std::filesystem::path& Fresh() const { return mFresh; }
+    const std::string& ClientId() const { return mClient; }
     // Replaces (or adds) the group's item of that name, as another computer would.
     void PutOnServer(const char* group, const std::string& name, const std::string& bytes);
-    // Deletes the group's items of that name, as another computer would.
-    void RemoveFromServer(const char* group, const std::string& name);
     // A group on the server no folder registers, holding one item.
     void AddStaleGroup();
 
@@ -79,15 +69,14 @@ public:
     std::string CacheFile() const;
     const std::filesystem::path& PrefDir() const { return mPrefs.Path(); }
     tolmonetsync::server::LocalService& Service() { return *mService; }
-    tolmonetsync::server::TreeSeeder& Seed() { return *mSeed; }
+    tolmonetsync::server::TreeSeeder& Seed() { return mSeed; }
     // The id of the server's group collection of that name; empty if none.
     std::string GroupId(const char* group);
     // Clients made from now on send to this base URL instead of the service's.
     void SendTo(const std::string& apiUrl) { mApiUrl = apiUrl; }
 
 private:
-    Stage(tolmonetsync::server::LocalService* service, const std::string& clientId);
-    std::int64_t Owner();
+    Stage(std::unique_ptr<testsupport::TestService> own, testsupport::TestService* shared, const std::string& clientId);
 
     testsupport::TempDir mRoot;
     testsupport::PrefDirScope mPrefs;
@@ -95,9 +84,9 @@ private:
     std::filesystem::path mFresh;
     std::string mClient;
     std::string mApiUrl;  // empty: the service's own
-    std::unique_ptr<tolmonetsync::server::LocalService> mOwnService;
+    std::unique_ptr<testsupport::TestService> mOwnService;
     tolmonetsync::server::LocalService* mService;
-    std::unique_ptr<tolmonetsync::server::TreeSeeder> mSeed;
+    tolmonetsync::server::TreeSeeder mSeed;
 };
 
 // What a failed run may have done to the registered files: each file of

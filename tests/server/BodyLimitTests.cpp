@@ -14,7 +14,7 @@
 #include <gtest/gtest.h>
 #include <boost/json.hpp>
 
-#include "CliProcess.h"
+#include "support/CliProcess.h"
 #include "ServiceClient.h"
 #include "support/TempDir.h"
 

@@ -1,4 +1,4 @@
-#include "CliProcess.h"
+#include "support/CliProcess.h"
 
 #include <csignal>
 #include <stdexcept>
@@ -16,28 +16,40 @@ namespace clitest {
 
 namespace {
 
-std::vector<char*> Pointers(std::vector<std::string>& texts)
-{
-    std::vector<char*> pointers;
-    for (std::string& text : texts) pointers.push_back(text.data());
-    pointers.push_back(nullptr);
-    return pointers;
-}
-
-pid_t Spawn(std::vector<std::string> arguments, std::vector<std::string> environment,
+// Runs the command with `arguments`, this process's environment and `more`
+// after it, its streams as `actions` set them.
+pid_t Spawn(std::vector<std::string> arguments, const std::vector<std::string>& more,
             posix_spawn_file_actions_t& actions)
 {
     arguments.insert(arguments.begin(), TOLMONETSYNC_CLI);
+    std::vector<std::string> environment(more);
     for (char** entry = environ; *entry != nullptr; ++entry) environment.insert(environment.begin(), *entry);
-    std::vector<char*> argv = Pointers(arguments);
-    std::vector<char*> envp = Pointers(environment);
+    std::vector<char*> argv, envp;
+    for (std::string& argument : arguments) argv.push_back(argument.data());
+    for (std::string& entry : environment) envp.push_back(entry.data());
+    argv.push_back(nullptr);
+    envp.push_back(nullptr);
     pid_t pid = -1;
     if (posix_spawn(&pid, TOLMONETSYNC_CLI, &actions, nullptr, argv.data(), envp.data()) != 0)
         throw std::runtime_error("cannot start " TOLMONETSYNC_CLI);
+    posix_spawn_file_actions_destroy(&actions);
     return pid;
 }
 
-int WaitExit(pid_t pid)
+}  // namespace
+
+pid_t StartCli(const std::vector<std::string>& arguments, const std::string& outPath, const std::string& errPath,
+               const std::vector<std::string>& environment)
+{
+    posix_spawn_file_actions_t actions;
+    posix_spawn_file_actions_init(&actions);
+    posix_spawn_file_actions_addopen(&actions, 0, "/dev/null", O_RDONLY, 0);
+    posix_spawn_file_actions_addopen(&actions, 1, outPath.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
+    posix_spawn_file_actions_addopen(&actions, 2, errPath.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
+    return Spawn(arguments, environment, actions);
+}
+
+int WaitCli(pid_t pid)
 {
     int status = 0;
     while (waitpid(pid, &status, 0) < 0) {
@@ -45,40 +57,14 @@ int WaitExit(pid_t pid)
     return WIFEXITED(status) ? WEXITSTATUS(status) : -1;
 }
 
-pid_t StartWithOutputs(const std::vector<std::string>& arguments, const std::vector<std::string>& environment,
-                       const std::string& out, const std::string& err)
-{
-    posix_spawn_file_actions_t actions;
-    posix_spawn_file_actions_init(&actions);
-    posix_spawn_file_actions_addopen(&actions, 1, out.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
-    posix_spawn_file_actions_addopen(&actions, 2, err.c_str(), O_WRONLY | O_CREAT | O_TRUNC, 0600);
-    posix_spawn_file_actions_addopen(&actions, 0, "/dev/null", O_RDONLY, 0);
-    const pid_t pid = Spawn(arguments, environment, actions);
-    posix_spawn_file_actions_destroy(&actions);
-    return pid;
-}
-
-}  // namespace
-
-pid_t StartCli(const std::vector<std::string>& arguments, const std::string& outPath, const std::string& errPath)
-{
-    return StartWithOutputs(arguments, {}, outPath, errPath);
-}
-
-int WaitCli(pid_t pid)
-{
-    return WaitExit(pid);
-}
-
 Finished RunCli(const std::vector<std::string>& arguments, const std::vector<std::string>& environment)
 {
     testsupport::TempDir outputs;
-    const std::string out = (outputs / "out").string();
-    const std::string err = (outputs / "err").string();
     Finished finished;
-    finished.mStatus = WaitExit(StartWithOutputs(arguments, environment, out, err));
-    finished.mOut = testsupport::ReadFileBytes(out);
-    finished.mErr = testsupport::ReadFileBytes(err);
+    finished.mStatus =
+        WaitCli(StartCli(arguments, (outputs / "out").string(), (outputs / "err").string(), environment));
+    finished.mOut = testsupport::ReadFileBytes(outputs / "out");
+    finished.mErr = testsupport::ReadFileBytes(outputs / "err");
     return finished;
 }
 
@@ -97,7 +83,6 @@ ServedService::ServedService(const std::filesystem::path& data, const std::strin
                                           "--user", "ann:secret", "--token",     "ann:" + token};
     arguments.insert(arguments.end(), moreOptions.begin(), moreOptions.end());
     mPid = Spawn(arguments, {}, actions);
-    posix_spawn_file_actions_destroy(&actions);
     close(pipeFds[1]);
     mOutput = fdopen(pipeFds[0], "r");
     char line[256] = {};
@@ -120,7 +105,7 @@ int ServedService::Stop()
     int status = -1;
     if (mPid > 0) {
         kill(mPid, SIGTERM);
-        status = WaitExit(mPid);
+        status = WaitCli(mPid);
         mPid = -1;
     }
     if (mOutput != nullptr) fclose(mOutput);

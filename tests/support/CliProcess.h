@@ -1,6 +1,7 @@
 #pragma once
 // The tolmonetsync command run as a person runs it: a process of its own,
-// its output gathered, its exit status read.
+// its output gathered, its exit status read. The build names the command
+// (TOLMONETSYNC_CLI); a binary that runs it depends on tolmonetsync_cli.
 
 #include <cstdio>
 #include <filesystem>
@@ -10,6 +11,12 @@
 #include <sys/types.h>
 
 namespace clitest {
+
+// Whether `text` holds `part`, for checking what the command printed.
+inline bool Contains(const std::string& text, const std::string& part)
+{
+    return text.find(part) != std::string::npos;
+}
 
 struct Finished {
     int mStatus = -1;  // exit status; -1 if killed by a signal
@@ -23,7 +30,8 @@ Finished RunCli(const std::vector<std::string>& arguments, const std::vector<std
 
 // Starts `tolmonetsync ARGUMENTS...` with its output in the files named,
 // and returns at once; WaitCli gives its exit status (-1 after a signal).
-pid_t StartCli(const std::vector<std::string>& arguments, const std::string& outPath, const std::string& errPath);
+pid_t StartCli(const std::vector<std::string>& arguments, const std::string& outPath, const std::string& errPath,
+               const std::vector<std::string>& environment = {});
 int WaitCli(pid_t pid);
 
 // `tolmonetsync serve` in the background on a free port, with one user and
