@@ -31,70 +31,42 @@ public:
 
     int Open(const std::string& path, int flags, mode_t mode) override
     {
-        if (Fails("open", path, path)) return -1;
+        if (Fails("open", path)) return -1;
         const int fd = FileOps::Open(path, flags, mode);
-        const int error = errno;
-        {
-            std::lock_guard<std::mutex> lock(mMutex);
-            if (fd >= 0) mPaths[fd] = path;
-            mLines.push_back("open " + path);
-        }
-        errno = error;
+        std::lock_guard<std::mutex> lock(mMutex);
+        if (fd >= 0) mPaths[fd] = path;
         return fd;
     }
     ssize_t Write(int fd, const void* data, size_t size) override
     {
-        if (Fails("write", PathOf(fd), PathOf(fd))) return -1;
-        Record("write " + PathOf(fd));
-        return FileOps::Write(fd, data, size);
+        return Fails("write", PathOf(fd)) ? -1 : FileOps::Write(fd, data, size);
     }
-    int Fsync(int fd) override
-    {
-        if (Fails("fsync", PathOf(fd), PathOf(fd))) return -1;
-        Record("fsync " + PathOf(fd));
-        return FileOps::Fsync(fd);
-    }
+    int Fsync(int fd) override { return Fails("fsync", PathOf(fd)) ? -1 : FileOps::Fsync(fd); }
     int Close(int fd) override
     {
-        const std::string path = PathOf(fd);
-        {
-            std::lock_guard<std::mutex> lock(mMutex);
-            mPaths.erase(fd);
-        }
-        if (Fails("close", path, path)) {
-            const int error = errno;
-            ::close(fd);  // a failed close still lets the descriptor go
-            errno = error;
-            return -1;
-        }
-        Record("close " + path);
-        return FileOps::Close(fd);
+        if (!Fails("close", PathOf(fd, true))) return FileOps::Close(fd);
+        const int error = errno;
+        ::close(fd);  // a failed close still lets the descriptor go
+        errno = error;
+        return -1;
     }
     int Rename(const std::string& from, const std::string& to) override
     {
-        if (Fails("rename", from, to)) return -1;
-        Record("rename " + from + " -> " + to);
-        return FileOps::Rename(from, to);
+        return Fails("rename", from, " -> " + to, to) ? -1 : FileOps::Rename(from, to);
     }
     int SyncDirectory(const std::string& path) override
     {
-        if (Fails("dirsync", path, path)) return -1;
-        Record("dirsync " + path);
-        return FileOps::SyncDirectory(path);
+        return Fails("dirsync", path) ? -1 : FileOps::SyncDirectory(path);
     }
     int Fchmod(int fd, mode_t mode) override
     {
-        if (Fails("chmod", PathOf(fd), PathOf(fd))) return -1;
         char octal[8];
-        std::snprintf(octal, sizeof octal, "%04o", static_cast<unsigned>(mode & 07777));
-        Record("chmod " + PathOf(fd) + " " + octal);
-        return FileOps::Fchmod(fd, mode);
+        std::snprintf(octal, sizeof octal, " %04o", static_cast<unsigned>(mode & 07777));
+        return Fails("chmod", PathOf(fd), octal) ? -1 : FileOps::Fchmod(fd, mode);
     }
     int Fchown(int fd, uid_t owner, gid_t group) override
     {
-        if (Fails("chown", PathOf(fd), PathOf(fd))) return -1;
-        Record("chown " + PathOf(fd));
-        return FileOps::Fchown(fd, owner, group);
+        return Fails("chown", PathOf(fd)) ? -1 : FileOps::Fchown(fd, owner, group);
     }
 
     void Plant(const Failure& failure)
@@ -114,30 +86,30 @@ public:
     }
 
 private:
-    std::string PathOf(int fd) const
+    std::string PathOf(int fd, bool forget = false)
     {
         std::lock_guard<std::mutex> lock(mMutex);
         auto found = mPaths.find(fd);
-        return found == mPaths.end() ? "fd:" + std::to_string(fd) : found->second;
+        const std::string path = found == mPaths.end() ? "fd:" + std::to_string(fd) : found->second;
+        if (forget && found != mPaths.end()) mPaths.erase(found);
+        return path;
     }
-    void Record(const std::string& line)
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        mLines.push_back(line);
-    }
-    // Takes the first planted failure that matches, records it and sets errno.
-    bool Fails(const char* kind, const std::string& path, const std::string& otherPath)
+    // Takes the first planted failure that matches `path` or `otherPath`,
+    // records it and sets errno; otherwise records "KIND PATH DETAIL".
+    bool Fails(const std::string& kind, const std::string& path, const std::string& detail = std::string(),
+               const std::string& otherPath = std::string())
     {
         std::lock_guard<std::mutex> lock(mMutex);
         for (auto it = mFailures.begin(); it != mFailures.end(); ++it) {
-            if (it->mKind != kind || !(EndsWith(path, it->mPathEnd) || EndsWith(otherPath, it->mPathEnd))) continue;
+            const std::string& matched = EndsWith(path, it->mPathEnd) ? path : otherPath;
+            if (it->mKind != kind || !EndsWith(matched, it->mPathEnd)) continue;
             if (!it->mAfter.empty() && std::find(mLines.begin(), mLines.end(), it->mAfter) == mLines.end()) continue;
-            const int error = it->mError;
-            mLines.push_back(std::string(kind) + " " + (EndsWith(path, it->mPathEnd) ? path : otherPath) + " FAILED");
+            mLines.push_back(kind + " " + matched + " FAILED");
+            errno = it->mError;
             mFailures.erase(it);
-            errno = error;
             return true;
         }
+        mLines.push_back(kind + " " + path + detail);
         return false;
     }
 
@@ -175,17 +147,17 @@ std::vector<std::string> FileOpsRecorder::Lines() const
 int FileOpsRecorder::IndexOf(const std::string& line, int from) const
 {
     const std::vector<std::string> lines = Lines();
-    for (int i = from < 0 ? 0 : from; i < static_cast<int>(lines.size()); ++i)
-        if (lines[i] == line) return i;
-    return -1;
+    const auto found = std::find(lines.begin() + std::clamp<int>(from, 0, lines.size()), lines.end(), line);
+    return found == lines.end() ? -1 : static_cast<int>(found - lines.begin());
 }
 
 int FileOpsRecorder::IndexOfPrefix(const std::string& prefix, int from) const
 {
     const std::vector<std::string> lines = Lines();
-    for (int i = from < 0 ? 0 : from; i < static_cast<int>(lines.size()); ++i)
-        if (lines[i].compare(0, prefix.size(), prefix) == 0) return i;
-    return -1;
+    const auto found =
+        std::find_if(lines.begin() + std::clamp<int>(from, 0, lines.size()), lines.end(),
+                     [&](const std::string& line) { return line.compare(0, prefix.size(), prefix) == 0; });
+    return found == lines.end() ? -1 : static_cast<int>(found - lines.begin());
 }
 
 }  // namespace testsupport

@@ -1,18 +1,24 @@
 #pragma once
 // A small HTTP/1.1 server on 127.0.0.1 and a free port, for tests of the
-// HTTP client. One thread per connection, keep-alive, bodies by
-// Content-Length. Besides normal answers it can misbehave on purpose: never
-// answer, hang up in the middle of a body, or stall there.
+// HTTP client, on the service's own server loop. Besides normal answers it
+// can misbehave on purpose: never answer, hang up in the middle of a body, or
+// stall there.
 
 #include <chrono>
 #include <condition_variable>
 #include <functional>
+#include <memory>
 #include <mutex>
-#include <set>
 #include <string>
 #include <thread>
 #include <utility>
 #include <vector>
+
+namespace httplib {
+class Server;
+struct Request;
+struct Response;
+}  // namespace httplib
 
 namespace testsupport {
 
@@ -69,25 +75,19 @@ public:
     bool WaitForRequests(size_t count, std::chrono::milliseconds bound) const;
 
 private:
-    void AcceptLoop();
-    void Serve(int connection);
-    // Blocks until the peer or the server's stop closes the connection.
-    void WaitForClose(int connection);
-    // Sends a normal answer, counting its body; false if the peer left.
-    bool SendAnswer(int connection, const std::string& head, const HttpAnswer& answer);
-    void CountBodyBytes(size_t count);
+    void Answer(const httplib::Request& in, std::string body, httplib::Response& out);
+    // Blocks until the server stops: how a fault goes quiet.
+    void WaitForStop() const;
 
     const Handler mHandler;
-    int mListener = -1;
+    std::unique_ptr<httplib::Server> mServer;
     int mPort = 0;
     mutable std::mutex mMutex;
-    mutable std::condition_variable mArrived;
-    size_t mRequests = 0;               // guarded by mMutex
-    size_t mBodyBytesSent = 0;          // guarded by mMutex
-    std::set<int> mConnections;         // guarded by mMutex
-    bool mStopping = false;             // guarded by mMutex
-    std::vector<std::thread> mThreads;  // guarded by mMutex
-    std::thread mAcceptThread;
+    mutable std::condition_variable mChanged;
+    size_t mRequests = 0;       // guarded by mMutex
+    size_t mBodyBytesSent = 0;  // guarded by mMutex
+    bool mStopping = false;     // guarded by mMutex
+    std::thread mListenThread;
 };
 
 // A port on 127.0.0.1 where nothing listens: a connection to it is refused.
