@@ -84,8 +84,7 @@ TEST(NativeDeviceID, IsAskedForOncePerProcess)
     fake.SetText("OVRA_getDeviceID", "dev-A");
     auto connection = Connect(FAKE_OVRA_LIB);
     EXPECT_EQ(connection->GetDeviceID(), Text("dev-A"));
-    EXPECT_EQ(fake.Argument("OVRA_createRef", 0), "null");  // a handle of its own, for production
-    EXPECT_EQ(fake.Argument("OVRA_createRef", 1), "1");
+    EXPECT_EQ(fake.Arguments("OVRA_createRef"), (Strings{"null", "1"}));  // a handle of its own, for production
 
     fake.SetText("OVRA_getDeviceID", "dev-B");
     EXPECT_EQ(connection->GetDeviceID(), Text("dev-A"));

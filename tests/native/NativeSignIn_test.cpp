@@ -41,13 +41,11 @@ TEST(NativeSignIn, TheLibrarysTokenForTheDefaultUserOpensTheAssetService)
     EXPECT_EQ(connection->GetEmail(), Text("ann@example.test"));
 
     // Production, the built-in client and its production secret, the default scope.
-    EXPECT_EQ(fake.Argument("OVRA_createRef", 0), "context");
-    EXPECT_EQ(fake.Argument("OVRA_createRef", 1), "1");
+    EXPECT_EQ(fake.Arguments("OVRA_createRef"), (Strings{"context", "1"}));
     const std::string client = tolmonetsync::kTOLMO_OVRA_CLIENT_ID.ToStdString();
-    EXPECT_EQ(fake.Argument(kUserInfo, 0), client);
-    const std::vector<std::string> asked = {client, tolmonetsync::kTOLMO_OVRA_CLIENT_SECRET_GM.ToStdString(), "u-42",
-                                            "", "openid,HalvaneID,pellucid"};
-    for (size_t i = 0; i < asked.size(); ++i) EXPECT_EQ(fake.Argument(kFetch, i), asked[i]) << i;
+    EXPECT_EQ(fake.Arguments(kUserInfo), Strings{client});
+    EXPECT_EQ(fake.Arguments(kFetch), (Strings{client, tolmonetsync::kTOLMO_OVRA_CLIENT_SECRET_GM.ToStdString(), "u-42",
+                                               "", "openid,HalvaneID,pellucid"}));
 
     tolmonetsync::OvraCredentials credentials;
     credentials.accessToken = connection->GetAccessToken();

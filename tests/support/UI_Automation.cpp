@@ -69,16 +69,10 @@ const bool sObserving = (ModalLoops::SetObserver(&Observe), true);
 
 using Clock = std::chrono::steady_clock;
 
-// Waits for `ready`; a negative time waits without limit.
 template <class Predicate>
-bool WaitFor(std::unique_lock<std::mutex>& lock, int milliseconds, Clock::time_point start, Predicate ready)
+bool WaitFor(std::unique_lock<std::mutex>& lock, Clock::time_point start, Predicate ready)
 {
-    Tracker& tracker = TheTracker();
-    if (milliseconds < 0) {
-        tracker.changed.wait(lock, ready);
-        return true;
-    }
-    return tracker.changed.wait_until(lock, start + std::chrono::milliseconds(milliseconds), ready);
+    return TheTracker().changed.wait_until(lock, start + std::chrono::seconds(30), ready);
 }
 
 struct PostedAction {
@@ -88,7 +82,7 @@ struct PostedAction {
 
 }  // namespace
 
-boost::intrusive_ptr<UI_Dialog> WaitForModalDialog(int milliseconds)
+boost::intrusive_ptr<UI_Dialog> WaitForModalDialog()
 {
     (void)sObserving;
     Tracker& tracker = TheTracker();
@@ -104,11 +98,11 @@ boost::intrusive_ptr<UI_Dialog> WaitForModalDialog(int milliseconds)
         }
         return false;
     };
-    if (!WaitFor(lock, milliseconds, Clock::now(), open)) return nullptr;
+    if (!WaitFor(lock, Clock::now(), open)) return nullptr;
     return boost::intrusive_ptr<UI_Dialog>(found);
 }
 
-bool RunInModalLoop(const boost::function<void()>& action, int milliseconds)
+bool RunInModalLoop(const boost::function<void()>& action)
 {
     const Clock::time_point start = Clock::now();
     Tracker& tracker = TheTracker();
@@ -118,7 +112,7 @@ bool RunInModalLoop(const boost::function<void()>& action, int milliseconds)
         action();
         return true;
     }
-    if (!WaitFor(lock, milliseconds, start, [&] { return !tracker.frames.empty(); })) return false;
+    if (!WaitFor(lock, start, [&] { return !tracker.frames.empty(); })) return false;
     const auto posted = std::make_shared<PostedAction>();
     const bool taken = ModalLoops::Post(*tracker.frames.back().dialog, [posted, action] {
         Tracker& tracker = TheTracker();
@@ -133,7 +127,7 @@ bool RunInModalLoop(const boost::function<void()>& action, int milliseconds)
         tracker.changed.notify_all();
     });
     if (!taken) return false;
-    if (!WaitFor(lock, milliseconds, start, [&] { return posted->state != PostedAction::Waiting; })) {
+    if (!WaitFor(lock, start, [&] { return posted->state != PostedAction::Waiting; })) {
         // Not started in time: withdrawn, so that it never runs.
         posted->state = PostedAction::Withdrawn;
         return false;
@@ -142,11 +136,11 @@ bool RunInModalLoop(const boost::function<void()>& action, int milliseconds)
     return true;
 }
 
-bool WaitForModalLoopDepth(int depth, int milliseconds)
+bool WaitForModalLoopDepth(int depth)
 {
     Tracker& tracker = TheTracker();
     std::unique_lock<std::mutex> lock(tracker.mutex);
-    return WaitFor(lock, milliseconds, Clock::now(), [&] { return static_cast<int>(tracker.frames.size()) >= depth; });
+    return WaitFor(lock, Clock::now(), [&] { return static_cast<int>(tracker.frames.size()) >= depth; });
 }
 
 bool SimulateTyping(UI_TextEdit& edit, const UTF16String& newValue)

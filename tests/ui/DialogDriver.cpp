@@ -2,8 +2,6 @@
 
 #include <gtest/gtest.h>
 
-#include "support/UI_Automation.h"
-
 namespace uitest {
 
 boost::shared_ptr<SyncAuthenticationValidator> Validator(const SyncAuthenticationValidator& validator)
@@ -19,7 +17,7 @@ DialogRun::DialogRun(const DialogArguments& arguments) : mArguments(arguments)
             nullptr, a.title, a.message, a.userNameLabel, a.userName, a.passwordLabel, a.password, a.validator, nullptr,
             0, 0, a.messageCallback, a.userNameLinkText, a.userNameLinkURL, a.passwordLinkText, a.passwordLinkURL);
     });
-    mBox.reset(dynamic_cast<UI_MessageBox*>(WaitForModalDialog(kLoopWaitMs).get()));
+    mBox.reset(dynamic_cast<UI_MessageBox*>(WaitForModalDialog().get()));
     EXPECT_TRUE(mBox) << "no message box came up";
 }
 
@@ -33,11 +31,9 @@ DialogRun::~DialogRun()
 
 bool DialogRun::Do(const std::function<void(UI_MessageBox& box)>& action)
 {
-    return RunInModalLoop(
-        [&] {
-            if (mBox) action(*mBox);
-        },
-        kLoopWaitMs);
+    return RunInModalLoop([&] {
+        if (mBox) action(*mBox);
+    });
 }
 
 bool DialogRun::Finish()

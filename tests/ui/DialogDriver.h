@@ -19,9 +19,6 @@ namespace uitest {
 using namespace tolmoui;
 using tolmonetsync::SyncAuthenticationValidator;
 
-// How long a test waits for the loop before it counts as stuck.
-const int kLoopWaitMs = 30000;
-
 struct DialogArguments {
     UTF16String title = UTF16String(u"Sign in");
     UTF16String message = UTF16String(u"Sign in with your Halvane ID.");

@@ -13,8 +13,6 @@ namespace {
 
 using namespace tolmoui;
 
-const int kWaitMs = 30000;
-
 boost::intrusive_ptr<UI_MessageBox> MakeBox()
 {
     return new UI_MessageBox(nullptr, UTF16String(u"Title"), UTF16String(u"Message"),
@@ -28,34 +26,32 @@ std::future<int> RunModalOnAThread(const boost::intrusive_ptr<UI_MessageBox>& di
     return std::async(std::launch::async, [dialog] { return dialog->RunModal(); });
 }
 
-class ModalLoop : public ::testing::Test {};
-
-TEST_F(ModalLoop, PostCloseFromAnotherThreadEndsRunModal)
+TEST(ModalLoop, PostCloseFromAnotherThreadEndsRunModal)
 {
     auto box = MakeBox();
     auto loop = RunModalOnAThread(box);
-    ASSERT_EQ(WaitForModalDialog(kWaitMs), box);
+    ASSERT_EQ(WaitForModalDialog(), box);
     EXPECT_TRUE(box->IsInModalLoop());
     box->PostClose();
     EXPECT_EQ(loop.get(), kDialogResponse_None);
     EXPECT_FALSE(box->IsInModalLoop());
 }
 
-TEST_F(ModalLoop, NestedLoopsTakeActionsInnermostFirst)
+TEST(ModalLoop, NestedLoopsTakeActionsInnermostFirst)
 {
     auto outer = MakeBox();
     auto inner = MakeBox();
     auto loop = RunModalOnAThread(outer);
-    ASSERT_EQ(WaitForModalDialog(kWaitMs), outer);
+    ASSERT_EQ(WaitForModalDialog(), outer);
     int innerResponse = -1;
-    std::thread opener([&] { RunInModalLoop([&] { innerResponse = inner->RunModal(); }, kWaitMs); });
-    ASSERT_TRUE(WaitForModalLoopDepth(2, kWaitMs));
-    EXPECT_EQ(WaitForModalDialog(kWaitMs), inner);
-    ASSERT_TRUE(RunInModalLoop([&] { inner->HandleButtonClick(kDialogResponse_OK); }, kWaitMs));
+    std::thread opener([&] { RunInModalLoop([&] { innerResponse = inner->RunModal(); }); });
+    ASSERT_TRUE(WaitForModalLoopDepth(2));
+    EXPECT_EQ(WaitForModalDialog(), inner);
+    ASSERT_TRUE(RunInModalLoop([&] { inner->HandleButtonClick(kDialogResponse_OK); }));
     opener.join();
     EXPECT_EQ(innerResponse, kDialogResponse_OK);
-    ASSERT_EQ(WaitForModalDialog(kWaitMs), outer);
-    ASSERT_TRUE(RunInModalLoop([&] { outer->HandleCloseBox(); }, kWaitMs));
+    ASSERT_EQ(WaitForModalDialog(), outer);
+    ASSERT_TRUE(RunInModalLoop([&] { outer->HandleCloseBox(); }));
     EXPECT_EQ(loop.get(), kDialogResponse_Cancel);
 }
 

@@ -28,11 +28,9 @@ DialogArguments Filled()
     return arguments;
 }
 
-class PasswordDialog : public ::testing::Test {};
-
 // Without a validator OK never closes; Cancel and the close box give false
 // and hand back what was typed.
-TEST_F(PasswordDialog, ShowsTheStartingValuesAndGivesBackTheTypedOnesOnCancelOrClose)
+TEST(PasswordDialog, ShowsTheStartingValuesAndGivesBackTheTypedOnesOnCancelOrClose)
 {
     for (const bool closeBox : {false, true}) {
         SCOPED_TRACE(closeBox ? "close box" : "cancel");
@@ -72,7 +70,7 @@ TEST_F(PasswordDialog, ShowsTheStartingValuesAndGivesBackTheTypedOnesOnCancelOrC
     }
 }
 
-TEST_F(PasswordDialog, OneEmptyValueDisablesOKUntilBothHoldTextAndAnAcceptingValidatorCloses)
+TEST(PasswordDialog, OneEmptyValueDisablesOKUntilBothHoldTextAndAnAcceptingValidatorCloses)
 {
     DialogArguments arguments;
     arguments.userName = UTF16String(u"ann");
@@ -99,7 +97,7 @@ TEST_F(PasswordDialog, OneEmptyValueDisablesOKUntilBothHoldTextAndAnAcceptingVal
     EXPECT_EQ(N(run.Arguments().password), "s");
 }
 
-TEST_F(PasswordDialog, ARefusalShowsItsErrorUntilTheUserTypesAndKeepsTheDialogOpen)
+TEST(PasswordDialog, ARefusalShowsItsErrorUntilTheUserTypesAndKeepsTheDialogOpen)
 {
     std::vector<std::string> asked;  // written on the UI thread, read inside the loop
     DialogArguments arguments = Filled();
@@ -133,7 +131,7 @@ TEST_F(PasswordDialog, ARefusalShowsItsErrorUntilTheUserTypesAndKeepsTheDialogOp
     EXPECT_TRUE(run.Do([](UI_MessageBox& box) { EXPECT_TRUE(box.IsInModalLoop()); }));
 }
 
-TEST_F(PasswordDialog, ALinkOpensItsOwnURLAndOneWithoutAURLOpensNothing)
+TEST(PasswordDialog, ALinkOpensItsOwnURLAndOneWithoutAURLOpensNothing)
 {
     testsupport::OpenerRecorder opener;
     DialogArguments arguments = Filled();

@@ -21,7 +21,7 @@ TEST_F(WebSignIn, TheExtensionIsToldWhereToSignIn)
         ++round;
         SignInRun run(mRecorder, schemeAndEndpoint.first, "client-x", "de_DE");
         ASSERT_TRUE(OpenAndInitialise(round));
-        const tessel::OwnedEvent sent = mExtension->Initializations().at(round - 1);
+        const tessel::OwnedEvent sent = mExtension->mInitializations.All().at(round - 1);
         EXPECT_EQ(sent.Scope(), 1);
         EXPECT_EQ(sent.AppId().value_or(""), "CINDERAL");
         EXPECT_FALSE(sent.ExtensionId());
@@ -40,7 +40,7 @@ TEST_F(WebSignIn, TheExtensionIsToldWhereToSignIn)
         EXPECT_EQ(mRecorder.Count(), 0u);
         ASSERT_TRUE(LauncherGoneAfter(*mExtension, round));
     }
-    EXPECT_EQ(mExtension->Loads(), 2);
+    EXPECT_EQ(mExtension->mLoads.Count(), 2);
 }
 
 TEST_F(WebSignIn, OnlyAnUnloadedEventNamingTheExtensionEndsTheLauncher)
@@ -49,7 +49,7 @@ TEST_F(WebSignIn, OnlyAnUnloadedEventNamingTheExtensionEndsTheLauncher)
     SignInRun run(mRecorder);
     ASSERT_TRUE(OpenAndInitialise());
     ASSERT_TRUE(run.Result());
-    ASSERT_TRUE(mExtension->WaitForUnloads(1, kWaitMs));
+    ASSERT_TRUE(mExtension->mUnloads.WaitFor(1));
     const boost::shared_ptr<MerrowExtensionLauncher> launcher = CurrentMerrowExtensionLauncher();
     ASSERT_TRUE(launcher);
 
@@ -58,11 +58,11 @@ TEST_F(WebSignIn, OnlyAnUnloadedEventNamingTheExtensionEndsTheLauncher)
     tessel::SendHostEvent(kUnloaded, std::string("<Id>") + kMerrowExtensionID);
     tessel::SendHostEvent(kUnloaded, std::string(kMerrowExtensionID) + "</Id>");
     tessel::SendHostEvent(kUnloaded, boost::none);
-    ASSERT_TRUE(tessel::FlushHost(kWaitMs));
+    ASSERT_TRUE(tessel::FlushHost());
     EXPECT_EQ(CurrentMerrowExtensionLauncher(), launcher);
 
     mExtension->ReleaseUnloaded();
-    ASSERT_TRUE(mExtension->WaitForUnloadedEvents(1, kWaitMs));
+    ASSERT_TRUE(mExtension->mUnloadedEvents.WaitFor(1));
     EXPECT_FALSE(CurrentMerrowExtensionLauncher());
 }
 
@@ -86,8 +86,8 @@ TEST_F(WebSignIn, ASecondSignInBeforeTheUnloadedEventKeepsTheFirstLauncher)
     EXPECT_NE(secondDialog, firstDialog);
     EXPECT_EQ(CurrentMerrowExtensionLauncher(), launcher);
     EXPECT_EQ(launcher->dialog, firstDialog);
-    ASSERT_TRUE(tessel::FlushHost(kWaitMs));
-    EXPECT_EQ(mExtension->Loads(), 1);  // the extension was not loaded again
+    ASSERT_TRUE(tessel::FlushHost());
+    EXPECT_EQ(mExtension->mLoads.Count(), 1);  // the extension was not loaded again
 
     // Only the hand closes it, and Execute reads the kept launcher's result.
     ASSERT_TRUE(CloseByHand());

@@ -30,7 +30,8 @@ TEST_F(WebSignIn, TheDialogSizeIsTheHostsOnlyWhenBothValuesArePositive)
         const PointT<float> size = MerrowLoginDialogImpl::GetDialogSize();
         EXPECT_EQ(size, (PointT<float>{c.expectedWidth, c.expectedHeight})) << c.width << "x" << c.height;
     }
-    GiveNoViewGetter();
+    MerrowLoginExtensionInfo none;  // no size getter
+    SetMerrowLoginExtensionInfo(none);
     EXPECT_EQ(MerrowLoginDialogImpl::GetDialogSize(), (PointT<float>{800, 600}));
 }
 
@@ -55,24 +56,22 @@ TEST_F(WebSignIn, TheDialogCarriesTheHostsViewOrRunsWithoutOne)
         SignInRun run(mRecorder);
         const auto dialog = WaitForSignInDialog();
         ASSERT_TRUE(dialog);
-        ASSERT_TRUE(tolmoui::RunInModalLoop(
-            [&] {
-                EXPECT_EQ(tolmocore::utility::ToNarrow(dialog->GetTitle()), "Halvane Pellucid Authentication");
-                EXPECT_TRUE(dialog->UI_IsShown() && dialog->UI_HasKeyboardFocus());
-                const boost::intrusive_ptr<KelpHTMLView> htmlView = dialog->GetHTMLView();
-                ASSERT_EQ(bool(htmlView), withView);
-                if (!withView) {
-                    EXPECT_TRUE(dialog->GetContentContainer()->GetChildren().empty());
-                    EXPECT_EQ(dialog->UI_GetLocalRectF(), (RectT<float>{0, 0, 800, 600}));
-                    return;
-                }
-                EXPECT_EQ(dialog->UI_GetLocalRectF(), (RectT<float>{0, 0, 1024, 700}));
-                EXPECT_EQ(htmlView->UI_GetParent(), dialog->GetContentContainer());
-                EXPECT_EQ(mStageView->UI_GetParent(), htmlView.get());
-                EXPECT_TRUE(htmlView->UI_IsShown() && mStageView->UI_IsShown());
-                EXPECT_EQ(mStageView->UI_GetLocalRect(), (RectT<int>{0, 0, 1024, 700}));
-            },
-            kWaitMs));
+        ASSERT_TRUE(tolmoui::RunInModalLoop([&] {
+            EXPECT_EQ(tolmocore::utility::ToNarrow(dialog->GetTitle()), "Halvane Pellucid Authentication");
+            EXPECT_TRUE(dialog->UI_IsShown() && dialog->UI_HasKeyboardFocus());
+            const boost::intrusive_ptr<KelpHTMLView> htmlView = dialog->GetHTMLView();
+            ASSERT_EQ(bool(htmlView), withView);
+            if (!withView) {
+                EXPECT_TRUE(dialog->GetContentContainer()->GetChildren().empty());
+                EXPECT_EQ(dialog->UI_GetLocalRectF(), (RectT<float>{0, 0, 800, 600}));
+                return;
+            }
+            EXPECT_EQ(dialog->UI_GetLocalRectF(), (RectT<float>{0, 0, 1024, 700}));
+            EXPECT_EQ(htmlView->UI_GetParent(), dialog->GetContentContainer());
+            EXPECT_EQ(mStageView->UI_GetParent(), htmlView.get());
+            EXPECT_TRUE(htmlView->UI_IsShown() && mStageView->UI_IsShown());
+            EXPECT_EQ(mStageView->UI_GetLocalRect(), (RectT<int>{0, 0, 1024, 700}));
+        }));
         ASSERT_TRUE(CloseByHand());
         EXPECT_FALSE(run.Result());
         ASSERT_TRUE(LauncherGoneAfter(*mExtension, 1));
