@@ -6,7 +6,6 @@
 #include <memory>
 #include <mutex>
 #include <set>
-#include <thread>
 #include <vector>
 
 #include "foundation/ui/ModalLoops.h"
@@ -17,7 +16,6 @@ namespace {
 
 struct LoopFrame {
     OS_Dialog* dialog;
-    std::thread::id thread;
     bool closing;
 };
 
@@ -48,8 +46,7 @@ void Observe(OS_Dialog& dialog, ModalLoopEvent event)
     const auto frame = Innermost(tracker, dialog);
     switch (event) {
         case ModalLoopEvent_Started:
-            tracker.frames.push_back(
-                {&dialog, std::this_thread::get_id(), tracker.closedBeforeLoop.erase(&dialog) > 0});
+            tracker.frames.push_back({&dialog, tracker.closedBeforeLoop.erase(&dialog) > 0});
             break;
         case ModalLoopEvent_Closing:
             if (frame == tracker.frames.rend())
@@ -107,11 +104,6 @@ bool RunInModalLoop(const boost::function<void()>& action)
     const Clock::time_point start = Clock::now();
     Tracker& tracker = TheTracker();
     std::unique_lock<std::mutex> lock(tracker.mutex);
-    if (!tracker.frames.empty() && tracker.frames.back().thread == std::this_thread::get_id()) {
-        lock.unlock();
-        action();
-        return true;
-    }
     if (!WaitFor(lock, start, [&] { return !tracker.frames.empty(); })) return false;
     const auto posted = std::make_shared<PostedAction>();
     const bool taken = ModalLoops::Post(*tracker.frames.back().dialog, [posted, action] {

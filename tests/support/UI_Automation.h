@@ -20,8 +20,7 @@ boost::intrusive_ptr<UI_Dialog> WaitForModalDialog();
 // Runs `action` on the thread of the innermost modal loop, inside the loop,
 // and waits until it has run. False if no loop started it in time or the
 // loop ended first; `action` then never runs. Once started, it is waited for
-// to the end. Called on the loop's own thread, it runs `action` at once.
-// `action` must not throw.
+// to the end. Not for the loop's own thread. `action` must not throw.
 bool RunInModalLoop(const boost::function<void()>& action);
 
 // Waits until at least `depth` modal loops run (a nested dialog has come up).
