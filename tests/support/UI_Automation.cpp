@@ -64,12 +64,10 @@ void Observe(OS_Dialog& dialog, ModalLoopEvent event)
 // Installed before main, so that no loop of a test starts unseen.
 const bool sObserving = (ModalLoops::SetObserver(&Observe), true);
 
-using Clock = std::chrono::steady_clock;
-
 template <class Predicate>
-bool WaitFor(std::unique_lock<std::mutex>& lock, Clock::time_point start, Predicate ready)
+bool WaitFor(std::unique_lock<std::mutex>& lock, Predicate ready)
 {
-    return TheTracker().changed.wait_until(lock, start + std::chrono::seconds(30), ready);
+    return TheTracker().changed.wait_for(lock, std::chrono::seconds(30), ready);
 }
 
 struct PostedAction {
@@ -88,23 +86,20 @@ boost::intrusive_ptr<UI_Dialog> WaitForModalDialog()
     // A loop whose close is posted is ending: a test waiting for the next
     // dialog must not get the one it has just closed.
     auto open = [&] {
-        for (auto it = tracker.frames.rbegin(); it != tracker.frames.rend(); ++it) {
-            if (it->closing) continue;
-            found = dynamic_cast<UI_Dialog*>(it->dialog);
-            return found != nullptr;
-        }
-        return false;
+        const auto frame = std::find_if(tracker.frames.rbegin(), tracker.frames.rend(),
+                                        [](const LoopFrame& frame) { return !frame.closing; });
+        found = frame != tracker.frames.rend() ? dynamic_cast<UI_Dialog*>(frame->dialog) : nullptr;
+        return found != nullptr;
     };
-    if (!WaitFor(lock, Clock::now(), open)) return nullptr;
+    if (!WaitFor(lock, open)) return nullptr;
     return boost::intrusive_ptr<UI_Dialog>(found);
 }
 
 bool RunInModalLoop(const boost::function<void()>& action)
 {
-    const Clock::time_point start = Clock::now();
     Tracker& tracker = TheTracker();
     std::unique_lock<std::mutex> lock(tracker.mutex);
-    if (!WaitFor(lock, start, [&] { return !tracker.frames.empty(); })) return false;
+    if (!WaitFor(lock, [&] { return !tracker.frames.empty(); })) return false;
     const auto posted = std::make_shared<PostedAction>();
     const bool taken = ModalLoops::Post(*tracker.frames.back().dialog, [posted, action] {
         Tracker& tracker = TheTracker();
@@ -119,7 +114,7 @@ bool RunInModalLoop(const boost::function<void()>& action)
         tracker.changed.notify_all();
     });
     if (!taken) return false;
-    if (!WaitFor(lock, start, [&] { return posted->state != PostedAction::Waiting; })) {
+    if (!WaitFor(lock, [&] { return posted->state != PostedAction::Waiting; })) {
         // Not started in time: withdrawn, so that it never runs.
         posted->state = PostedAction::Withdrawn;
         return false;
@@ -132,7 +127,7 @@ bool WaitForModalLoopDepth(int depth)
 {
     Tracker& tracker = TheTracker();
     std::unique_lock<std::mutex> lock(tracker.mutex);
-    return WaitFor(lock, Clock::now(), [&] { return static_cast<int>(tracker.frames.size()) >= depth; });
+    return WaitFor(lock, [&] { return static_cast<int>(tracker.frames.size()) >= depth; });
 }
 
 bool SimulateTyping(UI_TextEdit& edit, const UTF16String& newValue)

@@ -1,7 +1,9 @@
 // The sign-in window: its size, title and id, the host's view inside it, and
-// a window without a view.
+// a window without a view; the view that carries the host's.
 
 #include "WebSignInHarness.h"
+#include "foundation/ui/UI_SubView.h"
+#include "identity/dialogs/KelpHTMLView.h"
 
 namespace {
 
@@ -59,7 +61,7 @@ TEST_F(WebSignIn, TheDialogCarriesTheHostsViewOrRunsWithoutOne)
         ASSERT_TRUE(tolmoui::RunInModalLoop([&] {
             EXPECT_EQ(tolmocore::utility::ToNarrow(dialog->GetTitle()), "Halvane Pellucid Authentication");
             EXPECT_TRUE(dialog->UI_IsShown() && dialog->UI_HasKeyboardFocus());
-            const boost::intrusive_ptr<KelpHTMLView> htmlView = dialog->GetHTMLView();
+            const boost::intrusive_ptr<tolmonetsync::KelpHTMLView> htmlView = dialog->GetHTMLView();
             ASSERT_EQ(bool(htmlView), withView);
             if (!withView) {
                 EXPECT_TRUE(dialog->GetContentContainer()->GetChildren().empty());
@@ -76,6 +78,38 @@ TEST_F(WebSignIn, TheDialogCarriesTheHostsViewOrRunsWithoutOne)
         EXPECT_FALSE(run.Result());
         ASSERT_TRUE(LauncherGoneAfter(*mExtension, 1));
     }
+}
+
+// The view that carries the extension's native view: rectangles passed on,
+// the area reported to the platform, and the view let go at the end.
+
+TEST(KelpView, PassesItsRectangleOnReportsItsClipAndLetsTheStageViewGo)
+{
+    boost::intrusive_ptr<tolmonetsync::KelpHTMLView> view(new tolmonetsync::KelpHTMLView(nullptr));
+    const boost::intrusive_ptr<tolmoui::OS_View> stage(new tolmoui::OS_View);
+    view->SetStageView(stage);
+    boost::intrusive_ptr<tolmoui::UI_SubView> window(new tolmoui::UI_SubView());
+    window->UI_SetLocalRectF(RectT<float>{100, 200, 900, 800});
+    window->ChildPushBack(view);
+
+    // Truncated; no height changes nothing.
+    view->UI_SetLocalRectF(RectT<float>{30.7f, 40.2f, 530.9f, 440.5f});
+    EXPECT_EQ(stage->UI_GetLocalRect(), (RectT<int>{30, 40, 530, 440}));
+    view->UI_SetLocalRectF(RectT<float>{5, 5, 200, 0});
+    view->UI_SetLocalRectF(RectT<float>{5, 5, 200, -3});
+    EXPECT_EQ(view->UI_GetLocalRectF(), (RectT<float>{30.7f, 40.2f, 530.9f, 440.5f}));
+    EXPECT_EQ(stage->UI_GetLocalRect(), (RectT<int>{30, 40, 530, 440}));
+
+    tolmonetsync::KelpHTMLView::ClipRectList list;
+    view->UI_GetOSControlClipRects(list);
+    ASSERT_EQ(list.size(), 1u);
+    EXPECT_FALSE(list[0].first);
+    // The stage view's rectangle moved by the view's origin; the window's own place is not added.
+    EXPECT_EQ(list[0].second, (RectT<float>{60, 80, 560, 480}));
+
+    window.reset();
+    view.reset();
+    EXPECT_EQ(stage->UI_GetParent(), nullptr);
 }
 
 }  // namespace
