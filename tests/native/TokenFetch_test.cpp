@@ -23,32 +23,26 @@ using tolmonetsync::OvraConnection;
 const char kUserInfo[] = "OVRA_fetchDefaultUserInfoForClientId";
 const char kFetch[] = "OVRA_fetchAccessToken";
 
-class NativeTokenFetch : public ::testing::Test {
-protected:
-    NativeTokenFetch() : mFake(LoadFake(FAKE_OVRA_LIB)), mConnection(Connect(FAKE_OVRA_LIB)) {}
-
-    FakeOvraState& mFake;
-    boost::shared_ptr<OvraConnection> mConnection;
-};
-
-TEST_F(NativeTokenFetch, StagingTakesTheStagingSecretAndGivenValuesPassAsTheyAre)
+TEST(NativeTokenFetch, StagingTakesTheStagingSecretAndGivenValuesPassAsTheyAre)
 {
-    ASSERT_TRUE(mConnection->GetUserInfoAndFetchToken(false, Text("ann"), UTF8String(), UTF8String(), UTF8String()));
-    EXPECT_EQ(mFake.Calls(kUserInfo), 0);  // a named user is not looked up
-    EXPECT_EQ(mFake.Arguments("OVRA_createRef").at(1), "0");
-    EXPECT_EQ(mFake.Arguments(kFetch), (Strings{tolmonetsync::kTOLMO_OVRA_CLIENT_ID.ToStdString(),
-                                                tolmonetsync::kTOLMO_OVRA_CLIENT_SECRET_STAGE.ToStdString(), "ann", "",
-                                                "openid,HalvaneID,pellucid"}));
+    FakeOvraState& fake = LoadFake(FAKE_OVRA_LIB);
+    auto connection = Connect(FAKE_OVRA_LIB);
+    ASSERT_TRUE(connection->GetUserInfoAndFetchToken(false, Text("ann"), UTF8String(), UTF8String(), UTF8String()));
+    EXPECT_EQ(fake.Calls(kUserInfo), 0);  // a named user is not looked up
+    EXPECT_EQ(fake.Arguments("OVRA_createRef").at(1), "0");
+    EXPECT_EQ(fake.Arguments(kFetch), (Strings{tolmonetsync::kTOLMO_OVRA_CLIENT_ID.ToStdString(),
+                                               tolmonetsync::kTOLMO_OVRA_CLIENT_SECRET_STAGE.ToStdString(), "ann", "",
+                                               "openid,HalvaneID,pellucid"}));
 
     // The handle exists now: a later production flag changes nothing.
-    ASSERT_TRUE(mConnection->GetUserInfoAndFetchToken(true, Text("ann"), Text("cid"), Text("s<cret"), Text("sc")));
-    EXPECT_EQ(mFake.Calls("OVRA_createRef"), 1);
-    EXPECT_EQ(mFake.Arguments(kFetch), (Strings{"cid", "s<cret", "ann", "", "sc"}));
-    EXPECT_TRUE(mFake.WaitUntilIdle());
+    ASSERT_TRUE(connection->GetUserInfoAndFetchToken(true, Text("ann"), Text("cid"), Text("s<cret"), Text("sc")));
+    EXPECT_EQ(fake.Calls("OVRA_createRef"), 1);
+    EXPECT_EQ(fake.Arguments(kFetch), (Strings{"cid", "s<cret", "ann", "", "sc"}));
+    EXPECT_TRUE(fake.WaitUntilIdle());
 }
 
 // How each outcome of the library shows in the return value and the state.
-TEST_F(NativeTokenFetch, EachOutcomeOfTheLibraryShowsInTheFetchState)
+TEST(NativeTokenFetch, EachOutcomeOfTheLibraryShowsInTheFetchState)
 {
     struct Outcome {
         const char* mLabel;
@@ -98,22 +92,24 @@ TEST_F(NativeTokenFetch, EachOutcomeOfTheLibraryShowsInTheFetchState)
     EXPECT_TRUE(trace.Contains("ParseAccessTokenDetails error: "));
 }
 
-TEST_F(NativeTokenFetch, AnObjectGoneBeforeItsCallbackIsLeftAlone)
+TEST(NativeTokenFetch, AnObjectGoneBeforeItsCallbackIsLeftAlone)
 {
-    mFake.SetText(kFetch, "{\"access_token\": \"late\"}");
-    mFake.HoldCallbacks(true);
+    FakeOvraState& fake = LoadFake(FAKE_OVRA_LIB);
+    auto connection = Connect(FAKE_OVRA_LIB);
+    fake.SetText(kFetch, "{\"access_token\": \"late\"}");
+    fake.HoldCallbacks(true);
     Completions late;
     auto other = Connect(FAKE_OVRA_LIB);
-    ASSERT_TRUE(mConnection->GetUserInfoAndFetchToken(true, Text("ann"), UTF8String(), UTF8String(), UTF8String()));
+    ASSERT_TRUE(connection->GetUserInfoAndFetchToken(true, Text("ann"), UTF8String(), UTF8String(), UTF8String()));
     ASSERT_TRUE(other->AsyncFetchAccessToken(true, Text("ann"), Text("cid"), Text("secret"), Text("scope"),
                                              Completion(late, "late")));
-    mConnection.reset();
+    connection.reset();
     other.reset();
 
-    mFake.HoldCallbacks(false);
-    ASSERT_TRUE(mFake.WaitUntilIdle());
-    EXPECT_EQ(mFake.Calls(kFetch), 2);  // both callbacks were delivered...
-    EXPECT_EQ(late.Count(), 0u);        // ...and found nobody
+    fake.HoldCallbacks(false);
+    ASSERT_TRUE(fake.WaitUntilIdle());
+    EXPECT_EQ(fake.Calls(kFetch), 2);  // both callbacks were delivered...
+    EXPECT_EQ(late.Count(), 0u);       // ...and found nobody
 }
 
 // The whole way of a native sign-in for the library's default user: the

@@ -45,7 +45,6 @@ public:
     IdentityService();
 
     tolmonetsync::server::LocalService& Service() { return *mService; }
-    std::string AssetUrl() { return mService->AssetServiceUrl(); }
 
     // A client of this service as a host makes it, without a token; one that
     // signs in from the environment with `autoSignIn`.

@@ -33,17 +33,12 @@ Tracker& TheTracker()
     return sTracker;
 }
 
-std::vector<LoopFrame>::reverse_iterator Innermost(Tracker& tracker, OS_Dialog& dialog)
-{
-    return std::find_if(tracker.frames.rbegin(), tracker.frames.rend(),
-                        [&](const LoopFrame& frame) { return frame.dialog == &dialog; });
-}
-
 void Observe(OS_Dialog& dialog, ModalLoopEvent event)
 {
     Tracker& tracker = TheTracker();
     std::lock_guard<std::mutex> lock(tracker.mutex);
-    const auto frame = Innermost(tracker, dialog);
+    const auto frame = std::find_if(tracker.frames.rbegin(), tracker.frames.rend(),
+                                    [&](const LoopFrame& frame) { return frame.dialog == &dialog; });
     switch (event) {
         case ModalLoopEvent_Started:
             tracker.frames.push_back({&dialog, tracker.closedBeforeLoop.erase(&dialog) > 0});

@@ -21,13 +21,14 @@ namespace uitest {
 using namespace tolmoui;
 using tolmonetsync::SyncAuthenticationValidator;
 
+// Filled in as for a returning user, ann:secret.
 struct DialogArguments {
     UTF16String title = UTF16String(u"Sign in");
     UTF16String message = UTF16String(u"Sign in with your Halvane ID.");
     UTF16String userNameLabel = UTF16String(u"User name:");
-    UTF16String userName;
+    UTF16String userName = UTF16String(u"ann");
     UTF16String passwordLabel = UTF16String(u"Password:");
-    UTF16String password;
+    UTF16String password = UTF16String(u"secret");
     boost::shared_ptr<SyncAuthenticationValidator> validator;
     boost::shared_ptr<UI_MessageBox::MessageCallback> messageCallback;
     UTF16String userNameLinkText, userNameLinkURL, passwordLinkText, passwordLinkURL;

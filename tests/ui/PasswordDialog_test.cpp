@@ -22,21 +22,13 @@ std::string N(const UTF16String& text)
     return ToNarrow(text);
 }
 
-DialogArguments Filled()
-{
-    DialogArguments arguments;
-    arguments.userName = UTF16String(u"ann");
-    arguments.password = UTF16String(u"secret");
-    return arguments;
-}
-
 // Without a validator OK never closes; Cancel and the close box give false
 // and hand back what was typed.
 TEST(PasswordDialog, ShowsTheStartingValuesAndGivesBackTheTypedOnesOnCancelOrClose)
 {
     for (const bool closeBox : {false, true}) {
         SCOPED_TRACE(closeBox ? "close box" : "cancel");
-        DialogRun run(Filled());
+        DialogRun run((DialogArguments()));
         ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
             EXPECT_EQ(N(box.GetTitle()), "Sign in");
             EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
@@ -75,7 +67,7 @@ TEST(PasswordDialog, ShowsTheStartingValuesAndGivesBackTheTypedOnesOnCancelOrClo
 TEST(PasswordDialog, OneEmptyValueDisablesOKUntilBothHoldTextAndAnAcceptingValidatorCloses)
 {
     DialogArguments arguments;
-    arguments.userName = UTF16String(u"ann");
+    arguments.password = UTF16String();
     std::vector<std::string> asked;  // written on the UI thread, read after it ended
     arguments.validator = Validator([&](const UTF16String& user, const UTF16String& password, UTF16String&) {
         asked.push_back(N(user) + ":" + N(password));
@@ -102,7 +94,7 @@ TEST(PasswordDialog, OneEmptyValueDisablesOKUntilBothHoldTextAndAnAcceptingValid
 TEST(PasswordDialog, ARefusalShowsItsErrorUntilTheUserTypesAndKeepsTheDialogOpen)
 {
     std::vector<std::string> asked;  // written on the UI thread, read inside the loop
-    DialogArguments arguments = Filled();
+    DialogArguments arguments;
     // Refuses: "first refusal" the first time, "second refusal" after.
     arguments.validator = Validator([&](const UTF16String& user, const UTF16String& password, UTF16String& error) {
         asked.push_back(N(user) + ":" + N(password));
@@ -136,7 +128,7 @@ TEST(PasswordDialog, ARefusalShowsItsErrorUntilTheUserTypesAndKeepsTheDialogOpen
 TEST(PasswordDialog, ALinkOpensItsOwnURLAndOneWithoutAURLOpensNothing)
 {
     testsupport::OpenerRecorder opener;
-    DialogArguments arguments = Filled();
+    DialogArguments arguments;
     arguments.userNameLinkText = UTF16String(u"Create an account");
     arguments.passwordLinkText = UTF16String(u"Forgot your password?");
     arguments.passwordLinkURL = UTF16String(u"https://id.example.test/reset");
@@ -190,13 +182,12 @@ TEST(SignInDialog, AWrongPasswordShowsTheServicesTextAndTheRightOneGetsIn)
     testsupport::IdentityService service;
     const auto client = service.Client();
     DialogArguments arguments;
-    arguments.userName = UTF16String(u"ann");
     arguments.password = UTF16String(u"wrong");
     arguments.validator = SignInValidator(client);
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
         EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
-        EXPECT_EQ(ToNarrow(MessageText(box)), kFailedText);
+        EXPECT_EQ(N(MessageText(box)), kFailedText);
         EXPECT_TRUE(box.IsInModalLoop());
     }));
     EXPECT_EQ(testsupport::RootStatus(client), 401);  // no token yet
@@ -205,7 +196,7 @@ TEST(SignInDialog, AWrongPasswordShowsTheServicesTextAndTheRightOneGetsIn)
         box.HandleButtonClick(kDialogResponse_OK);
     }));
     EXPECT_TRUE(run.Finish());
-    EXPECT_EQ(ToNarrow(run.Arguments().userName), "ann");
+    EXPECT_EQ(N(run.Arguments().userName), "ann");
     EXPECT_EQ(testsupport::RootStatus(client), 200);
 }
 

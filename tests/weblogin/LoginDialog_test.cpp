@@ -11,26 +11,17 @@ using namespace weblogin;
 using tolmoui::PointT;
 using tolmoui::RectT;
 
-void GiveSize(int width, int height)
-{
-    MerrowLoginExtensionInfo info;
-    info.mSizeGetter = [width, height](PointT<int>& size) {
-        size.x = width;
-        size.y = height;
-    };
-    SetMerrowLoginExtensionInfo(info);
-}
-
 TEST_F(WebSignIn, TheDialogSizeIsTheHostsOnlyWhenBothValuesArePositive)
 {
     const struct {
-        int width, height;
-        float expectedWidth, expectedHeight;
-    } cases[] = {{0, 500, 800, 600}, {-1, -1, 800, 600}, {1024, 0, 800, 600}, {1024, 700, 1024, 700}};
+        PointT<int> mGiven;
+        PointT<float> mExpected;
+    } cases[] = {{{0, 500}, {800, 600}}, {{-1, -1}, {800, 600}}, {{1024, 0}, {800, 600}}, {{1024, 700}, {1024, 700}}};
     for (const auto& c : cases) {
-        GiveSize(c.width, c.height);
-        const PointT<float> size = MerrowLoginDialogImpl::GetDialogSize();
-        EXPECT_EQ(size, (PointT<float>{c.expectedWidth, c.expectedHeight})) << c.width << "x" << c.height;
+        MerrowLoginExtensionInfo info;
+        info.mSizeGetter = [c](PointT<int>& size) { size = c.mGiven; };
+        SetMerrowLoginExtensionInfo(info);
+        EXPECT_EQ(MerrowLoginDialogImpl::GetDialogSize(), c.mExpected) << c.mGiven.x << "x" << c.mGiven.y;
     }
     MerrowLoginExtensionInfo none;  // no size getter
     SetMerrowLoginExtensionInfo(none);

@@ -12,11 +12,6 @@ std::string Text(const UTF8String& text)
     return text.ToStdString();
 }
 
-UTF8String Text(const std::string& text)
-{
-    return UTF8String(text);
-}
-
 std::string TokenEvent(const std::string& token, const std::string& userID, const std::string& email)
 {
     boost::json::object event{{"token", token}, {"userID", userID}};
@@ -31,14 +26,14 @@ SignInRun::SignInRun(const CredentialsRecorder& recorder, OvraAuth_Scheme scheme
         recorder.Add(Delivered{credentials, std::this_thread::get_id(), tessel::TesselHost::Get().OnHostThread()});
     };
     mThread = std::thread([this, callback, scheme, clientID, locale] {
-        mResult = DoMerrowLoginDialog(nullptr, nullptr, Text(clientID), callback, Text(locale), scheme);
+        mResult = DoMerrowLoginDialog(nullptr, nullptr, UTF8String(clientID), callback, UTF8String(locale), scheme);
     });
 }
 
 SignInRun::~SignInRun()
 {
     // A test that failed half way still ends its dialog.
-    if (!mJoined) {
+    if (mThread.joinable()) {
         CloseByHand();
         mThread.join();
     }
@@ -46,10 +41,7 @@ SignInRun::~SignInRun()
 
 bool SignInRun::Result()
 {
-    if (!mJoined) {
-        mThread.join();
-        mJoined = true;
-    }
+    if (mThread.joinable()) mThread.join();
     return mResult;
 }
 

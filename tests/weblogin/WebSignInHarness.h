@@ -24,7 +24,6 @@ namespace weblogin {
 using namespace tolmonetsync;
 
 std::string Text(const UTF8String& text);
-UTF8String Text(const std::string& text);
 
 std::string TokenEvent(const std::string& token, const std::string& userID, const std::string& email);
 
@@ -49,7 +48,6 @@ public:
 private:
     std::thread mThread;
     bool mResult = false;
-    bool mJoined = false;
 };
 
 // The dialog of the running sign-in, or null.
