@@ -23,8 +23,6 @@ using tolmocore::utility::ToNarrow;
 using tolmonetsync::server::FaultAction_Status;
 using tolmonetsync::server::FaultRule;
 
-const char kFailedText[] =
-    "Authentication failed. Check network connection, Halvane ID, and password. Please try again.";
 const char kDeniedText[] =
     "You do not have access to this service. Contact your IT administrator to gain access or sign in with an "
     "Halvane ID.";
@@ -188,8 +186,6 @@ TEST(IdentityWire, EachCallPutsItsRequestOnTheWireAsTheServiceReadsIt)
         EXPECT_TRUE(request.mBody.empty());
     }
 }
-
-// --- a host's stored sign-in ---
 
 TEST(StoredSignIn, SurvivesANewClientFailsOnceWithdrawnIsRefreshedAndForgottenOnLogout)
 {

@@ -14,6 +14,10 @@
 
 namespace testsupport {
 
+// What a refused sign-in shows the user.
+const char kFailedText[] =
+    "Authentication failed. Check network connection, Halvane ID, and password. Please try again.";
+
 // What the handler of one identity call was given.
 struct Answered {
     int mCalls = 0;

@@ -44,8 +44,7 @@ TEST(PasswordDialog, ShowsTheStartingValuesAndGivesBackTheTypedOnesOnCancelOrClo
             EXPECT_EQ(password->GetFlags(), 0x20);  // masked
             EXPECT_EQ(N(box.FindDescendantAs<UI_StaticText>("UserNameStaticText")->GetValue()), "User name:");
             EXPECT_EQ(N(box.FindDescendantAs<UI_StaticText>("PasswordStaticText")->GetValue()), "Password:");
-            EXPECT_FALSE(Link(box, "UserNameLinkHotTextButton"));
-            EXPECT_FALSE(Link(box, "PasswordLinkHotTextButton"));
+            EXPECT_FALSE(Link(box, "UserNameLinkHotTextButton") || Link(box, "PasswordLinkHotTextButton"));
             EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
             EXPECT_TRUE(MessageText(box).empty());  // the empty error
             EXPECT_TRUE(box.IsInModalLoop());
@@ -158,9 +157,6 @@ TEST(PasswordDialog, ALinkOpensItsOwnURLAndOneWithoutAURLOpensNothing)
 // The password dialog as a host uses it: its validator signs in against the
 // local service and hands the credentials to a client of the asset service.
 
-const char kFailedText[] =
-    "Authentication failed. Check network connection, Halvane ID, and password. Please try again.";
-
 // Accepts once `client` reports itself connected with the new tokens; a
 // refusal shows the service's text. Blocks the UI thread, as a host's would.
 boost::shared_ptr<SyncAuthenticationValidator> SignInValidator(
@@ -187,7 +183,7 @@ TEST(SignInDialog, AWrongPasswordShowsTheServicesTextAndTheRightOneGetsIn)
     DialogRun run(arguments);
     ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
         EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
-        EXPECT_EQ(N(MessageText(box)), kFailedText);
+        EXPECT_EQ(N(MessageText(box)), testsupport::kFailedText);
         EXPECT_TRUE(box.IsInModalLoop());
     }));
     EXPECT_EQ(testsupport::RootStatus(client), 401);  // no token yet
