@@ -1,13 +1,18 @@
 // The identity calls against the local service: what each answers, how a
-// refusal and an unreadable answer reach the handler, and a host's stored
-// sign-in from the first check to a refreshed token.
+// refusal and an unreadable answer reach the handler, what goes out on the
+// wire; a host's stored sign-in from the first check to a refreshed token,
+// and the sign-in from the environment.
 
 #include <gtest/gtest.h>
 
+#include <climits>
+#include <cstdlib>
 #include <functional>
 
 #include "server/FaultHooks.h"
+#include "support/CallRecorder.h"
 #include "support/IdentityService.h"
+#include "support/LoopbackHttpServer.h"
 #include "support/TestScopes.h"
 
 namespace {
@@ -18,8 +23,6 @@ using tolmocore::utility::ToNarrow;
 using tolmonetsync::server::FaultAction_Status;
 using tolmonetsync::server::FaultRule;
 
-const char kFailedText[] =
-    "Authentication failed. Check network connection, Halvane ID, and password. Please try again.";
 const char kDeniedText[] =
     "You do not have access to this service. Contact your IT administrator to gain access or sign in with an "
     "Halvane ID.";
@@ -122,7 +125,67 @@ TEST(IdentityCalls, UnreadableAnswersReachTheHandlerOnce)
     }
 }
 
-// --- a host's stored sign-in ---
+// "https://host" as a query value: only A-Z a-z 0-9 _ . - go out as they are.
+std::string QuotedURL(const std::string& url)
+{
+    std::string quoted;
+    for (const char c : url) quoted += c == ':' ? "%3a" : c == '/' ? "%2f" : std::string(1, c);
+    return quoted;
+}
+
+// The identity calls as they reach the wire, read by a plain recording
+// server rather than by the local service's lenient parser: method, whole
+// target (path, query keys in order, fixed values, quoting), content type
+// and body.
+TEST(IdentityWire, EachCallPutsItsRequestOnTheWireAsTheServiceReadsIt)
+{
+    CallRecorder<HttpRequest> arrived;
+    LoopbackHttpServer server([arrived](const HttpRequest& request) {
+        arrived.Add(request);
+        HttpAnswer answer;
+        answer.mBody = "{}";
+        return answer;
+    });
+    IdentityURLScope url(server.Url("/ovra"));
+    // The built-in client, its production secret and redirect: GUID-like
+    // texts and a URL whose host needs no quoting.
+    const std::string client = "client_id=" + kTOLMO_OVRA_CLIENT_ID.ToStdString() +
+                               "&client_secret=" + kTOLMO_OVRA_CLIENT_SECRET_GM.ToStdString();
+    const std::string redirect = "redirect_uri=" + QuotedURL(kOVRA_GM_SERVER_REDIRECT.ToStdString());
+    const std::string token = "tok/+=1";  // needs quoting in a query
+
+    const struct {
+        const char* mLabel;
+        std::function<void()> mCall;
+        std::string mMethod;
+        std::string mTarget;
+        bool mForm;
+    } cases[] = {
+        {"sign-in", [] { SignIn("ann", "p&ss w=rd"); }, "POST",
+         "/ovra/login/v1/device?username=ann&password=p%26ss%20w%3drd&" + client +
+             "&device_id=device-1&device_name=Desktop&scope=openid%2cpellucid&" + redirect + "&locale=en_US",
+         true},
+        {"refresh", [&] { Refresh(token); }, "POST",
+         "/ovra/token/v1?" + client + "&grant_type=refresh_token&scope=openid%2cpellucid&" + redirect +
+             "&refresh_token=tok%2f%2b%3d1",
+         true},
+        {"sign-out", [&] { SignOut(token); }, "POST",
+         "/ovra/invalidate_token/v1?token_type=device_token&token=tok%2f%2b%3d1&cascading=all", true},
+        // The profile's token goes out as it stands.
+        {"profile", [&] { Profile(token); }, "GET", "/ovra/profile/v1?bearer_token=tok/+=1", false},
+    };
+    for (const auto& wire : cases) {
+        SCOPED_TRACE(wire.mLabel);
+        const size_t before = arrived.Count();
+        wire.mCall();
+        ASSERT_EQ(arrived.Count(), before + 1);
+        const HttpRequest request = arrived.Last();
+        EXPECT_EQ(request.mMethod, wire.mMethod);
+        EXPECT_EQ(request.mTarget, wire.mTarget);
+        EXPECT_EQ(request.Header("Content-Type"), wire.mForm ? "application/x-www-form-urlencoded" : "");
+        EXPECT_TRUE(request.mBody.empty());
+    }
+}
 
 TEST(StoredSignIn, SurvivesANewClientFailsOnceWithdrawnIsRefreshedAndForgottenOnLogout)
 {
@@ -155,6 +218,44 @@ TEST(StoredSignIn, SurvivesANewClientFailsOnceWithdrawnIsRefreshedAndForgottenOn
     EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return client->Logout(report); }),
               SyncServer_NotLoggedIn);
     EXPECT_EQ(check(service.Client()), SyncServer_NotLoggedIn);
+}
+
+// The environment sign-in keeps its state for the whole process and never
+// resets it, so its whole life is one test: a refusal keeps nothing, one
+// sign-in serves every client, and a refused token brings a new sign-in.
+TEST(EnvironmentLogin, OneSignInServesTheProcessUntilTheServiceRefusesItsToken)
+{
+    IdentityService service;
+    // Counts the sign-ins the service sees; never fires.
+    server::FaultRule counter;
+    counter.mPathPattern = "/ovra/login/.*";
+    counter.mNth = INT_MAX;
+    const auto signIns = service.Service().Faults().Install(counter);
+    setenv("TOLMONETSYNC_USERNAME", "ann", 1);
+
+    setenv("TOLMONETSYNC_PASSWORD", "wrong", 1);
+    try {
+        service.Client(true);
+        FAIL() << "no exception";
+    } catch (const std::runtime_error& e) {
+        EXPECT_STREQ(e.what(), "doOvraLogin failed");
+    }
+
+    setenv("TOLMONETSYNC_PASSWORD", "secret", 1);  // the next try signs in
+    const auto first = service.Client(true);
+    const auto second = service.Client(true);
+    EXPECT_EQ(signIns->Seen(), 2);
+    EXPECT_EQ(RootStatus(second), 200);
+    // Such a client holds a working token, yet nothing is stored for a check.
+    EXPECT_EQ(WaitForState([&](const ConnectionStateCallback& report) { return second->CheckConnection(report); }),
+              SyncServer_NotLoggedIn);
+
+    service.Service().GetAccounts().ExpireTokensOf("ann");
+    const auto later = service.Client(true);
+    EXPECT_EQ(signIns->Seen(), 3);
+    EXPECT_EQ(RootStatus(later), 200);
+    unsetenv("TOLMONETSYNC_USERNAME");
+    unsetenv("TOLMONETSYNC_PASSWORD");
 }
 
 }  // namespace

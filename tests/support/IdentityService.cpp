@@ -10,11 +10,6 @@ using namespace tolmonetsync;
 
 namespace {
 
-UTF8String Text(const std::string& text)
-{
-    return UTF8String(text.begin(), text.end());
-}
-
 using Calls = CallRecorder<Answered>;
 
 OvraResponseHandler Recording(const Calls& calls)
@@ -39,32 +34,33 @@ Answered Summary(const Calls& calls, const Guid& sent)
 Answered SignIn(const std::string& user, const std::string& password)
 {
     Calls calls;
-    return Summary(calls, OvraAuthenticate(OvraAuth_GM, Recording(calls), Text(user), Text(password), Text("device-1"),
-                                           UTF8String(), UTF8String(), UTF8String(), UTF8String(), UTF8String()));
+    return Summary(calls, OvraAuthenticate(OvraAuth_GM, Recording(calls), UTF8String(user), UTF8String(password),
+                                           UTF8String("device-1"), UTF8String(), UTF8String(), UTF8String(),
+                                           UTF8String(), UTF8String()));
 }
 
 Answered Refresh(const std::string& refreshToken)
 {
     Calls calls;
-    return Summary(calls, OvraRefreshAuthenticate(OvraAuth_GM, Recording(calls), Text(refreshToken), UTF8String(),
+    return Summary(calls, OvraRefreshAuthenticate(OvraAuth_GM, Recording(calls), UTF8String(refreshToken), UTF8String(),
                                                   UTF8String(), UTF8String(), UTF8String()));
 }
 
 Answered Profile(const std::string& accessToken)
 {
     Calls calls;
-    return Summary(calls, OvraProfile(OvraAuth_GM, Text(accessToken), Recording(calls)));
+    return Summary(calls, OvraProfile(OvraAuth_GM, UTF8String(accessToken), Recording(calls)));
 }
 
 Answered SignOut(const std::string& deviceToken)
 {
     Calls calls;
-    return Summary(calls, OvraLogout(OvraAuth_GM, Recording(calls), Text(deviceToken), UTF8String()));
+    return Summary(calls, OvraLogout(OvraAuth_GM, Recording(calls), UTF8String(deviceToken), UTF8String()));
 }
 
 IdentityURLScope::IdentityURLScope(const std::string& url)
 {
-    SetOvraServiceURL(Text(url));
+    SetOvraServiceURL(UTF8String(url));
 }
 
 IdentityURLScope::~IdentityURLScope()
@@ -85,9 +81,9 @@ IdentityService::IdentityService()
 boost::shared_ptr<tarnvault::Tarnvault> IdentityService::Client(bool autoSignIn)
 {
     ParameterList parameters;
-    parameters.emplace_back(tolmonet::kHEADER_LOCATION, Text(mService->AssetServiceUrl()));
-    parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, Text("identity-tests"));
-    if (autoSignIn) parameters.emplace_back(tolmonet::kHEADER_SET_COOKIE, Text("auto"));
+    parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(mService->AssetServiceUrl()));
+    parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, UTF8String("identity-tests"));
+    if (autoSignIn) parameters.emplace_back(tolmonet::kHEADER_SET_COOKIE, UTF8String("auto"));
     return boost::shared_ptr<tarnvault::Tarnvault>(new tarnvault::Tarnvault(parameters));
 }
 

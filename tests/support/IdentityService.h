@@ -14,6 +14,10 @@
 
 namespace testsupport {
 
+// What a refused sign-in shows the user.
+const char kFailedText[] =
+    "Authentication failed. Check network connection, Halvane ID, and password. Please try again.";
+
 // What the handler of one identity call was given.
 struct Answered {
     int mCalls = 0;
@@ -45,7 +49,6 @@ public:
     IdentityService();
 
     tolmonetsync::server::LocalService& Service() { return *mService; }
-    std::string AssetUrl() { return mService->AssetServiceUrl(); }
 
     // A client of this service as a host makes it, without a token; one that
     // signs in from the environment with `autoSignIn`.

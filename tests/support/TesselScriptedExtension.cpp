@@ -5,8 +5,6 @@
 
 namespace tessel {
 
-ScriptedExtension::ScriptedExtension(const std::string& id, const ExtensionScript& script) : mId(id), mScript(script) {}
-
 boost::shared_ptr<ScriptedExtension> ScriptedExtension::Register(const std::string& id, const ExtensionScript& script)
 {
     const boost::shared_ptr<ScriptedExtension> extension(new ScriptedExtension(id, script));
@@ -27,85 +25,29 @@ void ScriptedExtension::Send(const std::string& type, const boost::optional<std:
 
 void ScriptedExtension::ReleaseUnloaded()
 {
-    int held = 0;
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        std::swap(held, mHeldUnloads);
-    }
-    for (int i = 0; i < held; ++i) Ended();
-}
-
-std::vector<OwnedEvent> ScriptedExtension::Initializations() const
-{
-    std::lock_guard<std::mutex> lock(mMutex);
-    return mInitializations;
-}
-
-boost::optional<OwnedEvent> ScriptedExtension::WaitForInitialization(int count, int milliseconds) const
-{
-    std::unique_lock<std::mutex> lock(mMutex);
-    const bool came = mChanged.wait_for(lock, std::chrono::milliseconds(milliseconds),
-                                        [&] { return int(mInitializations.size()) >= count; });
-    if (!came || count < 1) return boost::none;
-    return mInitializations[count - 1];
-}
-
-int ScriptedExtension::Loads() const
-{
-    std::lock_guard<std::mutex> lock(mMutex);
-    return mLoads;
-}
-
-int ScriptedExtension::Unloads() const
-{
-    std::lock_guard<std::mutex> lock(mMutex);
-    return mUnloads;
-}
-
-bool ScriptedExtension::WaitForUnloads(int count, int milliseconds) const
-{
-    std::unique_lock<std::mutex> lock(mMutex);
-    return mChanged.wait_for(lock, std::chrono::milliseconds(milliseconds), [&] { return mUnloads >= count; });
-}
-
-bool ScriptedExtension::WaitForUnloadedEvents(int count, int milliseconds) const
-{
-    std::unique_lock<std::mutex> lock(mMutex);
-    return mChanged.wait_for(lock, std::chrono::milliseconds(milliseconds), [&] { return mUnloadedEvents >= count; });
+    for (int held = mHeldUnloads.exchange(0); held > 0; --held) Ended();
 }
 
 void ScriptedExtension::OnLoad()
 {
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        ++mLoads;
-    }
-    mChanged.notify_all();
+    mLoads.Add(true);
     if (mScript.mReadyOnLoad) SendReady();
 }
 
 void ScriptedExtension::OnUnload()
 {
-    // Ended first, so that a test woken by the count finds the event queued.
-    if (!mScript.mHoldUnloaded) Ended();
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        ++mUnloads;
-        if (mScript.mHoldUnloaded) ++mHeldUnloads;
-    }
-    mChanged.notify_all();
+    // Ended or held first, so that a test woken by the count finds it so.
+    if (mScript.mHoldUnloaded)
+        ++mHeldUnloads;
+    else
+        Ended();
+    mUnloads.Add(true);
 }
 
 void ScriptedExtension::Ended()
 {
     const boost::shared_ptr<ScriptedExtension> self = shared_from_this();
-    TesselHost::Get().Ended(mId, mScript.mUnloadDelay, [self] {
-        {
-            std::lock_guard<std::mutex> lock(self->mMutex);
-            ++self->mUnloadedEvents;
-        }
-        self->mChanged.notify_all();
-    });
+    TesselHost::Get().Ended(mId, std::chrono::milliseconds(0), [self] { self->mUnloadedEvents.Add(true); });
 }
 
 void ScriptedExtension::OnEvent(const OwnedEvent& event)
@@ -113,11 +55,7 @@ void ScriptedExtension::OnEvent(const OwnedEvent& event)
     if (event.Type() != mScript.mInitializationEventType) return;
     // The answer is queued before the test can see the initialisation.
     if (mScript.mAnswerData) Send(mScript.mAnswerEventType, mScript.mAnswerData);
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        mInitializations.push_back(event);
-    }
-    mChanged.notify_all();
+    mInitializations.Add(event);
 }
 
 void SendHostEvent(const std::string& type, const boost::optional<std::string>& data)
@@ -126,18 +64,13 @@ void SendHostEvent(const std::string& type, const boost::optional<std::string>& 
     TesselHost::Get().Post([event] { TesselHost::Get().Deliver(event); });
 }
 
-bool FlushHost(int milliseconds)
+bool FlushHost()
 {
     // Tasks due at once run in the order posted: this one runs after them.
     if (TesselHost::Get().OnHostThread()) return false;
     const boost::shared_ptr<tolmocore::threads::Gate> ran(new tolmocore::threads::Gate(false));
     TesselHost::Get().Post([ran] { ran->Open(); });
-    return ran->PassThrough(milliseconds);
-}
-
-void UnregisterExtension(const std::string& id)
-{
-    TesselHost::Get().Unregister(id);
+    return ran->PassThrough(30000);
 }
 
 }  // namespace tessel

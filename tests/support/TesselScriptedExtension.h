@@ -2,22 +2,20 @@
 // Extensions for tests of code that talks to the extension host: each follows
 // a script, and the test reads what it was sent and steers what it sends.
 //
-// A test makes one, registers it under its identifier, and the code under
-// test loads it with TesselLoadExtension. Every event the extension sends
-// goes out on the host's thread, after the call that caused it has returned.
-// Members for the test may be called from any thread.
+// A test registers one under its identifier, and the code under test loads
+// it with TesselLoadExtension. Every event the extension sends goes out on
+// the host's thread, after the call that caused it has returned. Members for
+// the test may be used from any thread.
 
-#include <chrono>
-#include <condition_variable>
-#include <mutex>
+#include <atomic>
 #include <string>
-#include <vector>
 
 #include <boost/enable_shared_from_this.hpp>
 #include <boost/optional.hpp>
 #include <boost/shared_ptr.hpp>
 
 #include "foundation/tessel/TesselExtension.h"
+#include "support/CallRecorder.h"
 
 namespace tessel {
 
@@ -32,39 +30,27 @@ struct ExtensionScript {
     std::string mInitializationEventType;
     std::string mAnswerEventType;
     boost::optional<std::string> mAnswerData;
-    // How long the extension takes to end once unloaded, until the host's
-    // unloaded event; with mHoldUnloaded it ends only on ReleaseUnloaded.
-    std::chrono::milliseconds mUnloadDelay{0};
+    // The extension ends, and the host sends its unloaded event, only on ReleaseUnloaded.
     bool mHoldUnloaded = false;
 };
 
 class ScriptedExtension : public TesselExtension, public boost::enable_shared_from_this<ScriptedExtension> {
 public:
-    ScriptedExtension(const std::string& id, const ExtensionScript& script);
-
     // Makes one and registers it with the host, replacing any of its id.
     static boost::shared_ptr<ScriptedExtension> Register(const std::string& id, const ExtensionScript& script);
 
     // Sends the ready event of the script (meant for mReadyOnLoad false).
     void SendReady();
-    // Sends an event of its own, as the page inside it would.
-    void Send(const std::string& type, const boost::optional<std::string>& data);
-    // Lets a held unload finish: the unloaded event follows after the delay.
+    // Lets the held unloads end.
     void ReleaseUnloaded();
 
-    // Every initialisation event received, in order.
-    std::vector<OwnedEvent> Initializations() const;
-    // Waits for the count-th initialisation event; none on time-out. Its
-    // answer, if any, is already on its way: a FlushHost after this returns
-    // sees it delivered.
-    boost::optional<OwnedEvent> WaitForInitialization(int count, int milliseconds) const;
-    int Loads() const;
-    int Unloads() const;
-    // Waits until the extension has been unloaded `count` times; false on time-out.
-    bool WaitForUnloads(int count, int milliseconds) const;
-    // Waits until the host has delivered `count` unloaded events for the
-    // extension to every listener; false on time-out.
-    bool WaitForUnloadedEvents(int count, int milliseconds) const;
+    // Every initialisation event received, in order. Its answer, if any, is
+    // already on its way when it is recorded: a FlushHost after the wait sees it delivered.
+    const testsupport::CallRecorder<OwnedEvent> mInitializations;
+    const testsupport::CallRecorder<bool> mLoads;
+    const testsupport::CallRecorder<bool> mUnloads;
+    // The unloaded events the host has delivered to every listener.
+    const testsupport::CallRecorder<bool> mUnloadedEvents;
 
     const std::string& Id() const override { return mId; }
     void OnLoad() override;
@@ -72,24 +58,18 @@ public:
     void OnEvent(const OwnedEvent& event) override;
 
 private:
+    ScriptedExtension(const std::string& id, const ExtensionScript& script) : mId(id), mScript(script) {}
+    void Send(const std::string& type, const boost::optional<std::string>& data);
     void Ended();
 
     const std::string mId;
     const ExtensionScript mScript;
-    mutable std::mutex mMutex;  // guards the fields below
-    mutable std::condition_variable mChanged;
-    std::vector<OwnedEvent> mInitializations;
-    int mLoads = 0;
-    int mUnloadedEvents = 0;
-    int mUnloads = 0;
-    int mHeldUnloads = 0;
+    std::atomic<int> mHeldUnloads{0};
 };
 
 // Sends an event as the host itself would, to the listeners of its type.
 void SendHostEvent(const std::string& type, const boost::optional<std::string>& data);
-// Waits until the host's thread has run everything due now; false on time-out.
-bool FlushHost(int milliseconds);
-// Forgets the extension of this identifier.
-void UnregisterExtension(const std::string& id);
+// Waits until the host's thread has run everything due now; false after 30 s.
+bool FlushHost();
 
 }  // namespace tessel

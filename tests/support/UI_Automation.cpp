@@ -6,7 +6,6 @@
 #include <memory>
 #include <mutex>
 #include <set>
-#include <thread>
 #include <vector>
 
 #include "foundation/ui/ModalLoops.h"
@@ -17,7 +16,6 @@ namespace {
 
 struct LoopFrame {
     OS_Dialog* dialog;
-    std::thread::id thread;
     bool closing;
 };
 
@@ -35,21 +33,15 @@ Tracker& TheTracker()
     return sTracker;
 }
 
-std::vector<LoopFrame>::reverse_iterator Innermost(Tracker& tracker, OS_Dialog& dialog)
-{
-    return std::find_if(tracker.frames.rbegin(), tracker.frames.rend(),
-                        [&](const LoopFrame& frame) { return frame.dialog == &dialog; });
-}
-
 void Observe(OS_Dialog& dialog, ModalLoopEvent event)
 {
     Tracker& tracker = TheTracker();
     std::lock_guard<std::mutex> lock(tracker.mutex);
-    const auto frame = Innermost(tracker, dialog);
+    const auto frame = std::find_if(tracker.frames.rbegin(), tracker.frames.rend(),
+                                    [&](const LoopFrame& frame) { return frame.dialog == &dialog; });
     switch (event) {
         case ModalLoopEvent_Started:
-            tracker.frames.push_back(
-                {&dialog, std::this_thread::get_id(), tracker.closedBeforeLoop.erase(&dialog) > 0});
+            tracker.frames.push_back({&dialog, tracker.closedBeforeLoop.erase(&dialog) > 0});
             break;
         case ModalLoopEvent_Closing:
             if (frame == tracker.frames.rend())
@@ -67,18 +59,10 @@ void Observe(OS_Dialog& dialog, ModalLoopEvent event)
 // Installed before main, so that no loop of a test starts unseen.
 const bool sObserving = (ModalLoops::SetObserver(&Observe), true);
 
-using Clock = std::chrono::steady_clock;
-
-// Waits for `ready`; a negative time waits without limit.
 template <class Predicate>
-bool WaitFor(std::unique_lock<std::mutex>& lock, int milliseconds, Clock::time_point start, Predicate ready)
+bool WaitFor(std::unique_lock<std::mutex>& lock, Predicate ready)
 {
-    Tracker& tracker = TheTracker();
-    if (milliseconds < 0) {
-        tracker.changed.wait(lock, ready);
-        return true;
-    }
-    return tracker.changed.wait_until(lock, start + std::chrono::milliseconds(milliseconds), ready);
+    return TheTracker().changed.wait_for(lock, std::chrono::seconds(30), ready);
 }
 
 struct PostedAction {
@@ -88,7 +72,7 @@ struct PostedAction {
 
 }  // namespace
 
-boost::intrusive_ptr<UI_Dialog> WaitForModalDialog(int milliseconds)
+boost::intrusive_ptr<UI_Dialog> WaitForModalDialog()
 {
     (void)sObserving;
     Tracker& tracker = TheTracker();
@@ -97,28 +81,20 @@ boost::intrusive_ptr<UI_Dialog> WaitForModalDialog(int milliseconds)
     // A loop whose close is posted is ending: a test waiting for the next
     // dialog must not get the one it has just closed.
     auto open = [&] {
-        for (auto it = tracker.frames.rbegin(); it != tracker.frames.rend(); ++it) {
-            if (it->closing) continue;
-            found = dynamic_cast<UI_Dialog*>(it->dialog);
-            return found != nullptr;
-        }
-        return false;
+        const auto frame = std::find_if(tracker.frames.rbegin(), tracker.frames.rend(),
+                                        [](const LoopFrame& frame) { return !frame.closing; });
+        found = frame != tracker.frames.rend() ? dynamic_cast<UI_Dialog*>(frame->dialog) : nullptr;
+        return found != nullptr;
     };
-    if (!WaitFor(lock, milliseconds, Clock::now(), open)) return nullptr;
+    if (!WaitFor(lock, open)) return nullptr;
     return boost::intrusive_ptr<UI_Dialog>(found);
 }
 
-bool RunInModalLoop(const boost::function<void()>& action, int milliseconds)
+bool RunInModalLoop(const boost::function<void()>& action)
 {
-    const Clock::time_point start = Clock::now();
     Tracker& tracker = TheTracker();
     std::unique_lock<std::mutex> lock(tracker.mutex);
-    if (!tracker.frames.empty() && tracker.frames.back().thread == std::this_thread::get_id()) {
-        lock.unlock();
-        action();
-        return true;
-    }
-    if (!WaitFor(lock, milliseconds, start, [&] { return !tracker.frames.empty(); })) return false;
+    if (!WaitFor(lock, [&] { return !tracker.frames.empty(); })) return false;
     const auto posted = std::make_shared<PostedAction>();
     const bool taken = ModalLoops::Post(*tracker.frames.back().dialog, [posted, action] {
         Tracker& tracker = TheTracker();
@@ -133,7 +109,7 @@ bool RunInModalLoop(const boost::function<void()>& action, int milliseconds)
         tracker.changed.notify_all();
     });
     if (!taken) return false;
-    if (!WaitFor(lock, milliseconds, start, [&] { return posted->state != PostedAction::Waiting; })) {
+    if (!WaitFor(lock, [&] { return posted->state != PostedAction::Waiting; })) {
         // Not started in time: withdrawn, so that it never runs.
         posted->state = PostedAction::Withdrawn;
         return false;
@@ -142,11 +118,11 @@ bool RunInModalLoop(const boost::function<void()>& action, int milliseconds)
     return true;
 }
 
-bool WaitForModalLoopDepth(int depth, int milliseconds)
+bool WaitForModalLoopDepth(int depth)
 {
     Tracker& tracker = TheTracker();
     std::unique_lock<std::mutex> lock(tracker.mutex);
-    return WaitFor(lock, milliseconds, Clock::now(), [&] { return static_cast<int>(tracker.frames.size()) >= depth; });
+    return WaitFor(lock, [&] { return static_cast<int>(tracker.frames.size()) >= depth; });
 }
 
 bool SimulateTyping(UI_TextEdit& edit, const UTF16String& newValue)

@@ -13,8 +13,6 @@ namespace {
 
 using namespace tolmoui;
 
-const int kWaitMs = 30000;
-
 boost::intrusive_ptr<UI_MessageBox> MakeBox()
 {
     return new UI_MessageBox(nullptr, UTF16String(u"Title"), UTF16String(u"Message"),
@@ -22,41 +20,26 @@ boost::intrusive_ptr<UI_MessageBox> MakeBox()
                              kDialogResponse_OK, 3, nullptr, 0, 0, 0, nullptr);
 }
 
-// Runs a dialog's modal loop on a thread of its own; its response.
-std::future<int> RunModalOnAThread(const boost::intrusive_ptr<UI_MessageBox>& dialog)
-{
-    return std::async(std::launch::async, [dialog] { return dialog->RunModal(); });
-}
-
-class ModalLoop : public ::testing::Test {};
-
-TEST_F(ModalLoop, PostCloseFromAnotherThreadEndsRunModal)
-{
-    auto box = MakeBox();
-    auto loop = RunModalOnAThread(box);
-    ASSERT_EQ(WaitForModalDialog(kWaitMs), box);
-    EXPECT_TRUE(box->IsInModalLoop());
-    box->PostClose();
-    EXPECT_EQ(loop.get(), kDialogResponse_None);
-    EXPECT_FALSE(box->IsInModalLoop());
-}
-
-TEST_F(ModalLoop, NestedLoopsTakeActionsInnermostFirst)
+// The inner loop ends by a click inside it, the outer one by a close posted
+// from another thread.
+TEST(ModalLoop, NestedLoopsTakeActionsInnermostFirstAndPostCloseEndsALoop)
 {
     auto outer = MakeBox();
     auto inner = MakeBox();
-    auto loop = RunModalOnAThread(outer);
-    ASSERT_EQ(WaitForModalDialog(kWaitMs), outer);
+    auto loop = std::async(std::launch::async, [outer] { return outer->RunModal(); });
+    ASSERT_EQ(WaitForModalDialog(), outer);
     int innerResponse = -1;
-    std::thread opener([&] { RunInModalLoop([&] { innerResponse = inner->RunModal(); }, kWaitMs); });
-    ASSERT_TRUE(WaitForModalLoopDepth(2, kWaitMs));
-    EXPECT_EQ(WaitForModalDialog(kWaitMs), inner);
-    ASSERT_TRUE(RunInModalLoop([&] { inner->HandleButtonClick(kDialogResponse_OK); }, kWaitMs));
+    std::thread opener([&] { RunInModalLoop([&] { innerResponse = inner->RunModal(); }); });
+    ASSERT_TRUE(WaitForModalLoopDepth(2));
+    EXPECT_EQ(WaitForModalDialog(), inner);
+    ASSERT_TRUE(RunInModalLoop([&] { inner->HandleButtonClick(kDialogResponse_OK); }));
     opener.join();
     EXPECT_EQ(innerResponse, kDialogResponse_OK);
-    ASSERT_EQ(WaitForModalDialog(kWaitMs), outer);
-    ASSERT_TRUE(RunInModalLoop([&] { outer->HandleCloseBox(); }, kWaitMs));
-    EXPECT_EQ(loop.get(), kDialogResponse_Cancel);
+    ASSERT_EQ(WaitForModalDialog(), outer);
+    EXPECT_TRUE(outer->IsInModalLoop());
+    outer->PostClose();
+    EXPECT_EQ(loop.get(), kDialogResponse_None);
+    EXPECT_FALSE(outer->IsInModalLoop());
 }
 
 }  // namespace

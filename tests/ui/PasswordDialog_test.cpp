@@ -1,42 +1,34 @@
 // The password dialog driven through its modal loop as a user would: what
-// enables OK, what the validator's refusals show, what comes back, the links.
+// enables OK, what the validator's refusals show, what comes back, the links;
+// and as a host uses it, signing in against the local service.
 
 #include <gtest/gtest.h>
-
-#include <atomic>
 
 #include "DialogDriver.h"
 #include "foundation/core/Strings.h"
 #include "foundation/ui/UI_NodeManager.h"
+#include "support/IdentityService.h"
 #include "support/OpenerRecorder.h"
+#include "support/TestScopes.h"
 
 namespace {
 
 using namespace uitest;
 using tolmocore::utility::ToNarrow;
+using tolmocore::utility::UTF16to8;
 
 std::string N(const UTF16String& text)
 {
     return ToNarrow(text);
 }
 
-DialogArguments Filled()
-{
-    DialogArguments arguments;
-    arguments.userName = UTF16String(u"ann");
-    arguments.password = UTF16String(u"secret");
-    return arguments;
-}
-
-class PasswordDialog : public ::testing::Test {};
-
 // Without a validator OK never closes; Cancel and the close box give false
 // and hand back what was typed.
-TEST_F(PasswordDialog, ShowsTheStartingValuesAndGivesBackTheTypedOnesOnCancelOrClose)
+TEST(PasswordDialog, ShowsTheStartingValuesAndGivesBackTheTypedOnesOnCancelOrClose)
 {
     for (const bool closeBox : {false, true}) {
         SCOPED_TRACE(closeBox ? "close box" : "cancel");
-        DialogRun run(Filled());
+        DialogRun run((DialogArguments()));
         ASSERT_TRUE(run.Do([&](UI_MessageBox& box) {
             EXPECT_EQ(N(box.GetTitle()), "Sign in");
             EXPECT_EQ(N(MessageText(box)), "Sign in with your Halvane ID.");
@@ -52,8 +44,7 @@ TEST_F(PasswordDialog, ShowsTheStartingValuesAndGivesBackTheTypedOnesOnCancelOrC
             EXPECT_EQ(password->GetFlags(), 0x20);  // masked
             EXPECT_EQ(N(box.FindDescendantAs<UI_StaticText>("UserNameStaticText")->GetValue()), "User name:");
             EXPECT_EQ(N(box.FindDescendantAs<UI_StaticText>("PasswordStaticText")->GetValue()), "Password:");
-            EXPECT_FALSE(Link(box, "UserNameLinkHotTextButton"));
-            EXPECT_FALSE(Link(box, "PasswordLinkHotTextButton"));
+            EXPECT_FALSE(Link(box, "UserNameLinkHotTextButton") || Link(box, "PasswordLinkHotTextButton"));
             EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
             EXPECT_TRUE(MessageText(box).empty());  // the empty error
             EXPECT_TRUE(box.IsInModalLoop());
@@ -72,10 +63,10 @@ TEST_F(PasswordDialog, ShowsTheStartingValuesAndGivesBackTheTypedOnesOnCancelOrC
     }
 }
 
-TEST_F(PasswordDialog, OneEmptyValueDisablesOKUntilBothHoldTextAndAnAcceptingValidatorCloses)
+TEST(PasswordDialog, OneEmptyValueDisablesOKUntilBothHoldTextAndAnAcceptingValidatorCloses)
 {
     DialogArguments arguments;
-    arguments.userName = UTF16String(u"ann");
+    arguments.password = UTF16String();
     std::vector<std::string> asked;  // written on the UI thread, read after it ended
     arguments.validator = Validator([&](const UTF16String& user, const UTF16String& password, UTF16String&) {
         asked.push_back(N(user) + ":" + N(password));
@@ -99,10 +90,10 @@ TEST_F(PasswordDialog, OneEmptyValueDisablesOKUntilBothHoldTextAndAnAcceptingVal
     EXPECT_EQ(N(run.Arguments().password), "s");
 }
 
-TEST_F(PasswordDialog, ARefusalShowsItsErrorUntilTheUserTypesAndKeepsTheDialogOpen)
+TEST(PasswordDialog, ARefusalShowsItsErrorUntilTheUserTypesAndKeepsTheDialogOpen)
 {
     std::vector<std::string> asked;  // written on the UI thread, read inside the loop
-    DialogArguments arguments = Filled();
+    DialogArguments arguments;
     // Refuses: "first refusal" the first time, "second refusal" after.
     arguments.validator = Validator([&](const UTF16String& user, const UTF16String& password, UTF16String& error) {
         asked.push_back(N(user) + ":" + N(password));
@@ -133,10 +124,10 @@ TEST_F(PasswordDialog, ARefusalShowsItsErrorUntilTheUserTypesAndKeepsTheDialogOp
     EXPECT_TRUE(run.Do([](UI_MessageBox& box) { EXPECT_TRUE(box.IsInModalLoop()); }));
 }
 
-TEST_F(PasswordDialog, ALinkOpensItsOwnURLAndOneWithoutAURLOpensNothing)
+TEST(PasswordDialog, ALinkOpensItsOwnURLAndOneWithoutAURLOpensNothing)
 {
     testsupport::OpenerRecorder opener;
-    DialogArguments arguments = Filled();
+    DialogArguments arguments;
     arguments.userNameLinkText = UTF16String(u"Create an account");
     arguments.passwordLinkText = UTF16String(u"Forgot your password?");
     arguments.passwordLinkURL = UTF16String(u"https://id.example.test/reset");
@@ -161,6 +152,48 @@ TEST_F(PasswordDialog, ALinkOpensItsOwnURLAndOneWithoutAURLOpensNothing)
     }));
     ASSERT_EQ(opener.Opened().size(), 2u);
     EXPECT_EQ(opener.Opened()[1], "http://id.example.test/new");
+}
+
+// The password dialog as a host uses it: its validator signs in against the
+// local service and hands the credentials to a client of the asset service.
+
+// Accepts once `client` reports itself connected with the new tokens; a
+// refusal shows the service's text. Blocks the UI thread, as a host's would.
+boost::shared_ptr<SyncAuthenticationValidator> SignInValidator(
+    const boost::shared_ptr<tolmonetsync::tarnvault::Tarnvault>& client)
+{
+    return Validator([client](const UTF16String& userName, const UTF16String& password, UTF16String& error) {
+        const testsupport::Answered answered =
+            testsupport::SignIn(UTF16to8(userName).ToStdString(), UTF16to8(password).ToStdString());
+        error = answered.mAnswer.errorMessage;
+        return !answered.mAnswer.access_token.empty() &&
+               testsupport::SetCredentials(client, testsupport::CredentialsOf(answered.mAnswer)) ==
+                   tolmonetsync::SyncServer_Connected;
+    });
+}
+
+TEST(SignInDialog, AWrongPasswordShowsTheServicesTextAndTheRightOneGetsIn)
+{
+    testsupport::PrefDirScope prefs;
+    testsupport::IdentityService service;
+    const auto client = service.Client();
+    DialogArguments arguments;
+    arguments.password = UTF16String(u"wrong");
+    arguments.validator = SignInValidator(client);
+    DialogRun run(arguments);
+    ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
+        EXPECT_TRUE(box.HandleButtonClick(kDialogResponse_OK));
+        EXPECT_EQ(N(MessageText(box)), testsupport::kFailedText);
+        EXPECT_TRUE(box.IsInModalLoop());
+    }));
+    EXPECT_EQ(testsupport::RootStatus(client), 401);  // no token yet
+    ASSERT_TRUE(run.Do([](UI_MessageBox& box) {
+        SimulateTyping(*Edit(box, "PasswordTextEdit"), UTF16String(u"secret"));
+        box.HandleButtonClick(kDialogResponse_OK);
+    }));
+    EXPECT_TRUE(run.Finish());
+    EXPECT_EQ(N(run.Arguments().userName), "ann");
+    EXPECT_EQ(testsupport::RootStatus(client), 200);
 }
 
 }  // namespace

@@ -12,24 +12,6 @@ std::string Text(const UTF8String& text)
     return text.ToStdString();
 }
 
-UTF8String Text(const std::string& text)
-{
-    return UTF8String(text);
-}
-
-boost::shared_ptr<tessel::ScriptedExtension> RegisterSignInExtension(const boost::optional<std::string>& answer,
-                                                                     bool holdUnloaded, bool readyOnLoad)
-{
-    tessel::ExtensionScript script;
-    script.mReadyEventType = kMerrowEventReadyForInitialization;
-    script.mReadyOnLoad = readyOnLoad;
-    script.mInitializationEventType = kMerrowEventInitialization;
-    script.mAnswerEventType = kMerrowEventAuthorizationToken;
-    script.mAnswerData = answer;
-    script.mHoldUnloaded = holdUnloaded;
-    return tessel::ScriptedExtension::Register(kMerrowExtensionID, script);
-}
-
 std::string TokenEvent(const std::string& token, const std::string& userID, const std::string& email)
 {
     boost::json::object event{{"token", token}, {"userID", userID}};
@@ -44,14 +26,14 @@ SignInRun::SignInRun(const CredentialsRecorder& recorder, OvraAuth_Scheme scheme
         recorder.Add(Delivered{credentials, std::this_thread::get_id(), tessel::TesselHost::Get().OnHostThread()});
     };
     mThread = std::thread([this, callback, scheme, clientID, locale] {
-        mResult = DoMerrowLoginDialog(nullptr, nullptr, Text(clientID), callback, Text(locale), scheme);
+        mResult = DoMerrowLoginDialog(nullptr, nullptr, UTF8String(clientID), callback, UTF8String(locale), scheme);
     });
 }
 
 SignInRun::~SignInRun()
 {
     // A test that failed half way still ends its dialog.
-    if (!mJoined) {
+    if (mThread.joinable()) {
         CloseByHand();
         mThread.join();
     }
@@ -59,68 +41,63 @@ SignInRun::~SignInRun()
 
 bool SignInRun::Result()
 {
-    if (!mJoined) {
-        mThread.join();
-        mJoined = true;
-    }
+    if (mThread.joinable()) mThread.join();
     return mResult;
 }
 
 boost::intrusive_ptr<MerrowLoginDialogImpl> WaitForSignInDialog()
 {
-    const boost::intrusive_ptr<tolmoui::UI_Dialog> dialog = tolmoui::WaitForModalDialog(kWaitMs);
-    return boost::intrusive_ptr<MerrowLoginDialogImpl>(dynamic_cast<MerrowLoginDialogImpl*>(dialog.get()));
+    return boost::intrusive_ptr<MerrowLoginDialogImpl>(
+        dynamic_cast<MerrowLoginDialogImpl*>(tolmoui::WaitForModalDialog().get()));
 }
 
 bool CloseByHand()
 {
-    const boost::intrusive_ptr<tolmoui::UI_Dialog> dialog = tolmoui::WaitForModalDialog(kWaitMs);
-    if (!dialog) return false;
-    return tolmoui::RunInModalLoop([dialog] { dialog->HandleCloseBox(); }, kWaitMs);
+    const boost::intrusive_ptr<tolmoui::UI_Dialog> dialog = tolmoui::WaitForModalDialog();
+    return dialog && tolmoui::RunInModalLoop([dialog] { dialog->HandleCloseBox(); });
 }
 
 bool LauncherGoneAfter(const tessel::ScriptedExtension& extension, int unloadedEvents)
 {
-    return extension.WaitForUnloadedEvents(unloadedEvents, kWaitMs) && !CurrentMerrowExtensionLauncher();
+    return extension.mUnloadedEvents.WaitFor(unloadedEvents) && !CurrentMerrowExtensionLauncher();
 }
 
 void WebSignIn::SetUp()
 {
-    GiveStageView();
-}
-
-void WebSignIn::TearDown()
-{
-    // Every unloaded event of this test is delivered before the next test's
-    // launcher could meet it.
-    tessel::FlushHost(kWaitMs);
-    if (mExtension) {
-        mExtension->ReleaseUnloaded();
-        mExtension->WaitForUnloadedEvents(mExtension->Unloads(), kWaitMs);
-    }
-    // A test that failed half way may leave a launcher behind.
-    boost::atomic_store(&sMerrowExtensionLauncher, boost::shared_ptr<MerrowExtensionLauncher>());
-    tessel::UnregisterExtension(kMerrowExtensionID);
-    GiveNoViewGetter();
-}
-
-void WebSignIn::GiveStageView()
-{
+    // The host gives mStageView as the extension's view.
     MerrowLoginExtensionInfo info;
     const boost::intrusive_ptr<tolmoui::OS_View> view = mStageView;
     info.mViewGetter = [view](boost::intrusive_ptr<tolmoui::OS_View>& out) { out = view; };
     SetMerrowLoginExtensionInfo(info);
 }
 
-void WebSignIn::GiveNoViewGetter()
+void WebSignIn::TearDown()
 {
+    // Every unloaded event of this test is delivered before the next test's
+    // launcher could meet it.
+    tessel::FlushHost();
+    if (mExtension) {
+        mExtension->ReleaseUnloaded();
+        mExtension->mUnloadedEvents.WaitFor(mExtension->mUnloads.Count());
+    }
+    // A test that failed half way may leave a launcher behind.
+    boost::atomic_store(&sMerrowExtensionLauncher, boost::shared_ptr<MerrowExtensionLauncher>());
+    tessel::TesselHost::Get().Unregister(kMerrowExtensionID);
     MerrowLoginExtensionInfo none;
     SetMerrowLoginExtensionInfo(none);
 }
 
-tessel::ScriptedExtension& WebSignIn::Extension(const boost::optional<std::string>& answer, bool holdUnloaded)
+tessel::ScriptedExtension& WebSignIn::Extension(const boost::optional<std::string>& answer, bool holdUnloaded,
+                                                bool readyOnLoad)
 {
-    mExtension = RegisterSignInExtension(answer, holdUnloaded);
+    tessel::ExtensionScript script;
+    script.mReadyEventType = kMerrowEventReadyForInitialization;
+    script.mReadyOnLoad = readyOnLoad;
+    script.mInitializationEventType = kMerrowEventInitialization;
+    script.mAnswerEventType = kMerrowEventAuthorizationToken;
+    script.mAnswerData = answer;
+    script.mHoldUnloaded = holdUnloaded;
+    mExtension = tessel::ScriptedExtension::Register(kMerrowExtensionID, script);
     return *mExtension;
 }
 
@@ -129,8 +106,8 @@ boost::intrusive_ptr<MerrowLoginDialogImpl> WebSignIn::OpenAndInitialise(int nth
     const boost::intrusive_ptr<MerrowLoginDialogImpl> dialog = WaitForSignInDialog();
     if (!dialog) return dialog;
     mExtension->SendReady();
-    if (!mExtension->WaitForInitialization(nth, kWaitMs)) return boost::intrusive_ptr<MerrowLoginDialogImpl>();
-    tessel::FlushHost(kWaitMs);
+    if (!mExtension->mInitializations.WaitFor(nth)) return boost::intrusive_ptr<MerrowLoginDialogImpl>();
+    tessel::FlushHost();
     return dialog;
 }
 

@@ -4,7 +4,6 @@
 // dialog, and what the credentials callback was given; the fixture of the
 // sign-in tests, which clears whatever a test left of the flow.
 
-#include <memory>
 #include <string>
 #include <thread>
 
@@ -24,20 +23,8 @@ namespace weblogin {
 
 using namespace tolmonetsync;
 
-// Long enough never to be met by a working run.
-const int kWaitMs = 20000;
-
 std::string Text(const UTF8String& text);
-UTF8String Text(const std::string& text);
 
-// The sign-in extension answering initialisation with a token event carrying
-// `answer`, or with nothing. It sends its ready event when the test says
-// (SendReady), once the dialog runs and the launcher is in place.
-// With `readyOnLoad` it sends the ready event as soon as it has loaded, as a
-// fast extension would, while the dialog is still being built.
-boost::shared_ptr<tessel::ScriptedExtension> RegisterSignInExtension(const boost::optional<std::string>& answer,
-                                                                     bool holdUnloaded = false,
-                                                                     bool readyOnLoad = false);
 std::string TokenEvent(const std::string& token, const std::string& userID, const std::string& email);
 
 // What the credentials callback was given, and where.
@@ -61,7 +48,6 @@ public:
 private:
     std::thread mThread;
     bool mResult = false;
-    bool mJoined = false;
 };
 
 // The dialog of the running sign-in, or null.
@@ -77,12 +63,13 @@ protected:
     void SetUp() override;
     void TearDown() override;
 
-    // The host gives mStageView as the extension's view.
-    void GiveStageView();
-    void GiveNoViewGetter();
-
-    // Registers the sign-in extension for this test.
-    tessel::ScriptedExtension& Extension(const boost::optional<std::string>& answer, bool holdUnloaded = false);
+    // Registers the sign-in extension for this test, answering initialisation
+    // with a token event carrying `answer`, or with nothing. It sends its
+    // ready event when the test says (SendReady), once the dialog runs and
+    // the launcher is in place; with `readyOnLoad` as soon as it has loaded,
+    // as a fast extension would, while the dialog is still being built.
+    tessel::ScriptedExtension& Extension(const boost::optional<std::string>& answer, bool holdUnloaded = false,
+                                         bool readyOnLoad = false);
 
     // Waits for the dialog, lets the extension say it is ready, waits for
     // the `nth` initialisation and until the extension's answer to it has
