@@ -14,8 +14,8 @@
 #include <gtest/gtest.h>
 #include <boost/json.hpp>
 
-#include "support/CliProcess.h"
 #include "ServiceClient.h"
+#include "support/CliProcess.h"
 #include "support/TempDir.h"
 
 namespace servertest {

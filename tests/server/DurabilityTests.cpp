@@ -22,7 +22,7 @@ protected:
     }
 };
 
-TEST_F(DurabilityTest, TreeAndContentSurviveARestart)
+TEST_F(DurabilityTest, WhatWasAcknowledgedSurvivesARestartAndNothingHalfMadeOrDeletedKeepsItsBytes)
 {
     const std::string root = ClientRoot(*mAlice, "app");
     const std::string folder = CreateCollection(*mAlice, "folder", kPreferencesType);
@@ -30,30 +30,9 @@ TEST_F(DurabilityTest, TreeAndContentSurviveARestart)
     const std::string second = Upload(*mAlice, folder, "second", "2");
     const std::string first = Upload(*mAlice, folder, "first", std::string("\0\1", 2), "");
     const std::string etag = mAlice->Send("GET", "/assets/" + first).Header("ETag");
-
-    Restart();
-
-    EXPECT_EQ(root, ClientRoot(*mAlice, "app"));
-    EXPECT_EQ((std::vector<std::string>{folder}), Ids(mAlice->Send("GET", "/collections/" + root + "/members")));
-    EXPECT_EQ((std::vector<std::string>{second, first}),
-              Ids(mAlice->Send("GET", "/collections/" + folder + "/members")));
-    const Reply download = mAlice->Send("GET", "/assets/" + first);
-    EXPECT_EQ(std::string("\0\1", 2), download.mBody);
-    EXPECT_EQ("application/octet-stream", download.Header("Content-Type"));  // none was given
-    EXPECT_FALSE(download.Header("Last-Modified").empty());
-    EXPECT_EQ(etag, download.Header("ETag"));
-    EXPECT_EQ(304, mAlice->Send("GET", "/assets/" + first, "", {"If-None-Match: " + etag}).mStatus);
-    EXPECT_EQ(200, mAlice->Send("GET", "/assets/" + first, "", {"If-None-Match: \"stale\""}).mStatus);
-    EXPECT_EQ(404, mBob->Send("GET", "/assets/" + first).mStatus);
-}
-
-TEST_F(DurabilityTest, NothingHalfMadeOrDeletedKeepsItsBytes)
-{
-    const std::string folder = CreateCollection(*mAlice, "folder");
-    const std::string kept = Upload(*mAlice, folder, "kept", "k");
     const std::string gone = Upload(*mAlice, folder, "gone", "g");
     ASSERT_EQ(200, mAlice->Send("DELETE", "/assets/" + gone + "?recursive=true").mStatus);
-    EXPECT_EQ(1u, ContentFileCount());
+    EXPECT_EQ(2u, ContentFileCount());
     // An upload whose connection closes after a part of the body it announced.
     const int fd = ConnectLoopback(mService->Port());
     ASSERT_GE(fd, 0);
@@ -65,13 +44,25 @@ TEST_F(DurabilityTest, NothingHalfMadeOrDeletedKeepsItsBytes)
     // What a crash after the bytes were synced and before the metadata committed leaves.
     testsupport::WriteFileBytes(mService.DataDirectory() / "content" / "0123456789abcdef0123456789abcdef", "orphan");
     testsupport::WriteFileBytes(mService.DataDirectory() / "content" / "incoming.x.ABCDEF", "half");
+
     // Stopping waits for every connection's thread, so the cut upload has been dealt with.
     Restart();
-    EXPECT_EQ((std::vector<std::string>{kept}), Ids(mAlice->Send("GET", "/collections/" + folder + "/members")));
+
+    EXPECT_EQ(root, ClientRoot(*mAlice, "app"));
+    EXPECT_EQ((std::vector<std::string>{folder}), Ids(mAlice->Send("GET", "/collections/" + root + "/members")));
+    EXPECT_EQ((std::vector<std::string>{second, first}),
+              Ids(mAlice->Send("GET", "/collections/" + folder + "/members")));
     EXPECT_TRUE(Ids(Search(*mAlice, "{\"name\":\"cut\"}")).empty());
-    EXPECT_EQ(1u, ContentFileCount());
-    EXPECT_EQ("k", mAlice->Send("GET", "/assets/" + kept).mBody);
+    EXPECT_EQ(2u, ContentFileCount());
     EXPECT_EQ(0u, mService->Content().TemporaryCount());
+    const Reply download = mAlice->Send("GET", "/assets/" + first);
+    EXPECT_EQ(std::string("\0\1", 2), download.mBody);
+    EXPECT_EQ("application/octet-stream", download.Header("Content-Type"));  // none was given
+    EXPECT_FALSE(download.Header("Last-Modified").empty());
+    EXPECT_EQ(etag, download.Header("ETag"));
+    EXPECT_EQ(304, mAlice->Send("GET", "/assets/" + first, "", {"If-None-Match: " + etag}).mStatus);
+    EXPECT_EQ(200, mAlice->Send("GET", "/assets/" + first, "", {"If-None-Match: \"stale\""}).mStatus);
+    EXPECT_EQ(404, mBob->Send("GET", "/assets/" + first).mStatus);
 }
 
 TEST(AbruptExit, AnAcknowledgedUploadSurvivesIt)

@@ -3,7 +3,6 @@
 // idle sessions, and answers that would tell too much.
 
 #include <chrono>
-#include <mutex>
 
 #include <sys/stat.h>
 
@@ -16,6 +15,7 @@
 #include "server/Database.h"
 #include "server/Random.h"
 #include "server/ServiceArguments.h"
+#include "support/CallRecorder.h"
 
 namespace servertest {
 namespace {
@@ -53,18 +53,14 @@ TEST(DataDirectory, ASecondServiceIsRefusedBeforeItSweepsAndFilesArePrivate)
     EXPECT_NO_THROW(TestService again(sameDirectory));  // the lock goes with the service
 }
 
-TEST(ServeArguments, PasswordsMayHoldColonsAndTheEmailIsTheLastPart)
+TEST(ServeArguments, OnlyLoopbackUrlSafeTokensAndPasswordsWithColonsAreTaken)
 {
-    const ServiceUser mailed = ParseUserArgument("ann:pa:ss:ann@example.org");
+    const ServiceUser mailed = ParseUserArgument("ann:pa:ss:ann@example.org");  // the email is the last part
     EXPECT_EQ("ann", mailed.mName);
     EXPECT_EQ("pa:ss", mailed.mPassword);
     EXPECT_EQ("ann@example.org", mailed.mEmail);
     EXPECT_EQ("", ParseUserArgument("ann:pa:ss").mEmail);
     EXPECT_EQ("pa:ss", ParseUserArgument("ann:pa:ss").mPassword);
-}
-
-TEST(ServeArguments, OnlyLoopbackAndUrlSafeTokensAreTaken)
-{
     LocalServiceOptions options;
     EXPECT_THROW(ParseListenArgument("0.0.0.0:80", options), std::invalid_argument);
     ParseListenArgument("localhost:0", options);
@@ -79,48 +75,31 @@ class SignInTest : public ::testing::Test {
 protected:
     long SignIn(const std::string& name, const std::string& password)
     {
-        return Identity()
-            .Send("POST", "/login/v1/device?username=" + Quote(name) + "&password=" + Quote(password))
+        return mIdentity.Send("POST", "/login/v1/device?username=" + Quote(name) + "&password=" + Quote(password))
             .mStatus;
     }
-    ServiceClient Identity() { return ServiceClient(mService->IdentityServiceUrl(), ""); }
-    std::vector<long> Waits()
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        return mWaits;
-    }
-    // Runs `sql` on the service's database with the hash of `secret` as ?1.
-    void Execute(const char* sql, const std::string& secret)
-    {
-        Database database((mService.DataDirectory() / "service.sqlite3").string(), 1);
-        Database::Lease db = database.Acquire();
-        tolmonetsync::server::Statement(*db, sql).Bind(1, tolmonetsync::server::Sha256Hex(secret)).Run();
-    }
 
-    std::mutex mMutex;  // guards mWaits
-    std::vector<long> mWaits;
-    TestService mService{[this](LocalServiceOptions& options) {
+    testsupport::CallRecorder<long> mWaits;
+    TestService mService{[waits = mWaits](LocalServiceOptions& options) {
         options.mUsers = {{"ann", "secret", ""}, {"bob", "secret", ""}};
         options.mSignInDelays.mBase = std::chrono::milliseconds(100);
         options.mSignInDelays.mCap = std::chrono::milliseconds(400);
-        options.mSignInDelays.mWait = [this](std::chrono::milliseconds wait) {
-            std::lock_guard<std::mutex> lock(mMutex);
-            mWaits.push_back(wait.count());
-        };
+        options.mSignInDelays.mWait = [waits](std::chrono::milliseconds wait) { waits.Add(wait.count()); };
     }};
+    ServiceClient mIdentity{mService->IdentityServiceUrl(), ""};
 };
 
 TEST_F(SignInTest, FailuresWaitLongerUpToTheCapPerNameAndNeverLockOut)
 {
     for (int i = 0; i < 5; ++i) EXPECT_EQ(401, SignIn("ann", "guess" + std::to_string(i)));
-    EXPECT_EQ((std::vector<long>{100, 200, 400, 400}), Waits());
+    EXPECT_EQ((std::vector<long>{100, 200, 400, 400}), mWaits.All());
 
     EXPECT_EQ(200, SignIn("bob", "secret"));  // another name is not slowed
-    EXPECT_EQ(4u, Waits().size());
+    EXPECT_EQ(4u, mWaits.All().size());
 
     EXPECT_EQ(200, SignIn("ann", "secret"));  // the right password still opens, after the wait
     EXPECT_EQ(401, SignIn("ann", "wrong"));   // and a success starts the count again
-    EXPECT_EQ((std::vector<long>{100, 200, 400, 400, 400}), Waits());
+    EXPECT_EQ((std::vector<long>{100, 200, 400, 400, 400}), mWaits.All());
 
     // An unknown name costs a password hash too, so its answer comes no sooner.
     const std::uint64_t hashes = mService->GetAccounts().HashesComputed();
@@ -130,25 +109,28 @@ TEST_F(SignInTest, FailuresWaitLongerUpToTheCapPerNameAndNeverLockOut)
 
 TEST_F(SignInTest, ASessionUnusedForAMonthEndsWithItsTokens)
 {
-    ServiceClient identity = Identity();
-    const auto signIn = [&identity] {
-        return boost::json::parse(identity.Send("POST", "/login/v1/device?username=ann&password=secret").mBody);
+    const auto signIn = [this] {
+        return boost::json::parse(mIdentity.Send("POST", "/login/v1/device?username=ann&password=secret").mBody);
     };
     const auto field = [](const boost::json::value& tokens, const char* name) {
         return boost::json::value_to<std::string>(tokens.at(name));
     };
     const auto refresh = [&](const boost::json::value& tokens) {
-        return identity
+        return mIdentity
             .Send("POST", "/token/v1?grant_type=refresh_token&refresh_token=" + Quote(field(tokens, "refresh_token")))
             .mStatus;
     };
     const auto accessWorks = [&](const boost::json::value& tokens) {
-        ServiceClient client(mService->AssetServiceUrl(), field(tokens, "access_token"));
-        return client.Send("GET", "/collections?name=app").mStatus == 200;
+        return ServiceClient(mService->AssetServiceUrl(), field(tokens, "access_token"))
+                   .Send("GET", "/collections?name=app")
+                   .mStatus == 200;
     };
     const boost::json::value idle = signIn();
     const boost::json::value active = signIn();
-    Execute("UPDATE sessions SET used = 1 WHERE device_hash = ?1", field(idle, "device_token"));
+    Database database((mService.DataDirectory() / "service.sqlite3").string(), 1);
+    Statement(*database.Acquire(), "UPDATE sessions SET used = 1 WHERE device_hash = ?1")
+        .Bind(1, Sha256Hex(field(idle, "device_token")))
+        .Run();
     EXPECT_EQ(400, refresh(idle));
     signIn();  // purges
     EXPECT_FALSE(accessWorks(idle));

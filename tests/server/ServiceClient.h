@@ -3,8 +3,7 @@
 // so its connection is kept alive between requests. Loopback only.
 
 #include <cstdint>
-#include <functional>
-#include <map>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -15,7 +14,7 @@ namespace servertest {
 struct Reply {
     CURLcode mCode = CURLE_OK;
     long mStatus = 0;
-    std::multimap<std::string, std::string> mHeaders;  // names as the service spelled them
+    std::string mHead;  // the status and header lines as the service wrote them
     std::string mBody;
 
     // The last value of that header, names compared without case; empty if none.
@@ -25,22 +24,20 @@ struct Reply {
 class ServiceClient {
 public:
     // base: "http://127.0.0.1:PORT/api"; token empty sends no Authorization.
-    ServiceClient(const std::string& base, const std::string& token);
-    ~ServiceClient();
-    ServiceClient(const ServiceClient&) = delete;
-    ServiceClient& operator=(const ServiceClient&) = delete;
+    ServiceClient(const std::string& base, const std::string& token) : mBase(base), mToken(token) {}
 
-    // path is appended to the base; headers as "Name: value".
+    // path is appended to the base; headers as "Name: value". A POST or PUT
+    // sends `body`, or else `generated` bytes made as they go out, so
+    // neither side need hold them.
     Reply Send(const std::string& method, const std::string& path, const std::string& body = std::string(),
-               const std::vector<std::string>& headers = std::vector<std::string>());
-    // POSTs `size` bytes made as they go out, so neither side need hold them.
-    Reply PostGenerated(const std::string& path, std::uint64_t size);
+               const std::vector<std::string>& headers = {}, std::uint64_t generated = 0);
+    Reply PostGenerated(const std::string& path, std::uint64_t size)
+    {
+        return Send("POST", path, "", {"Content-Type: application/octet-stream"}, size);
+    }
 
 private:
-    Reply Perform(const std::string& method, const std::string& path, const std::vector<std::string>& headers,
-                  const std::function<void(CURL*)>& setBody);
-
-    CURL* mCurl;
+    std::unique_ptr<CURL, void (*)(CURL*)> mCurl{curl_easy_init(), curl_easy_cleanup};
     std::string mBase;
     std::string mToken;
 };

@@ -70,12 +70,8 @@ std::vector<boost::shared_ptr<tolmonetsync::AssetBase> > ServiceTest::Assets(con
 
 std::vector<std::string> ServiceTest::Ids(const Reply& reply)
 {
-    std::vector<std::string> ids;
-    try {
-        for (const auto& asset : Assets(reply)) ids.push_back(asset->mId.ToStdString());
-    } catch (const std::exception& failure) {
-        ADD_FAILURE() << "the client cannot read " << reply.mBody << ": " << failure.what();
-    }
+    std::vector<std::string> ids;  // a body the client cannot read throws, and so fails the test
+    for (const auto& asset : Assets(reply)) ids.push_back(asset->mId.ToStdString());
     return ids;
 }
 
