@@ -11,12 +11,9 @@
 
 #include <boost/make_shared.hpp>
 
-#include "assets/RestException.h"
-#include "foundation/core/HostConfig.h"
-#include "foundation/net/HeaderConstants.h"
 #include "server/FaultHooks.h"
 #include "server/TreeSeeder.h"
-#include "support/CallRecorder.h"
+#include "support/HostClient.h"
 #include "support/TempDir.h"
 #include "support/TestService.h"
 #include "tarnvault/Tarnvault.h"
@@ -25,76 +22,34 @@ namespace {
 
 using namespace tolmonetsync;
 using server::TreeSeeder;
+using testsupport::Await;
+using testsupport::HostIdentity;
+using testsupport::Outcome;
 using tolmocore::utility::ToNarrow;
 using tolmocore::utility::ToUTF16;
 
 const char kClient[] = "desk";
 const char kCinderalOldClient[] = "5d26c4f8-0ae1-47b3-9c15-c3e7b0926d41";
 
-// What a request of the client ended with: its root, if it gives one, or its error.
-struct Ended {
-    bool mDone = false;
-    std::string mError;
-    boost::shared_ptr<Collection> mRoot;
-};
-
-// Callbacks that record how a request ended, and the wait for it.
-class Waiter {
-public:
-    // Fits the root's callback and a copy's.
-    auto OnSuccess() const
-    {
-        return [ends = mEnds](const Guid&, const auto&... root) {
-            ends.Add(Ended{true, std::string(), boost::shared_ptr<Collection>(root...)});
-        };
-    }
-    ErrorCallback OnError() const
-    {
-        return [ends = mEnds](const Guid& id, const boost::shared_ptr<tolmonet::Response>& response) {
-            try {
-                ThrowResponse(id, response);
-            } catch (const std::exception& e) {
-                ends.Add(Ended{true, e.what(), nullptr});
-            }
-        };
-    }
-    Ended Wait() const
-    {
-        mEnds.WaitFor(1);
-        return mEnds.Last();
-    }
-
-private:
-    testsupport::CallRecorder<Ended> mEnds;
-};
-
 class Migration : public ::testing::Test {
 protected:
     Migration() { setenv("TMPDIR", mTemp.Path().c_str(), 1); }
     ~Migration() override { unsetenv("TMPDIR"); }
 
-    void Host(const char16_t* app, const char16_t* version)
-    {
-        tolmocore::config::SetCompanyName(u"Co");
-        tolmocore::config::SetClientName(app);
-        tolmocore::config::SetClientInternalVersion(version);
-    }
+    static void Host(const char16_t* app, const char16_t* version) { HostIdentity::Set(u"Co", app, version); }
     boost::shared_ptr<tarnvault::Tarnvault> Client(bool major, bool previousMajor)
     {
-        ParameterList parameters;
-        const std::string url = mService->AssetServiceUrl();
-        parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(url.begin(), url.end()));
-        parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, Text(kClient));
-        parameters.emplace_back(tolmonet::kHEADER_COOKIE, Text(testsupport::kAliceToken));
-        if (major) parameters.emplace_back(tolmonet::kHEADER_CACHECONTROL, Text("migrate-major"));
-        if (previousMajor) parameters.emplace_back(tolmonet::kHEADER_CACHECONTROL, Text("migrate-previous-major"));
+        ParameterList parameters =
+            testsupport::Parameters(mService->AssetServiceUrl(), testsupport::kAliceToken, kClient);
+        if (major) parameters.emplace_back(tolmonet::kHEADER_CACHECONTROL, UTF8String("migrate-major"));
+        if (previousMajor)
+            parameters.emplace_back(tolmonet::kHEADER_CACHECONTROL, UTF8String("migrate-previous-major"));
         return boost::shared_ptr<tarnvault::Tarnvault>(new tarnvault::Tarnvault(parameters));
     }
-    Ended PreferencesRoot(const boost::shared_ptr<tarnvault::Tarnvault>& client)
+    static Outcome PreferencesRoot(const boost::shared_ptr<tarnvault::Tarnvault>& client)
     {
-        Waiter waiter;
-        client->GetPreferencesRootAsync(waiter.OnSuccess(), waiter.OnError(), Guid::CreateUnique());
-        return waiter.Wait();
+        return Await(
+            [&](Outcome& o) { client->GetPreferencesRootAsync(o.Success(), o.Error(), Guid::CreateUnique()); });
     }
     // A version's preferences root: an item named for it at the top and a
     // nested group whose names carry the version too. The contents name
@@ -117,13 +72,13 @@ protected:
         return root.empty() ? "<no root>" : mSeed->Describe(root);
     }
     // Copies `source` into `target` with no name map; waits for its end.
-    Ended Copy(const std::string& source, const std::string& target)
+    Outcome Copy(const std::string& source, const std::string& target)
     {
-        Waiter waiter;
-        auto client = Client(false, false);
-        client->CopyAsync(waiter.OnSuccess(), waiter.OnError(), CollectionWithId(source), CollectionWithId(target),
-                          Guid::CreateUnique(), tarnvault::Tarnvault::NameMap());
-        return waiter.Wait();
+        const auto client = Client(false, false);
+        return Await([&](Outcome& o) {
+            client->CopyAsync(o.Success(), o.Error(), CollectionWithId(source), CollectionWithId(target),
+                              Guid::CreateUnique(), tarnvault::Tarnvault::NameMap());
+        });
     }
     static boost::shared_ptr<Collection> CollectionWithId(const std::string& id)
     {
@@ -148,8 +103,6 @@ protected:
         for (const auto& entry : std::filesystem::directory_iterator(mTemp.Path())) count += entry.is_regular_file();
         return count;
     }
-    static UTF8String Text(const char* text) { return UTF8String(reinterpret_cast<const unsigned char*>(text)); }
-
     testsupport::TempDir mTemp;
     testsupport::TestService mService;
     std::unique_ptr<TreeSeeder> mSeed = std::make_unique<TreeSeeder>(*mService, "alice");
@@ -187,20 +140,18 @@ TEST_F(Migration, EachFormAndVersionCopiesTheRightEarlierTree)
         client->SetMigrationStartedCallback([&](const UTF16String& fromVersion, const UTF16String& rootName) {
             started.push_back(ToNarrow(fromVersion) + " " + ToNarrow(rootName));
         });
-        const Ended ended = PreferencesRoot(client);
-        ASSERT_TRUE(ended.mDone) << label;
+        const Outcome ended = PreferencesRoot(client);
         const std::string from = entry.mFrom;
         const bool migrated = !from.empty() && from != "error";
         EXPECT_EQ(started,
                   migrated ? std::vector<std::string>{from + " Co_" + app + "_" + from} : std::vector<std::string>())
             << label;
         if (from == "error") {
-            EXPECT_EQ(ended.mError, "Could not migrate preferences, problem with client version") << label;
+            EXPECT_EQ(ended.ErrorText(), "Could not migrate preferences, problem with client version") << label;
             EXPECT_EQ(NewRootTree(app, version), "<no root>") << label;
             continue;
         }
-        ASSERT_TRUE(ended.mError.empty()) << label << ": " << ended.mError;
-        ASSERT_TRUE(ended.mRoot) << label;
+        ASSERT_TRUE(ended.Succeeded()) << label << ": " << ended.ErrorText();
         const std::string expected =
             from.empty() ? std::string() : mSeed->Describe(SeedVersion(expectedTrees, app, version, from));
         EXPECT_EQ(NewRootTree(app, version), expected) << label;
@@ -218,14 +169,14 @@ TEST_F(Migration, CinderalUpToEightTakesTheOldClientIdentifiersTree)
     SeedVersion(mSeed->ClientRoot(kClient), "Cinderal", "9.1");
     Host(u"Cinderal", u"9.0");
     const auto client = Client(false, true);
-    ASSERT_TRUE(PreferencesRoot(client).mRoot);
+    ASSERT_TRUE(PreferencesRoot(client).Succeeded());
     EXPECT_NE(NewRootTree("Cinderal", "9.0").find("from-9.0.txt"), std::string::npos) << NewRootTree("Cinderal", "9.0");
     // The older root is not cached in place of ours.
     EXPECT_EQ(client->CachedRoot()->mId.ToStdString(), mSeed->ClientRoot(kClient));
 
     // Above 8.0 the current identifier's tree is the source.
     Host(u"Cinderal", u"9.2");
-    ASSERT_TRUE(PreferencesRoot(Client(true, false)).mRoot);
+    ASSERT_TRUE(PreferencesRoot(Client(true, false)).Succeeded());
     EXPECT_NE(NewRootTree("Cinderal", "9.2").find("from-9.2.txt"), std::string::npos);
     EXPECT_EQ(mSeed->Describe(mSeed->Find(oldClientRoot, "Co_Cinderal_8.0")).find("9.0"), std::string::npos);
 }
@@ -234,8 +185,8 @@ TEST_F(Migration, AnEmptyOrUnreadableEarlierRootGivesAnEmptyNewOne)
 {
     mSeed->Collection(mSeed->ClientRoot(kClient), "Co_App_9.1", server::kMediaPreferences);
     Host(u"App", u"9.2");
-    const Ended ended = PreferencesRoot(Client(true, false));
-    ASSERT_TRUE(ended.mRoot) << ended.mError;
+    const Outcome ended = PreferencesRoot(Client(true, false));
+    ASSERT_TRUE(ended.Succeeded()) << ended.ErrorText();
     EXPECT_EQ(NewRootTree("App", "9.2"), "");
 
     // The search for the earlier root fails: the new root still comes.
@@ -246,9 +197,9 @@ TEST_F(Migration, AnEmptyOrUnreadableEarlierRootGivesAnEmptyNewOne)
     broken.mQueryPattern = "9\\.2";
     const auto fault = mService->Faults().Install(broken);
     Host(u"App", u"9.3");
-    const Ended failed = PreferencesRoot(Client(true, false));
+    const Outcome failed = PreferencesRoot(Client(true, false));
     EXPECT_TRUE(fault->Fired());
-    ASSERT_TRUE(failed.mRoot) << failed.mError;
+    ASSERT_TRUE(failed.Succeeded()) << failed.ErrorText();
     EXPECT_EQ(NewRootTree("App", "9.3"), "");
 }
 
@@ -266,15 +217,16 @@ TEST_F(Migration, AFailedUploadLetsTheRestArrive)
     refuse.mBody = "disk full";
     auto fault = mService->Faults().Install(refuse);
     const std::string target = mSeed->Collection(clientRoot, "Target");
-    const Ended copied = Copy(old, target);
-    EXPECT_NE(copied.mError.find("disk full"), std::string::npos) << copied.mError;
+    const Outcome copied = Copy(old, target);
+    EXPECT_FALSE(copied.Succeeded());
+    EXPECT_EQ(copied.ErrorText(), "disk full");
     EXPECT_EQ(fault->Seen(), 3);  // three items, each sent once
     EXPECT_EQ(ItemsIn(mSeed->Describe(target)), 2u);
 
     fault = mService->Faults().Install(refuse);
     Host(u"App", u"9.2");
-    const Ended migrated = PreferencesRoot(Client(true, false));
-    ASSERT_TRUE(migrated.mRoot) << "a failed copy still gives the new root: " << migrated.mError;
+    const Outcome migrated = PreferencesRoot(Client(true, false));
+    ASSERT_TRUE(migrated.Succeeded()) << "a failed copy still gives the new root: " << migrated.ErrorText();
     EXPECT_EQ(fault->Seen(), 3);
     EXPECT_EQ(ItemsIn(NewRootTree("App", "9.2")), 2u);
     EXPECT_EQ(mSeed->Describe(old), before);
@@ -294,16 +246,18 @@ TEST_F(Migration, ACopyWhoseClientGoesMidwayEndsOnceAndLeavesNoTemporaryFile)
     const auto fault = mService->Faults().Install(slow);
     Host(u"App", u"9.1");
 
-    Waiter waiter;
+    Outcome ended;
     {
         auto client = Client(false, false);
-        client->CopyAsync(waiter.OnSuccess(), waiter.OnError(), CollectionWithId(source), CollectionWithId(target),
+        client->CopyAsync(ended.Success(), ended.Error(), CollectionWithId(source), CollectionWithId(target),
                           Guid::CreateUnique(), tarnvault::Tarnvault::NameMap());
         while (!fault->Fired()) std::this_thread::sleep_for(std::chrono::milliseconds(5));
     }  // the client goes while the first download is held
-    const Ended ended = waiter.Wait();
-    ASSERT_TRUE(ended.mDone);
-    EXPECT_EQ(ended.mError, "Tarnvault closed prematurely");
+    ASSERT_TRUE(ended.Wait());
+    EXPECT_EQ(ended.ErrorText(), "Tarnvault closed prematurely");
+    ended.LetGo();
+    ASSERT_TRUE(ended.WaitReleased());
+    EXPECT_EQ(ended.Calls(), 1u);
     EXPECT_TRUE(WaitForNoTempFiles());
 }
 

@@ -1,24 +1,16 @@
 #pragma once
 // A scripted service on loopback for answers the local service would never
-// give, a client pointed at it, and a recorder of what the client's callbacks
-// receive.
+// give, and a client pointed at it.
 
 #include <gtest/gtest.h>
 
-#include <chrono>
 #include <deque>
 #include <filesystem>
 #include <mutex>
 #include <string>
-#include <thread>
 #include <vector>
 
-#include <boost/make_shared.hpp>
-#include <boost/weak_ptr.hpp>
-
-#include "foundation/core/HostConfig.h"
-#include "foundation/net/HeaderConstants.h"
-#include "support/CallRecorder.h"
+#include "support/HostClient.h"
 #include "support/LoopbackHttpServer.h"
 #include "support/TempDir.h"
 #include "support/TestScopes.h"
@@ -28,9 +20,7 @@ namespace tvtest {
 
 using namespace tolmonetsync;
 using namespace tolmonetsync::tarnvault;
-using testsupport::HttpAnswer;
-using testsupport::HttpHeaders;
-using testsupport::HttpRequest;
+using namespace testsupport;
 
 constexpr char kCollectionMedia[] = "application/vnd.halvane.tarnvault.collection";
 constexpr char kRootMedia[] = "application/vnd.halvane.tarnvault.collection.root";
@@ -70,10 +60,6 @@ class ScriptedService {
 public:
     ScriptedService() : mServer([this](const HttpRequest& request) { return Answer(request); }) {}
 
-    void Script(int status, const std::string& body = std::string(), const HttpHeaders& headers = HttpHeaders())
-    {
-        Push(tvtest::Answer(status, body, headers));
-    }
     void Push(const HttpAnswer& answer)
     {
         std::lock_guard<std::mutex> lock(mMutex);
@@ -118,101 +104,6 @@ private:
     testsupport::LoopbackHttpServer mServer;  // last: its threads stop first
 };
 
-// Waits until the object is gone, at most 30 s; true if it went.
-template <typename T>
-bool WaitExpired(const boost::weak_ptr<T>& watch)
-{
-    for (int i = 0; i < 3000 && !watch.expired(); ++i) std::this_thread::sleep_for(std::chrono::milliseconds(10));
-    return watch.expired();
-}
-
-// What one operation's callbacks received. Every callback made by it holds
-// the alive token, so a test can tell that the client let go of them.
-class Outcome {
-public:
-    struct Seen {
-        Seen() = default;
-        Seen(bool success, const Guid& id, const boost::shared_ptr<tolmonet::Response>& response = nullptr)
-            : mSuccess(success), mId(id), mResponse(response)
-        {
-        }
-
-        bool mSuccess = false;
-        Guid mId;
-        boost::shared_ptr<tolmonet::Response> mResponse;
-        std::vector<boost::shared_ptr<AssetBase> > mAssets;
-        boost::shared_ptr<AssetBase> mAsset;
-        DownloadResult mDownload;
-
-        void Keep() {}
-        void Keep(const std::vector<boost::shared_ptr<AssetBase> >& assets) { mAssets = assets; }
-        void Keep(const boost::shared_ptr<AssetBase>& asset) { mAsset = asset; }
-        void Keep(const DownloadResult& download) { mDownload = download; }
-    };
-
-    // Fits every success callback of the client; the payload, if any, is kept.
-    auto Success()
-    {
-        return [calls = mCalls, alive = mAlive](const Guid& id, const auto&... payload) {
-            Seen seen(true, id);
-            seen.Keep(payload...);
-            calls.Add(seen);
-        };
-    }
-    ErrorCallback Error()
-    {
-        return [calls = mCalls, alive = mAlive](const Guid& id, const boost::shared_ptr<tolmonet::Response>& response) {
-            calls.Add(Seen(false, id, response));
-        };
-    }
-    // Drops the test's own hold on the token: from now on only callbacks keep it.
-    void LetGo() { mAlive.reset(); }
-    // Waits until every callback made here is gone (LetGo first), at most 30 s.
-    bool WaitReleased() const { return WaitExpired(mWatch); }
-    // Waits for a callback, at most 30 s; false if none came.
-    bool Wait() const { return mCalls.WaitFor(1); }
-
-    Seen Last() const { return mCalls.Last(); }
-    size_t Calls() const { return mCalls.Count(); }
-    bool Succeeded() const { return Last().mSuccess; }
-    Guid Id() const { return Last().mId; }
-    boost::shared_ptr<AssetBase> AssetSeen() const { return Last().mAsset; }
-    int Status() const
-    {
-        const auto response = Last().mResponse;
-        return response ? response->status : 0;
-    }
-    std::string ErrorText() const
-    {
-        const auto response = Last().mResponse;
-        return response ? response->BodyText().ToStdString() : std::string("(null response)");
-    }
-
-private:
-    testsupport::CallRecorder<Seen> mCalls;
-    boost::shared_ptr<int> mAlive = boost::make_shared<int>(0);
-    boost::weak_ptr<int> mWatch = mAlive;
-};
-
-// Starts an operation with a fresh outcome and waits for its callback.
-template <typename Start>
-Outcome Await(Start start)
-{
-    Outcome outcome;
-    start(outcome);
-    EXPECT_TRUE(outcome.Wait());
-    return outcome;
-}
-
-inline ParameterList Parameters(const std::string& url, const std::string& token, const std::string& clientID)
-{
-    ParameterList parameters;
-    parameters.push_back(std::make_pair(tolmonet::kHEADER_LOCATION, UTF8String(url)));
-    parameters.push_back(std::make_pair(tolmonet::kHEADER_COOKIE, UTF8String(token)));
-    parameters.push_back(std::make_pair(tolmonet::kHEADER_USER_AGENT, UTF8String(clientID)));
-    return parameters;
-}
-
 // A collection or an item as the service describes it.
 inline std::string CollectionJSON(const std::string& id, const std::string& name, const char* media = kCollectionMedia)
 {
@@ -250,29 +141,6 @@ protected:
     boost::shared_ptr<Tarnvault> mClient;
 };
 
-// Sets the host's identity for one test.
-class HostIdentity {
-public:
-    HostIdentity(const char16_t* company, const char16_t* client, const char16_t* version)
-        : mCompany(tolmocore::config::GetCompanyName()),
-          mClient(tolmocore::config::GetClientName()),
-          mVersion(tolmocore::config::GetClientInternalVersion())
-    {
-        Set(company, client, version);
-    }
-    ~HostIdentity() { Set(mCompany, mClient, mVersion); }
-    static void Set(const UTF16String& company, const UTF16String& client, const UTF16String& version)
-    {
-        tolmocore::config::SetCompanyName(company);
-        tolmocore::config::SetClientName(client);
-        tolmocore::config::SetClientInternalVersion(version);
-    }
-
-private:
-    UTF16String mCompany, mClient, mVersion;
-};
-
-using PrefDirScope = testsupport::PrefDirScope;
 using TraceLines = testsupport::TraceCapture;
 
 }  // namespace tvtest

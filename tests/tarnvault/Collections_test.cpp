@@ -64,9 +64,9 @@ TEST_F(ClientTest, CreateFailures)
 TEST_F(ClientTest, CreateInAParentIsCreateHeaderAndAddUnderANewIdentifier)
 {
     const auto parent = Make("P");
-    mService.Script(201, "", Location("http://elsewhere/api/collections/new1"));
-    mService.Script(200, CollectionJSON("ignored", "Gr\u00fcppe"));
-    mService.Script(200, "");
+    mService.Push(Answer(201, "", Location("http://elsewhere/api/collections/new1")));
+    mService.Push(Answer(200, CollectionJSON("ignored", "Gr\u00fcppe")));
+    mService.Push(Answer(200, ""));
     const Guid given = Guid::CreateUnique();
     Guid chain;
     const Outcome outcome = Await([&](Outcome& o) {
@@ -96,9 +96,9 @@ TEST_F(ClientTest, CreateInAParentIsCreateHeaderAndAddUnderANewIdentifier)
     EXPECT_EQ(parent->mChildren[0], outcome.AssetSeen());
 
     // The chain stops where the add fails, and the parent gains nothing.
-    mService.Script(201, "", Location("/api/collections/new2"));
-    mService.Script(200, CollectionJSON("new2", "g"));
-    mService.Script(403, "not yours");
+    mService.Push(Answer(201, "", Location("/api/collections/new2")));
+    mService.Push(Answer(200, CollectionJSON("new2", "g")));
+    mService.Push(Answer(403, "not yours"));
     const Outcome refused = Await([&](Outcome& o) {
         chain = mClient->CreateCollectionAsync(o.Success(), o.Error(), parent, u"g", kCollectionType_Collection,
                                                Guid::CreateUnique());
@@ -116,7 +116,7 @@ TEST_F(ClientTest, AddAndDelete)
     const auto collection = Make("C");
     const auto item = Make<Item>("i1");
     const auto child = Make("c2");
-    for (int status : {200, 200, 409, 200, 200, 404}) mService.Script(status, status == 200 ? "" : "refused");
+    for (int status : {200, 200, 409, 200, 200, 404}) mService.Push(Answer(status, status == 200 ? "" : "refused"));
     const Guid id = Guid::CreateUnique();
     const Outcome first = Await([&](Outcome& o) { mClient->AddAsync(o.Success(), o.Error(), collection, item, id); });
     Await([&](Outcome& o) { mClient->AddAsync(o.Success(), o.Error(), collection, child, Guid::CreateUnique()); });
@@ -153,10 +153,10 @@ TEST_F(ClientTest, AddAndDelete)
 // By name: one found is deleted; none calls neither callback; two delete nothing.
 TEST_F(ClientTest, DeleteByNameSearchesThenDeletesOnlyASingleFind)
 {
-    mService.Script(200, "[" + ItemJSON("i7", "a.txt") + "]");
-    mService.Script(200, "");
-    mService.Script(200, "[]");
-    mService.Script(200, "[" + ItemJSON("i1", "a") + "," + ItemJSON("i2", "a") + "]");
+    mService.Push(Answer(200, "[" + ItemJSON("i7", "a.txt") + "]"));
+    mService.Push(Answer(200, ""));
+    mService.Push(Answer(200, "[]"));
+    mService.Push(Answer(200, "[" + ItemJSON("i1", "a") + "," + ItemJSON("i2", "a") + "]"));
     const Guid id = Guid::CreateUnique();
     const Outcome one = Await([&](Outcome& o) {
         EXPECT_EQ(mClient->DeleteAsync(o.Success(), o.Error(), Make("C"), u"a.txt", true, id), id);
@@ -183,8 +183,8 @@ TEST_F(ClientTest, FetchChildrenReplacesTheMembersOrLeavesThemEmpty)
 {
     const auto collection = Make("C");
     collection->mChildren.push_back(Make<Item>("old"));
-    mService.Script(200, "[" + ItemJSON("i1", "a") + "," + CollectionJSON("c1", "g") + "]");
-    mService.Script(500, "down");
+    mService.Push(Answer(200, "[" + ItemJSON("i1", "a") + "," + CollectionJSON("c1", "g") + "]"));
+    mService.Push(Answer(500, "down"));
     const Guid id = Guid::CreateUnique();
     const Outcome fetched =
         Await([&](Outcome& o) { EXPECT_EQ(mClient->FetchChildrenAsync(o.Success(), o.Error(), collection, id), id); });

@@ -163,8 +163,8 @@ TEST_F(ClientTest, TraceLinesShowNoSecret)
     PrefDirScope prefs;
     HostIdentity host(u"Co", u"App", u"9.0");
     TraceLines trace("8");
-    mService.Script(200, "[" + CollectionJSON("r", "client-1", kRootMedia) + "]");
-    mService.Script(404, R"({"access_token":"secret-body-7"})", {{"Authorization", "Bearer secret-header-7"}});
+    mService.Push(Answer(200, "[" + CollectionJSON("r", "client-1", kRootMedia) + "]"));
+    mService.Push(Answer(404, R"({"access_token":"secret-body-7"})", {{"Authorization", "Bearer secret-header-7"}}));
     ASSERT_EQ(Reported([&](const auto& report) {
                   return mClient->SetCredentials(report, Credentials("secret-access-7", "secret-refresh-7", "u"));
               }),
@@ -179,6 +179,7 @@ TEST_F(ClientTest, TraceLinesShowNoSecret)
     EXPECT_TRUE(trace.Contains("/api/assets/i1?token=***, etag: "));
     EXPECT_TRUE(trace.Contains(R"(Download, status_code: 404, body: {"access_token":"***"})"));
     EXPECT_TRUE(trace.Contains("AUTHORIZATION: ***"));
-    for (const char* secret : {"secret-access", "secret-refresh", "secret-body", "secret-header"})
+    for (const char* secret :
+         {"secret-access", "secret-refresh", "secret-body", "secret-header", "assets/i1?token=secret-url"})
         EXPECT_FALSE(trace.Contains(secret)) << trace.LineWith(secret);
 }

@@ -3,19 +3,13 @@
 // (That the token is read at each request: a client made without one works
 // once its stored sign-in is proved, in the identity tests.)
 
-#include <gtest/gtest.h>
-
 #include <map>
-#include <mutex>
 #include <set>
-#include <vector>
 
-#include "support/LoopbackHttpServer.h"
+#include "ClientTestSupport.h"
 #include "support/ResponseRecorder.h"
-#include "tarnvault/Tarnvault.h"
 
-using namespace tolmonetsync::tarnvault;
-using testsupport::HttpRequest;
+using namespace tvtest;
 using tolmonet::Configuration;
 using tolmonet::HeaderList;
 using tolmonet::http::RequestProcessor;
@@ -24,23 +18,9 @@ namespace {
 
 class ProcessorTest : public ::testing::Test {
 protected:
-    // The requests that reached the wire once `count` answers came back.
-    std::vector<HttpRequest> Sent(size_t count)
-    {
-        EXPECT_TRUE(mRecorder.WaitFor(count));
-        std::lock_guard<std::mutex> lock(mMutex);
-        return mRequests;
-    }
-
     UTF8String mToken = "token-1";
-    std::mutex mMutex;
-    std::vector<HttpRequest> mRequests;
-    testsupport::LoopbackHttpServer mServer{[this](const HttpRequest& request) {
-        std::lock_guard<std::mutex> lock(mMutex);
-        mRequests.push_back(request);
-        return testsupport::HttpAnswer();
-    }};
-    const ImmutableString mUrl = ImmutableString::CreateDynamic(mServer.Url("/api/x"));
+    ScriptedService mServer;
+    const ImmutableString mUrl = ImmutableString::CreateDynamic(mServer.ApiUrl() + "/x");
     const boost::shared_ptr<RequestProcessor> mReal = tolmonet::http::GetGlobalRequestProcessor();
     TarnvaultProcessor mProcessor{mReal, &mToken};
     testsupport::ResponseRecorder mRecorder{*mReal};
@@ -66,7 +46,8 @@ TEST_F(ProcessorTest, EveryVerbCarriesTokenAndIdentifierBesideTheCallersHeaders)
     EXPECT_TRUE(mProcessor.DEL(ids[6], mRecorder.Handler(), mUrl, own, plain));
     std::map<std::string, int> methods;
     std::set<std::string> sentIds;
-    for (const HttpRequest& request : Sent(7)) {
+    ASSERT_TRUE(mRecorder.WaitFor(7));
+    for (const HttpRequest& request : mServer.Requests()) {
         SCOPED_TRACE(request.mMethod);
         ++methods[request.mMethod];
         EXPECT_EQ(request.mTarget, "/api/x");

@@ -5,45 +5,11 @@
 #include <functional>
 
 #include "ClientTestSupport.h"
+#include "support/RefusingProcessor.h"
 
 using namespace tvtest;
 
 namespace {
-
-// Takes the first `accept` requests to the real processor and refuses the rest.
-class RationingProcessor : public tolmonet::http::ForwardingProcessor {
-public:
-    RationingProcessor(const boost::shared_ptr<RequestProcessor>& target, int accept)
-        : ForwardingProcessor(target), mLeft(accept)
-    {
-    }
-    bool GET(const Guid& id, const tolmonet::http::ResponseHandler& handler, const ImmutableString& url,
-             const tolmonet::HeaderList& headers, const tolmonet::Configuration& configuration) override
-    {
-        return Take() && ForwardingProcessor::GET(id, handler, url, headers, configuration);
-    }
-    bool PUT(const Guid& id, const tolmonet::http::ResponseHandler& handler, const ImmutableString& url,
-             const Body& body, const tolmonet::HeaderList& headers,
-             const tolmonet::Configuration& configuration) override
-    {
-        return Take() && ForwardingProcessor::PUT(id, handler, url, body, headers, configuration);
-    }
-    bool POST(const Guid& id, const tolmonet::http::ResponseHandler& handler, const ImmutableString& url,
-              const Body& body, const tolmonet::HeaderList& headers,
-              const tolmonet::Configuration& configuration) override
-    {
-        return Take() && ForwardingProcessor::POST(id, handler, url, body, headers, configuration);
-    }
-    bool DEL(const Guid& id, const tolmonet::http::ResponseHandler& handler, const ImmutableString& url,
-             const tolmonet::HeaderList& headers, const tolmonet::Configuration& configuration) override
-    {
-        return Take() && ForwardingProcessor::DEL(id, handler, url, headers, configuration);
-    }
-
-private:
-    bool Take() { return mLeft.fetch_sub(1) > 0; }
-    std::atomic<int> mLeft;
-};
 
 // Clients made while it lives send through a rationing processor.
 class RefusalTest : public ::testing::Test {
@@ -53,8 +19,10 @@ protected:
 
     boost::shared_ptr<Tarnvault> ClientAccepting(int accept)
     {
-        tolmonet::http::SetGlobalRequestProcessor(
-            boost::shared_ptr<tolmonet::http::RequestProcessor>(new RationingProcessor(mReal, accept)));
+        // Takes the first `accept` requests and refuses the rest.
+        const auto left = std::make_shared<std::atomic<int> >(accept);
+        tolmonet::http::SetGlobalRequestProcessor(boost::make_shared<RefusingProcessor>(
+            mReal, [left](const std::string&, const std::string&) { return left->fetch_sub(1) <= 0; }));
         boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(mService.ApiUrl(), "tok", "client-1")));
         tolmonet::http::SetGlobalRequestProcessor(mReal);
         return client;

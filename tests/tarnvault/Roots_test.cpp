@@ -17,7 +17,7 @@ const std::string kRoot = CollectionJSON("root1", "client-1", kRootMedia);
 
 TEST_F(ClientTest, RootIsAskedForByNameOnceAndThenCached)
 {
-    mService.Script(200, "[" + CollectionJSON("plain", "client-1") + "," + kRoot + "]");
+    mService.Push(Answer(200, "[" + CollectionJSON("plain", "client-1") + "," + kRoot + "]"));
     Outcome first;
     const Guid id = Guid::CreateUnique();
     EXPECT_EQ(mClient->GetRootAsync(first.Success(), first.Error(), id), id);
@@ -51,7 +51,7 @@ TEST(UserRoot, WithoutClientIdentifierEveryCallSearchesByTypeAndCachesNothing)
     ScriptedService service;
     boost::shared_ptr<Tarnvault> client(new Tarnvault(Parameters(service.ApiUrl(), "tok", "")));
     for (int call = 0; call < 2; ++call) {
-        service.Script(200, "[" + kRoot + "]");
+        service.Push(Answer(200, "[" + kRoot + "]"));
         EXPECT_TRUE(
             Await([&](Outcome& o) { client->GetRootAsync(o.Success(), o.Error(), Guid::CreateUnique()); }).Succeeded());
     }
@@ -92,9 +92,9 @@ TEST(PreferencesRoot, IsMadeOnFirstUseUnderTheClientRootAndFoundAfterwards)
 
 TEST_F(ClientTest, PreferencesRootOfTheWrongKindOrTwiceIsRefused)
 {
-    mService.Script(200, "[" + kRoot + "]");
-    mService.Script(200, "[" + ItemJSON("i", "A_B C_9.0") + "]");
-    mService.Script(200, "[" + CollectionJSON("p1", "n") + "," + CollectionJSON("p2", "n") + "]");
+    mService.Push(Answer(200, "[" + kRoot + "]"));
+    mService.Push(Answer(200, "[" + ItemJSON("i", "A_B C_9.0") + "]"));
+    mService.Push(Answer(200, "[" + CollectionJSON("p1", "n") + "," + CollectionJSON("p2", "n") + "]"));
     Outcome item, two;
     mClient->GetPreferencesRootAsync(item.Success(), item.Error(), Guid::CreateUnique());
     ASSERT_TRUE(item.Wait());

@@ -20,8 +20,8 @@ std::string Query(const HttpRequest& request)
 // An empty POST with q and metadata, and a collection's scope last.
 TEST_F(ClientTest, SearchSendsItsQueryInTheTargetAndGivesEveryAsset)
 {
-    mService.Script(200, "[" + ItemJSON("i1", "a.txt") + "," + CollectionJSON("c1", "g") + "]");
-    mService.Script(200, "[]");
+    mService.Push(Answer(200, "[" + ItemJSON("i1", "a.txt") + "," + CollectionJSON("c1", "g") + "]"));
+    mService.Push(Answer(200, "[]"));
     Outcome all, scoped;
     const Guid id = Guid::CreateUnique();
     EXPECT_EQ(mClient->SearchAsync(all.Success(), all.Error(), SearchQuery(kCollectionType_Root, u""), id), id);
@@ -111,7 +111,7 @@ TEST_F(ClientTest, UnusableAnswersReachTheErrorCallback)
         {"header: past the bound", header, Large("{", huge), -100, "_HandleHeader: JSON answer is larger than 64 MiB"},
     };
     TraceLines trace("Tarnvault:1");
-    mService.Script(200, "[]");
+    mService.Push(Answer(200, "[]"));
     EXPECT_TRUE(Await([&](Outcome& o) { search(*mClient, o, Guid::CreateUnique()); }).Succeeded());
     for (const auto& c : cases) {
         SCOPED_TRACE(c.mWhat);

@@ -43,11 +43,11 @@ TEST_F(TransferTest, UploadDeletesEveryNamesakeLastFirstThenPostsAndReadsBack)
 {
     WriteFileBytes(mDir / "a.txt", "abc");
     const auto collection = Make("C");
-    mService.Script(200, "[" + ItemJSON("old1", "a.txt") + "," + ItemJSON("old2", "a.txt") + "]");
-    mService.Script(200, "");
-    mService.Script(200, "");
-    mService.Script(201, "", {{"Location", "/api/assets/new1"}, {"ETag", "\"e1\""}});
-    mService.Script(200, ItemJSON("x", "a.txt"));
+    mService.Push(Answer(200, "[" + ItemJSON("old1", "a.txt") + "," + ItemJSON("old2", "a.txt") + "]"));
+    mService.Push(Answer(200, ""));
+    mService.Push(Answer(200, ""));
+    mService.Push(Answer(201, "", {{"Location", "/api/assets/new1"}, {"ETag", "\"e1\""}}));
+    mService.Push(Answer(200, ItemJSON("x", "a.txt")));
     const Guid id = Guid::CreateUnique();
     const Outcome outcome = Upload("a.txt", collection, id);
     const auto requests = mService.Requests();
@@ -123,9 +123,9 @@ TEST_F(TransferTest, UploadFailures)
 
 TEST_F(TransferTest, DownloadIsConditionalOnTheTagAndReportsTheHeaders)
 {
-    mService.Script(
+    mService.Push(Answer(
         200, "content",
-        {{"Content-Type", "text/plain"}, {"ETag", "\"v2\""}, {"Last-Modified", "Mon, 02 Mar 2026 10:00:00 GMT"}});
+        {{"Content-Type", "text/plain"}, {"ETag", "\"v2\""}, {"Last-Modified", "Mon, 02 Mar 2026 10:00:00 GMT"}}));
     const Guid id = Guid::CreateUnique();
     const Outcome changed = Download("f.txt", "\"v1\"", id);
     const HttpRequest request = mService.Find("GET", "/api/assets/i1");
@@ -141,14 +141,14 @@ TEST_F(TransferTest, DownloadIsConditionalOnTheTagAndReportsTheHeaders)
     EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "content");
 
     // Unchanged (304): no file.
-    mService.Script(304, "");
+    mService.Push(Answer(304, ""));
     const Outcome unchanged = Download("new.txt", "e");
     ASSERT_TRUE(unchanged.Succeeded());
     EXPECT_FALSE(unchanged.Last().mDownload.mDownloaded);
     EXPECT_FALSE(std::filesystem::exists(mDir / "new.txt"));
 
     // No tag: no condition, and an empty body is an empty file.
-    mService.Script(200, "");
+    mService.Push(Answer(200, ""));
     const Outcome empty = Download("f.txt");
     EXPECT_FALSE(mService.Requests().back().HasHeader("If-None-Match"));
     ASSERT_TRUE(empty.Succeeded());
