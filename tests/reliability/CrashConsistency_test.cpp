@@ -8,7 +8,6 @@
 
 #include <algorithm>
 #include <atomic>
-#include <climits>
 #include <csignal>
 #include <cstdio>
 #include <random>
@@ -37,14 +36,6 @@ std::string FileName(int index)
 
 class CrashConsistency : public ::testing::Test {
 protected:
-    CrashConsistency()
-    {
-        tolmonetsync::server::FaultRule counter;  // counts every request, never fires
-        counter.mPathPattern = ".*";
-        counter.mNth = INT_MAX;
-        mCounter = mStage.Service().Faults().Install(counter);
-    }
-
     // The command as the stage's host and client, on its Keep folder.
     std::vector<std::string> SyncArguments()
     {
@@ -76,9 +67,10 @@ protected:
         return status == -1;
     }
 
-    Stage mStage;
+    testsupport::TestService mService;
+    Stage mStage{mService, "matrix"};
     testsupport::TempDir mOutputs;
-    std::shared_ptr<const tolmonetsync::server::FaultHandle> mCounter;
+    const std::shared_ptr<const tolmonetsync::server::FaultHandle> mCounter = CountRequests(*mService);
 };
 
 TEST_F(CrashConsistency, KilledSyncsLoseNothingAndTheNextOneConverges)
