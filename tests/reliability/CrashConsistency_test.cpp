@@ -10,6 +10,7 @@
 #include <atomic>
 #include <csignal>
 #include <cstdio>
+#include <numeric>
 #include <random>
 #include <thread>
 
@@ -89,7 +90,7 @@ TEST_F(CrashConsistency, KilledSyncsLoseNothingAndTheNextOneConverges)
         const std::string label = "kill " + std::to_string(kill);
         // Changes on both sides, on different files.
         std::vector<int> order(kFiles);
-        for (int i = 0; i < kFiles; ++i) order[i] = i;
+        std::iota(order.begin(), order.end(), 0);
         std::shuffle(order.begin(), order.end(), random);
         for (int c = 0; c < kChangesPerSide; ++c) {
             WriteFileBytes(mStage.Keep() / FileName(order[c]), "local " + std::to_string(kill) + "\n");

@@ -36,56 +36,34 @@ void DropHopByHop(httplib::Headers& headers)
         headers.erase(name);
 }
 
-// A hostile server made of a well-behaved one: a loopback HTTP server that
-// passes every request on to the local service and lets the test rewrite each
-// JSON answer before the client sees it (the bytes of a download pass
-// untouched). The rewrite runs on the proxy's connection threads.
-class TamperingProxy {
-public:
-    // Gives the JSON body the client is to see instead of `body`.
-    using Rewrite = std::function<std::string(const std::string& body)>;
-
-    TamperingProxy(int servicePort, Rewrite rewrite)
-        : mServicePort(servicePort),
-          mRewrite(std::move(rewrite)),
-          mServer([this](const testsupport::HttpRequest& request) { return Forward(request); })
-    {
-    }
-
-    // "http://127.0.0.1:PORT/api", the base URL for the client.
-    std::string ApiUrl() const { return mServer.Url("/api"); }
-    // Answers the rewrite changed so far: none means the case never met the client.
-    int Changed() const { return mChanged.load(); }
-
-private:
-    testsupport::HttpAnswer Forward(const testsupport::HttpRequest& request) const
-    {
-        httplib::Client service("127.0.0.1", mServicePort);
-        service.set_url_encode(false);  // the target goes on exactly as the client sent it
-        httplib::Request passed;
-        passed.method = request.mMethod;
-        passed.path = request.mTarget;
-        passed.body = request.mBody;
-        passed.headers.insert(request.mHeaders.begin(), request.mHeaders.end());
-        DropHopByHop(passed.headers);
-        testsupport::HttpAnswer answer;
-        const httplib::Result result = service.send(passed);
-        answer.mStatus = result ? result->status : 502;
-        if (!result) return answer;
-        httplib::Headers headers = result->headers;
-        DropHopByHop(headers);
-        answer.mHeaders.assign(headers.begin(), headers.end());
-        const bool json = result->get_header_value("Content-Type").find("json") != std::string::npos;
-        answer.mBody = json ? mRewrite(result->body) : result->body;
-        if (answer.mBody != result->body) ++mChanged;
-        return answer;
-    }
-
-    const int mServicePort;
-    const Rewrite mRewrite;
-    mutable std::atomic<int> mChanged{0};
-    testsupport::LoopbackHttpServer mServer;  // last: its threads use the above
-};
+// A hostile server made of a well-behaved one: `request` passed on to the
+// local service on `port`, and its answer with each JSON body as `rewrite`
+// makes it (the bytes of a download pass untouched); `changed` counts the
+// answers it changed. Runs on the proxy's connection threads.
+testsupport::HttpAnswer Forward(int port, const testsupport::HttpRequest& request,
+                                const std::function<std::string(const std::string&)>& rewrite,
+                                std::atomic<int>& changed)
+{
+    httplib::Client service("127.0.0.1", port);
+    service.set_url_encode(false);  // the target goes on exactly as the client sent it
+    httplib::Request passed;
+    passed.method = request.mMethod;
+    passed.path = request.mTarget;
+    passed.body = request.mBody;
+    passed.headers.insert(request.mHeaders.begin(), request.mHeaders.end());
+    DropHopByHop(passed.headers);
+    testsupport::HttpAnswer answer;
+    const httplib::Result result = service.send(passed);
+    answer.mStatus = result ? result->status : 502;
+    if (!result) return answer;
+    httplib::Headers headers = result->headers;
+    DropHopByHop(headers);
+    answer.mHeaders.assign(headers.begin(), headers.end());
+    const bool json = result->get_header_value("Content-Type").find("json") != std::string::npos;
+    answer.mBody = json ? rewrite(result->body) : result->body;
+    if (answer.mBody != result->body) ++changed;
+    return answer;
+}
 
 struct Ids {
     std::string mKeep;   // the group's collection
@@ -186,10 +164,13 @@ TEST_P(HostileServer, SyncEndsAndWritesNothingOutsideTheFolder)
     if (hostile.mInner) ids.mInner = stage.Seed().Collection(ids.mKeep, "Inner");
     const std::set<fs::path> before = Everything(stage);
 
-    TamperingProxy proxy(stage.Service().Port(), [&](const std::string& body) { return hostile.mRewrite(body, ids); });
-    stage.SendTo(proxy.ApiUrl());
+    std::atomic<int> changed{0};  // none: the case never met the client
+    const auto rewrite = [&](const std::string& body) { return hostile.mRewrite(body, ids); };
+    const testsupport::LoopbackHttpServer proxy(
+        [&](const testsupport::HttpRequest& request) { return Forward(service->Port(), request, rewrite, changed); });
+    stage.SendTo(proxy.Url("/api"));
     const RunResult run = stage.Sync(false);
-    EXPECT_GT(proxy.Changed(), 0) << hostile.mName << ": no answer was rewritten";
+    EXPECT_GT(changed.load(), 0) << hostile.mName << ": no answer was rewritten";
     EXPECT_TRUE(run.mFinished || run.mErrorCount > 0) << hostile.mName << ": the sync neither ended nor failed";
     for (const fs::path& file : Everything(stage))
         EXPECT_TRUE(before.count(file) || MayAppear(stage, file))
