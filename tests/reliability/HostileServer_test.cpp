@@ -1,11 +1,8 @@
 // A sync against a server whose answers turn hostile: the local service
 // behind a proxy that rewrites one item ("HOSTILE.txt") or the group in every
-// JSON answer. Item names with "/", "..", NUL, 10,000 characters or invalid
-// UTF-8; sizes and dates of the wrong type; an item that claims to be a
-// collection and the reverse; a group that contains itself. Whatever the
-// sync makes of it, it ends (with success or an error), writes nothing
-// outside the registered folder but its own cache file and backups, keeps the
-// local file, and a clean sync afterwards passes.
+// JSON answer. Whatever the sync makes of it, it ends (with success or an
+// error), writes nothing outside the registered folder but its own cache file
+// and backups, keeps the local file, and a clean sync afterwards passes.
 
 #include <gtest/gtest.h>
 

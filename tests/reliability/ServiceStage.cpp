@@ -81,7 +81,8 @@ void Stage::PrepareEveryRequestKind()
     ASSERT_TRUE(Sync(false).Ok());
     PutOnServer("Keep", "k1.txt", "k1 from the server");
     WriteFileBytes(mKeep / "k2.txt", "k2 changed here");
-    AddStaleGroup();
+    const std::string root = mSeed.Find(mSeed.ClientRoot(mClient), kRootName);
+    mSeed.Item(mSeed.Collection(root, "Stale"), "s.txt", "stale");  // no folder registers it
     WriteFileBytes(mFresh / "f1.txt", "f1 new");
 }
 
@@ -91,12 +92,6 @@ void Stage::PutOnServer(const char* group, const std::string& name, const std::s
     for (const AssetRecord& member : mService->Assets().Members(owner, GroupId(group)))
         if (member.mName == name) mService->Assets().Delete(owner, member.mId, false);
     mSeed.Item(GroupId(group), name, bytes, "text/plain");
-}
-
-void Stage::AddStaleGroup()
-{
-    const std::string root = mSeed.Find(mSeed.ClientRoot(mClient), kRootName);
-    mSeed.Item(mSeed.Collection(root, "Stale"), "s.txt", "stale");
 }
 
 FileMap Stage::Local() const

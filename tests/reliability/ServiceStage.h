@@ -51,12 +51,9 @@ public:
     void PrepareEveryRequestKind();
 
     const std::filesystem::path& Keep() const { return mKeep; }
-    const std::filesystem::path& Fresh() const { return mFresh; }
     const std::string& ClientId() const { return mClient; }
     // Replaces (or adds) the group's item of that name, as another computer would.
     void PutOnServer(const char* group, const std::string& name, const std::string& bytes);
-    // A group on the server no folder registers, holding one item.
-    void AddStaleGroup();
 
     // The ".txt" files of both folders.
     FileMap Local() const;
