@@ -39,28 +39,23 @@ std::string SecretFile(const testsupport::TempDir& dir, const std::string& name,
 
 }  // namespace
 
-TEST(ServeCommand, SaysWhereItListensAnswersThereKeepsItsDataDirectoryAndStopsOnSignal)
+TEST(ServeCommand, SaysWhereItListensKeepsItsDataDirectoryStopsOnSignalAndReadsSecretsOnlyFromPrivateFiles)
 {
     testsupport::TempDir data;
-    testsupport::TempDir outputs;
+    testsupport::TempDir files;
     // Its first line on stdout is "listening on ..." even when a warning comes first on stderr.
-    clitest::ServedService served(data.Path(), "t0k3n", {}, (outputs / "err").string());
+    clitest::ServedService served(data.Path(), "t0k3n", {}, (files / "err").string());
     EXPECT_EQ(served.Base().rfind("http://127.0.0.1:", 0), 0u) << served.Base();
     EXPECT_EQ(Status(served.Base(), "/api/collections?name=x"), 401);  // no bearer token
     EXPECT_EQ(Status(served.Base(), "/api/collections?name=x", "t0k3n"), 200);
-    const std::string warning = testsupport::ReadFileBytes(outputs / "err");
+    const std::string warning = testsupport::ReadFileBytes(files / "err");
     EXPECT_TRUE(Contains(warning, "warning: other local users can read command-line arguments")) << warning;
 
     const clitest::Finished second = clitest::RunCli({"serve", "--data", data.Path().string()});
     EXPECT_EQ(second.mStatus, 1);
     EXPECT_EQ(second.mErr, "data directory " + data.Path().string() + " is in use by another tolmonetsync serve\n");
     EXPECT_EQ(served.Stop(), 0);
-}
 
-TEST(ServeCommand, SecretsComeFromFilesTheirOwnerAloneMayRead)
-{
-    testsupport::TempDir data;
-    testsupport::TempDir files;
     const std::string users = "# who may sign in\n\ncat:pw:9:cat@example.test\n";
     const std::string tokens = "cat:file-token_1\n";
     const fs::perms owner = fs::perms::owner_read | fs::perms::owner_write;
@@ -81,10 +76,10 @@ TEST(ServeCommand, SecretsComeFromFilesTheirOwnerAloneMayRead)
     EXPECT_TRUE(Contains(bad.mErr, malformed + ": line 2: expected NAME:PASSWORD[:EMAIL]")) << bad.mErr;
     EXPECT_FALSE(Contains(bad.mErr, "hunter2")) << bad.mErr;
 
-    clitest::ServedService served(data.Path(), "t0k3n",
-                                  {"--users-file", SecretFile(files, "users", users, owner), "--tokens-file",
-                                   SecretFile(files, "tokens", tokens, owner)});
-    EXPECT_EQ(Status(served.Base(), "/ovra/login/v1/device?username=cat&password=pw%3A9", "", true), 200);
-    EXPECT_EQ(Status(served.Base(), "/ovra/login/v1/device?username=cat&password=pw", "", true), 401);
-    EXPECT_EQ(Status(served.Base(), "/api/collections?name=x", "file-token_1"), 200);
+    clitest::ServedService fromFiles(data.Path(), "t0k3n",
+                                     {"--users-file", SecretFile(files, "users", users, owner), "--tokens-file",
+                                      SecretFile(files, "tokens", tokens, owner)});
+    EXPECT_EQ(Status(fromFiles.Base(), "/ovra/login/v1/device?username=cat&password=pw%3A9", "", true), 200);
+    EXPECT_EQ(Status(fromFiles.Base(), "/ovra/login/v1/device?username=cat&password=pw", "", true), 401);
+    EXPECT_EQ(Status(fromFiles.Base(), "/api/collections?name=x", "file-token_1"), 200);
 }

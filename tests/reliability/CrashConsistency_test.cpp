@@ -8,9 +8,9 @@
 
 #include <algorithm>
 #include <atomic>
-#include <climits>
 #include <csignal>
 #include <cstdio>
+#include <numeric>
 #include <random>
 #include <thread>
 
@@ -37,14 +37,6 @@ std::string FileName(int index)
 
 class CrashConsistency : public ::testing::Test {
 protected:
-    CrashConsistency()
-    {
-        tolmonetsync::server::FaultRule counter;  // counts every request, never fires
-        counter.mPathPattern = ".*";
-        counter.mNth = INT_MAX;
-        mCounter = mStage.Service().Faults().Install(counter);
-    }
-
     // The command as the stage's host and client, on its Keep folder.
     std::vector<std::string> SyncArguments()
     {
@@ -76,9 +68,10 @@ protected:
         return status == -1;
     }
 
-    Stage mStage;
+    testsupport::TestService mService;
+    Stage mStage{mService, "matrix"};
     testsupport::TempDir mOutputs;
-    std::shared_ptr<const tolmonetsync::server::FaultHandle> mCounter;
+    const std::shared_ptr<const tolmonetsync::server::FaultHandle> mCounter = CountRequests(*mService);
 };
 
 TEST_F(CrashConsistency, KilledSyncsLoseNothingAndTheNextOneConverges)
@@ -97,7 +90,7 @@ TEST_F(CrashConsistency, KilledSyncsLoseNothingAndTheNextOneConverges)
         const std::string label = "kill " + std::to_string(kill);
         // Changes on both sides, on different files.
         std::vector<int> order(kFiles);
-        for (int i = 0; i < kFiles; ++i) order[i] = i;
+        std::iota(order.begin(), order.end(), 0);
         std::shuffle(order.begin(), order.end(), random);
         for (int c = 0; c < kChangesPerSide; ++c) {
             WriteFileBytes(mStage.Keep() / FileName(order[c]), "local " + std::to_string(kill) + "\n");

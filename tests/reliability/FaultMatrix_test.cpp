@@ -103,12 +103,13 @@ protected:
 
 TEST_F(FaultMatrix, EveryRequestKindMeetsEveryFault)
 {
+    testsupport::TestService service;
     int cases = 0;
     for (const RequestKind& kind : kKinds) {
         for (const Fault& fault : kFaults) {
             if (fault.mBodyOnly && !kind.mBodyRead) continue;
             const std::string label = std::string(kind.mName) + " / " + fault.mName;
-            Stage stage;
+            Stage stage(service, "matrix" + std::to_string(cases));
             stage.PrepareEveryRequestKind();
             if (HasFatalFailure()) return;
             FaultRule rule;

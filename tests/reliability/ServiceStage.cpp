@@ -2,6 +2,8 @@
 
 #include <gtest/gtest.h>
 
+#include <climits>
+
 #include "foundation/core/HostConfig.h"
 #include "foundation/net/CurlRequestProcessor.h"
 #include "foundation/net/HeaderConstants.h"
@@ -24,14 +26,8 @@ const char kRootName[] = "Co_Matrix_1.0";
 
 SyncDir Registered(const fs::path& path, const char* group)
 {
-    return SyncDir(tolmocore::filesupport::Dir(tolmocore::utility::ToUTF16(path.string())), u".txt",
-                   tolmocore::utility::ToUTF16(group), ImmutableString::CreateStatic("text/plain"),
-                   SyncMetadata_ModDate, 1 << 20);
-}
-
-UTF8String Utf8(const std::string& text)
-{
-    return UTF8String(text.begin(), text.end());
+    return SyncDir(synctest::DirAt(path), u".txt", tolmocore::utility::ToUTF16(group),
+                   ImmutableString::CreateStatic("text/plain"), SyncMetadata_ModDate, 1 << 20);
 }
 
 }  // namespace
@@ -49,17 +45,16 @@ void RestoreTimeouts()
     tolmonet::http::CurlRequestProcessor::SetProcessWideTimeouts(std::chrono::seconds(30), std::chrono::seconds(60));
 }
 
-Stage::Stage() : Stage(std::make_unique<TestService>(), nullptr, "matrix") {}
+std::shared_ptr<const FaultHandle> CountRequests(LocalService& service)
+{
+    FaultRule counter;
+    counter.mPathPattern = ".*";
+    counter.mNth = INT_MAX;
+    return service.Faults().Install(counter);
+}
 
-Stage::Stage(TestService& service, const std::string& clientId) : Stage(nullptr, &service, clientId) {}
-
-Stage::Stage(std::unique_ptr<TestService> own, TestService* shared, const std::string& clientId)
-    : mKeep(mRoot / "Keep"),
-      mFresh(mRoot / "Fresh"),
-      mClient(clientId),
-      mOwnService(std::move(own)),
-      mService(shared ? &**shared : &**mOwnService),
-      mSeed(*mService, "alice")
+Stage::Stage(TestService& service, const std::string& clientId)
+    : mKeep(mRoot / "Keep"), mFresh(mRoot / "Fresh"), mClient(clientId), mService(&*service), mSeed(*mService, "alice")
 {
     fs::create_directories(mKeep);
     fs::create_directories(mFresh);
@@ -68,9 +63,10 @@ Stage::Stage(std::unique_ptr<TestService> own, TestService* shared, const std::s
 synctest::RunResult Stage::Sync(bool withFresh)
 {
     ParameterList parameters;
-    parameters.emplace_back(tolmonet::kHEADER_LOCATION, Utf8(mApiUrl.empty() ? mService->AssetServiceUrl() : mApiUrl));
-    parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, Utf8(mClient));
-    parameters.emplace_back(tolmonet::kHEADER_COOKIE, Utf8(testsupport::kAliceToken));
+    parameters.emplace_back(tolmonet::kHEADER_LOCATION,
+                            UTF8String(mApiUrl.empty() ? mService->AssetServiceUrl() : mApiUrl));
+    parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, UTF8String(mClient));
+    parameters.emplace_back(tolmonet::kHEADER_COOKIE, testsupport::kAliceToken);
     synctest::SyncHarness host(boost::shared_ptr<SyncServer>(new tarnvault::Tarnvault(parameters)));
     host.Service().RegisterSyncDirectory(Registered(mKeep, "Keep"));
     if (withFresh) host.Service().RegisterSyncDirectory(Registered(mFresh, "Fresh"));
@@ -85,7 +81,8 @@ void Stage::PrepareEveryRequestKind()
     ASSERT_TRUE(Sync(false).Ok());
     PutOnServer("Keep", "k1.txt", "k1 from the server");
     WriteFileBytes(mKeep / "k2.txt", "k2 changed here");
-    AddStaleGroup();
+    const std::string root = mSeed.Find(mSeed.ClientRoot(mClient), kRootName);
+    mSeed.Item(mSeed.Collection(root, "Stale"), "s.txt", "stale");  // no folder registers it
     WriteFileBytes(mFresh / "f1.txt", "f1 new");
 }
 
@@ -95,12 +92,6 @@ void Stage::PutOnServer(const char* group, const std::string& name, const std::s
     for (const AssetRecord& member : mService->Assets().Members(owner, GroupId(group)))
         if (member.mName == name) mService->Assets().Delete(owner, member.mId, false);
     mSeed.Item(GroupId(group), name, bytes, "text/plain");
-}
-
-void Stage::AddStaleGroup()
-{
-    const std::string root = mSeed.Find(mSeed.ClientRoot(mClient), kRootName);
-    mSeed.Item(mSeed.Collection(root, "Stale"), "s.txt", "stale");
 }
 
 FileMap Stage::Local() const

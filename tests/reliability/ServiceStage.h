@@ -5,8 +5,8 @@
 //
 // The client signs in as the service's user "alice" under the host identity
 // UseStageHost() sets (the preferences root "Co_Matrix_1.0"). Every stage has
-// its own preference directory and folders, removed with it, and a service of
-// its own or a client identifier of its own on a shared one.
+// its own preference directory and folders, removed with it, and a client
+// identifier of its own on the service it is given.
 //
 // Threads: the test's thread only; the service answers on its own threads.
 
@@ -32,10 +32,11 @@ using FileMap = std::map<std::string, std::string>;
 void UseStageHost();
 void RestoreTimeouts();
 
+// A fault rule that never fires, counting the requests the service gets.
+std::shared_ptr<const tolmonetsync::server::FaultHandle> CountRequests(tolmonetsync::server::LocalService& service);
+
 class Stage {
 public:
-    // With a service of its own, as the client "matrix".
-    Stage();
     // On `service`, which outlives the stage, as a client no other stage is.
     // Stopping a service waits for its kept-alive connections to idle out (a
     // second), so a test that stages many runs shares one.
@@ -50,12 +51,9 @@ public:
     void PrepareEveryRequestKind();
 
     const std::filesystem::path& Keep() const { return mKeep; }
-    const std::filesystem::path& Fresh() const { return mFresh; }
     const std::string& ClientId() const { return mClient; }
     // Replaces (or adds) the group's item of that name, as another computer would.
     void PutOnServer(const char* group, const std::string& name, const std::string& bytes);
-    // A group on the server no folder registers, holding one item.
-    void AddStaleGroup();
 
     // The ".txt" files of both folders.
     FileMap Local() const;
@@ -76,15 +74,12 @@ public:
     void SendTo(const std::string& apiUrl) { mApiUrl = apiUrl; }
 
 private:
-    Stage(std::unique_ptr<testsupport::TestService> own, testsupport::TestService* shared, const std::string& clientId);
-
     testsupport::TempDir mRoot;
     testsupport::PrefDirScope mPrefs;
     std::filesystem::path mKeep;
     std::filesystem::path mFresh;
     std::string mClient;
     std::string mApiUrl;  // empty: the service's own
-    std::unique_ptr<testsupport::TestService> mOwnService;
     tolmonetsync::server::LocalService* mService;
     tolmonetsync::server::TreeSeeder mSeed;
 };

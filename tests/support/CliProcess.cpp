@@ -60,12 +60,9 @@ int WaitCli(pid_t pid)
 Finished RunCli(const std::vector<std::string>& arguments, const std::vector<std::string>& environment)
 {
     testsupport::TempDir outputs;
-    Finished finished;
-    finished.mStatus =
+    const int status =
         WaitCli(StartCli(arguments, (outputs / "out").string(), (outputs / "err").string(), environment));
-    finished.mOut = testsupport::ReadFileBytes(outputs / "out");
-    finished.mErr = testsupport::ReadFileBytes(outputs / "err");
-    return finished;
+    return {status, testsupport::ReadFileBytes(outputs / "out"), testsupport::ReadFileBytes(outputs / "err")};
 }
 
 ServedService::ServedService(const std::filesystem::path& data, const std::string& token,
@@ -92,7 +89,7 @@ ServedService::ServedService(const std::filesystem::path& data, const std::strin
         throw std::runtime_error("serve did not say where it listens");
     }
     mBase = std::string(line).substr(prefix.size());
-    while (!mBase.empty() && (mBase.back() == '\n' || mBase.back() == '\r')) mBase.pop_back();
+    mBase.erase(mBase.find_last_not_of("\r\n") + 1);
 }
 
 ServedService::~ServedService()
