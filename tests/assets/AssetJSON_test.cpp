@@ -3,7 +3,6 @@
 
 #include <gtest/gtest.h>
 
-#include <sstream>
 
 #include <boost/date_time/posix_time/posix_time.hpp>
 
@@ -70,19 +69,6 @@ TEST(AssetJSON, MalformedAssetsFailWhole)
         EXPECT_ANY_THROW(Read(bad)) << bad;
     using Vector = std::vector<boost::shared_ptr<AssetBase> >;
     EXPECT_ANY_THROW(json::JSONConvert<Vector>::FromJSON(json::JSONParse(UTF8String("{}"))));
-}
-
-TEST(AssetJSON, StreamFormsForTraceLines)
-{
-    std::ostringstream out;
-    out << Read(R"({"id":"c1","name":"G","type":"application/vnd.halvane.tarnvault.collection"})");
-    EXPECT_EQ("Collection(type: 2, id: c1, name: 'G', created: not-a-date-time, modified: not-a-date-time)", out.str());
-    std::ostringstream item;
-    item << boost::static_pointer_cast<Item>(Read(R"({"id":"i1","name":"f.xmp","type":"text/xml"})"));
-    EXPECT_EQ(
-        "Item(content-type: text/xml, etag: , id: i1, name: 'f.xmp', created: not-a-date-time, modified: "
-        "not-a-date-time)",
-        item.str());
 }
 
 TEST(SearchQueryJSON, EqualAndContainsCriteriaAndAQuotedName)

@@ -5,7 +5,6 @@
 
 #include <gtest/gtest.h>
 
-#include <climits>
 #include <cstdlib>
 #include <functional>
 
@@ -226,11 +225,7 @@ TEST(StoredSignIn, SurvivesANewClientFailsOnceWithdrawnIsRefreshedAndForgottenOn
 TEST(EnvironmentLogin, OneSignInServesTheProcessUntilTheServiceRefusesItsToken)
 {
     IdentityService service;
-    // Counts the sign-ins the service sees; never fires.
-    server::FaultRule counter;
-    counter.mPathPattern = "/ovra/login/.*";
-    counter.mNth = INT_MAX;
-    const auto signIns = service.Service().Faults().Install(counter);
+    const auto signIns = testsupport::CountRequests(service.Service(), "/ovra/login/.*");
     setenv("TOLMONETSYNC_USERNAME", "ann", 1);
 
     setenv("TOLMONETSYNC_PASSWORD", "wrong", 1);

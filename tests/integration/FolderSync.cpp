@@ -4,10 +4,10 @@
 #include <chrono>
 #include <thread>
 
-#include "foundation/net/HeaderConstants.h"
 #include "server/Accounts.h"
 #include "server/AssetStore.h"
 #include "server/TreeSeeder.h"
+#include "support/HostClient.h"
 #include "tarnvault/Tarnvault.h"
 
 namespace synctest {
@@ -22,11 +22,8 @@ const char kClientId[] = "folder-sync";
 
 boost::shared_ptr<SyncServer> ClientOf(const std::string& assetServiceUrl)
 {
-    ParameterList parameters;
-    parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(assetServiceUrl));
-    parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, UTF8String(kClientId));
-    parameters.emplace_back(tolmonet::kHEADER_COOKIE, UTF8String(testsupport::kAliceToken));
-    return boost::shared_ptr<SyncServer>(new tarnvault::Tarnvault(parameters));
+    return boost::shared_ptr<SyncServer>(
+        new tarnvault::Tarnvault(testsupport::Parameters(assetServiceUrl, testsupport::kAliceToken, kClientId)));
 }
 
 }  // namespace

@@ -14,11 +14,11 @@
 #include <sstream>
 
 #include "DecisionModel.h"
-#include "support/SyncHarness.h"
-#include "foundation/net/HeaderConstants.h"
 #include "server/Accounts.h"
 #include "server/AssetStore.h"
 #include "server/TreeSeeder.h"
+#include "support/HostClient.h"
+#include "support/SyncHarness.h"
 #include "support/TestScopes.h"
 #include "support/TestService.h"
 #include "tarnvault/Tarnvault.h"
@@ -157,11 +157,8 @@ private:
 
     synctest::RunResult Sync(SyncMode mode)
     {
-        ParameterList parameters;
-        parameters.emplace_back(tolmonet::kHEADER_LOCATION, UTF8String(mService->AssetServiceUrl()));
-        parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, UTF8String(kClientId));
-        parameters.emplace_back(tolmonet::kHEADER_COOKIE, UTF8String(testsupport::kAliceToken));
-        synctest::SyncHarness host(boost::shared_ptr<SyncServer>(new tarnvault::Tarnvault(parameters)));
+        synctest::SyncHarness host(boost::shared_ptr<SyncServer>(new tarnvault::Tarnvault(
+            testsupport::Parameters(mService->AssetServiceUrl(), testsupport::kAliceToken, kClientId))));
         host.Service().RegisterSyncDirectory(SyncDir(Dir(tolmocore::utility::ToUTF16(Folder().string())), u".txt",
                                                      u"Presets", ImmutableString::CreateStatic(kMediaType), mOptions,
                                                      1 << 20));

@@ -71,7 +71,7 @@ protected:
     testsupport::TestService mService;
     Stage mStage{mService, "matrix"};
     testsupport::TempDir mOutputs;
-    const std::shared_ptr<const tolmonetsync::server::FaultHandle> mCounter = CountRequests(*mService);
+    const std::shared_ptr<const tolmonetsync::server::FaultHandle> mCounter = testsupport::CountRequests(*mService);
 };
 
 TEST_F(CrashConsistency, KilledSyncsLoseNothingAndTheNextOneConverges)

@@ -2,13 +2,10 @@
 
 #include <gtest/gtest.h>
 
-#include <climits>
-
-#include "foundation/core/HostConfig.h"
 #include "foundation/net/CurlRequestProcessor.h"
-#include "foundation/net/HeaderConstants.h"
 #include "server/Accounts.h"
 #include "server/AssetStore.h"
+#include "support/HostClient.h"
 #include "tarnvault/Tarnvault.h"
 
 namespace reliability {
@@ -34,23 +31,13 @@ SyncDir Registered(const fs::path& path, const char* group)
 
 void UseStageHost()
 {
-    tolmocore::config::SetCompanyName(u"Co");
-    tolmocore::config::SetClientName(u"Matrix");
-    tolmocore::config::SetClientInternalVersion(u"1.0");
+    testsupport::HostIdentity::Set(u"Co", u"Matrix", u"1.0");
     tolmonet::http::CurlRequestProcessor::SetProcessWideTimeouts(std::chrono::seconds(5), std::chrono::seconds(1));
 }
 
 void RestoreTimeouts()
 {
     tolmonet::http::CurlRequestProcessor::SetProcessWideTimeouts(std::chrono::seconds(30), std::chrono::seconds(60));
-}
-
-std::shared_ptr<const FaultHandle> CountRequests(LocalService& service)
-{
-    FaultRule counter;
-    counter.mPathPattern = ".*";
-    counter.mNth = INT_MAX;
-    return service.Faults().Install(counter);
 }
 
 Stage::Stage(TestService& service, const std::string& clientId)
@@ -62,12 +49,9 @@ Stage::Stage(TestService& service, const std::string& clientId)
 
 synctest::RunResult Stage::Sync(bool withFresh)
 {
-    ParameterList parameters;
-    parameters.emplace_back(tolmonet::kHEADER_LOCATION,
-                            UTF8String(mApiUrl.empty() ? mService->AssetServiceUrl() : mApiUrl));
-    parameters.emplace_back(tolmonet::kHEADER_USER_AGENT, UTF8String(mClient));
-    parameters.emplace_back(tolmonet::kHEADER_COOKIE, testsupport::kAliceToken);
-    synctest::SyncHarness host(boost::shared_ptr<SyncServer>(new tarnvault::Tarnvault(parameters)));
+    const std::string url = mApiUrl.empty() ? mService->AssetServiceUrl() : mApiUrl;
+    synctest::SyncHarness host(boost::shared_ptr<SyncServer>(
+        new tarnvault::Tarnvault(testsupport::Parameters(url, testsupport::kAliceToken, mClient))));
     host.Service().RegisterSyncDirectory(Registered(mKeep, "Keep"));
     if (withFresh) host.Service().RegisterSyncDirectory(Registered(mFresh, "Fresh"));
     return host.Sync(SyncMode_TwoWay);

@@ -32,9 +32,6 @@ using FileMap = std::map<std::string, std::string>;
 void UseStageHost();
 void RestoreTimeouts();
 
-// A fault rule that never fires, counting the requests the service gets.
-std::shared_ptr<const tolmonetsync::server::FaultHandle> CountRequests(tolmonetsync::server::LocalService& service);
-
 class Stage {
 public:
     // On `service`, which outlives the stage, as a client no other stage is.

@@ -96,7 +96,7 @@ TEST_F(Tls, CommandIsAnsweredOnlyOverHttpsAndOnlyWhenItTrustsTheCa)
         options.mCertificateFile = Certificate().string();
         options.mPrivateKeyFile = Key().string();
     });
-    const auto reached = reliability::CountRequests(*service);
+    const auto reached = testsupport::CountRequests(*service);
     const std::string https = service->AssetServiceUrl();
     ASSERT_EQ(https.rfind("https://127.0.0.1:", 0), 0u) << https;
     EXPECT_EQ(service->IdentityServiceUrl().rfind("https://127.0.0.1:", 0), 0u);

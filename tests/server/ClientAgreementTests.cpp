@@ -13,8 +13,8 @@
 #include "ServiceFixture.h"
 #include "foundation/core/File.h"
 #include "foundation/core/ImmutableString.h"
-#include "foundation/net/HeaderConstants.h"
 #include "support/CallRecorder.h"
+#include "support/HostClient.h"
 #include "tarnvault/Tarnvault.h"
 
 namespace servertest {
@@ -71,11 +71,8 @@ protected:
     explicit ClientAgreementTest(const testsupport::TestService::Customise& customise = {}) : ServiceTest(customise)
     {
         mService->SetAnswerStyle(GetParam());
-        ParameterList parameters;
-        parameters.push_back(std::make_pair(tolmonet::kHEADER_LOCATION, UTF8String(mService->AssetServiceUrl())));
-        parameters.push_back(std::make_pair(tolmonet::kHEADER_COOKIE, UTF8String(kAliceToken)));
-        parameters.push_back(std::make_pair(tolmonet::kHEADER_USER_AGENT, UTF8String("desk app")));
-        mClient.reset(new tarnvault::Tarnvault(parameters));
+        mClient.reset(
+            new tarnvault::Tarnvault(testsupport::Parameters(mService->AssetServiceUrl(), kAliceToken, "desk app")));
     }
 
     File FileNamed(const std::string& name) const

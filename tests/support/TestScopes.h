@@ -48,13 +48,7 @@ public:
         tolmocore::debug::SetTraceSpec("");
         tolmocore::debug::SetTraceFile("");
     }
-    bool Contains(const std::string& text)
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        for (const std::string& line : mLines)
-            if (line.find(text) != std::string::npos) return true;
-        return false;
-    }
+    bool Contains(const std::string& text) { return CountWith(text) > 0; }
     // The first line holding `text`; empty if none does.
     std::string LineWith(const std::string& text)
     {
@@ -70,11 +64,6 @@ public:
         std::size_t count = 0;
         for (const std::string& line : mLines) count += line.find(text) != std::string::npos ? 1 : 0;
         return count;
-    }
-    std::size_t Count()
-    {
-        std::lock_guard<std::mutex> lock(mMutex);
-        return mLines.size();
     }
 
 private:

@@ -1,5 +1,7 @@
 #include "support/TestService.h"
 
+#include <limits>
+
 namespace testsupport {
 
 using tolmonetsync::server::LocalService;
@@ -19,15 +21,29 @@ LocalServiceOptions TestService::DefaultOptions(const std::filesystem::path& roo
 
 TestService::TestService(const Customise& customise) : mOptions(DefaultOptions(mRoot.Path()))
 {
-    if (customise)
-        customise(mOptions);
+    if (customise) customise(mOptions);
     mDataDirectory = mOptions.mDataDirectory;
     Restart();
 }
 
-TestService::~TestService() { Stop(); }
+TestService::~TestService()
+{
+    Stop();
+}
 
-void TestService::Stop() { mService.reset(); }
+std::shared_ptr<const tolmonetsync::server::FaultHandle> CountRequests(tolmonetsync::server::LocalService& service,
+                                                                       const std::string& pathPattern)
+{
+    tolmonetsync::server::FaultRule rule;
+    rule.mPathPattern = pathPattern;
+    rule.mNth = std::numeric_limits<int>::max();
+    return service.Faults().Install(rule);
+}
+
+void TestService::Stop()
+{
+    mService.reset();
+}
 
 void TestService::Restart()
 {

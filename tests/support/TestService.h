@@ -53,4 +53,8 @@ private:
     std::unique_ptr<tolmonetsync::server::LocalService> mService;
 };
 
+// Counts the requests whose path matches, by a fault rule that never fires.
+std::shared_ptr<const tolmonetsync::server::FaultHandle> CountRequests(tolmonetsync::server::LocalService& service,
+                                                                       const std::string& pathPattern = ".*");
+
 }  // namespace testsupport

@@ -141,6 +141,5 @@ protected:
     boost::shared_ptr<Tarnvault> mClient;
 };
 
-using TraceLines = testsupport::TraceCapture;
 
 }  // namespace tvtest

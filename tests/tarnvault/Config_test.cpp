@@ -19,7 +19,7 @@ ParameterList List(std::initializer_list<std::pair<ImmutableString, const char*>
 
 TEST(Configuration, EachKeyAndWhatAnUnknownOrRepeatedEntryDoes)
 {
-    TraceLines trace("Tarnvault:1");
+    TraceCapture trace("Tarnvault:1");
     const Tarnvault none((ParameterList()));
     EXPECT_EQ(none.mServerURL.ToStdString(), kProduction.ToStdString());
     EXPECT_TRUE(none.mClientID.empty());

@@ -42,14 +42,6 @@ UTF16String Domain(const char16_t* kind)
 
 class CredentialsTest : public ::testing::Test {
 protected:
-    // Every request the service sees, counted by a rule that never fires.
-    std::shared_ptr<const server::FaultHandle> CountRequests()
-    {
-        server::FaultRule rule;
-        rule.mPathPattern = ".*";
-        rule.mNth = 1 << 30;
-        return mService->Faults().Install(rule);
-    }
     StateList SignIn(const std::string& access, const char* user = "user-7")
     {
         return Reported(
@@ -91,14 +83,14 @@ TEST_F(CredentialsTest, SetCredentialsStoresThemPrivatelyAndProvesTheStoredToken
     EXPECT_TRUE(mClient->mAccessToken.empty() && mClient->mUserID.empty());
     EXPECT_FALSE(std::filesystem::exists(LastUserFile()));
     EXPECT_FALSE(tolmocore::Keychain::GetPassword(Domain(u"Access"), u"user-7").empty());
-    const auto requests = CountRequests();
+    const auto requests = testsupport::CountRequests(*mService);
     EXPECT_EQ(Check(), StateList{SyncServer_NotLoggedIn});
     EXPECT_EQ(requests->Seen(), 0);
 }
 
 TEST_F(CredentialsTest, NothingUsableStoredIsNotLoggedInAtOnceWithoutARequest)
 {
-    const auto requests = CountRequests();
+    const auto requests = testsupport::CountRequests(*mService);
     EXPECT_EQ(Check(), StateList{SyncServer_NotLoggedIn});
     EXPECT_EQ(SignIn(""), StateList{SyncServer_NotLoggedIn});
     EXPECT_FALSE(std::filesystem::exists(LastUserFile()));
@@ -107,7 +99,7 @@ TEST_F(CredentialsTest, NothingUsableStoredIsNotLoggedInAtOnceWithoutARequest)
     EXPECT_EQ(Check(), StateList{SyncServer_NotLoggedIn});
     EXPECT_TRUE(std::filesystem::exists(LastUserFile()));
 
-    TraceLines trace("Tarnvault:1");
+    TraceCapture trace("Tarnvault:1");
     for (const char* damaged : {"not json", "[]", R"({"mUserID":5})"}) {
         SCOPED_TRACE(damaged);
         WriteFileBytes(LastUserFile(), damaged);
@@ -144,8 +136,8 @@ TEST_F(CredentialsTest, APreferenceDirectoryOthersCanWriteIsRefusedWithoutSignin
 {
     ASSERT_EQ(SignIn(kAliceToken), StateList{SyncServer_Connected});
     std::filesystem::permissions(mPrefs.Path(), std::filesystem::perms::all);
-    const auto requests = CountRequests();
-    TraceLines trace("Tarnvault:1");
+    const auto requests = testsupport::CountRequests(*mService);
+    TraceCapture trace("Tarnvault:1");
     EXPECT_EQ(Check(), StateList{SyncServer_ConnectionFailed});
     EXPECT_EQ(SignIn(kAliceToken, "user-8"), StateList{SyncServer_ConnectionFailed});
     EXPECT_EQ(requests->Seen(), 0);
@@ -162,7 +154,7 @@ TEST_F(ClientTest, TraceLinesShowNoSecret)
 {
     PrefDirScope prefs;
     HostIdentity host(u"Co", u"App", u"9.0");
-    TraceLines trace("8");
+    TraceCapture trace("8");
     mService.Push(Answer(200, "[" + CollectionJSON("r", "client-1", kRootMedia) + "]"));
     mService.Push(Answer(404, R"({"access_token":"secret-body-7"})", {{"Authorization", "Bearer secret-header-7"}}));
     ASSERT_EQ(Reported([&](const auto& report) {

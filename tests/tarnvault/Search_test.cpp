@@ -110,7 +110,7 @@ TEST_F(ClientTest, UnusableAnswersReachTheErrorCallback)
         {"header: an array", header, Answer(200, "[1]"), -100, "_HandleHeader: JSON parsing problem"},
         {"header: past the bound", header, Large("{", huge), -100, "_HandleHeader: JSON answer is larger than 64 MiB"},
     };
-    TraceLines trace("Tarnvault:1");
+    TraceCapture trace("Tarnvault:1");
     mService.Push(Answer(200, "[]"));
     EXPECT_TRUE(Await([&](Outcome& o) { search(*mClient, o, Guid::CreateUnique()); }).Succeeded());
     for (const auto& c : cases) {

@@ -13,6 +13,7 @@
 
 #include "foundation/core/Dir.h"
 #include "foundation/core/HostConfig.h"
+#include "support/HostClient.h"
 #include "support/TempDir.h"
 
 using namespace tolmocore::filesupport;
@@ -106,14 +107,12 @@ protected:
     }
     void TearDown() override
     {
-        tolmocore::config::SetCompanyName(mCompany);
-        tolmocore::config::SetClientName(mClient);
         mHadXdg ? setenv("XDG_CONFIG_HOME", mXdg.c_str(), 1) : unsetenv("XDG_CONFIG_HOME");
         setenv("HOME", mHome.c_str(), 1);
         Dir::SetPrefDir(Dir());
     }
 
-    UTF16String mCompany = tolmocore::config::GetCompanyName(), mClient = tolmocore::config::GetClientName();
+    testsupport::HostIdentity mHost{u"", u"", u""};  // puts the identity back afterwards
     std::string mXdg, mHome;
     bool mHadXdg = false;
 };
