@@ -17,19 +17,9 @@ namespace fs = std::filesystem;
 using clitest::Contains;
 using clitest::Finished;
 using clitest::RunCli;
-using testsupport::ReadFileBytes;
 using testsupport::WriteFileBytes;
 
 const char kToken[] = "cli-test-token";
-
-// Every regular file under `root` with its bytes, by path relative to root.
-std::map<std::string, std::string> Snapshot(const fs::path& root)
-{
-    std::map<std::string, std::string> files;
-    for (const fs::directory_entry& entry : fs::recursive_directory_iterator(root))
-        if (entry.is_regular_file()) files[fs::relative(entry.path(), root).string()] = ReadFileBytes(entry.path());
-    return files;
-}
 
 // One computer of the test user: a folder of ".txt" files and a preference
 // directory, synced through the command.
@@ -90,14 +80,15 @@ TEST_F(SyncCommand, DryRunPrintsThePlanAndChangesNothingAnywhere)
     stale.Write("x.txt", "x");
     ASSERT_EQ(mDesktop.Sync(mService, {"--dir", stale.DirSpec("Stale")}).mStatus, 0);
     mLaptop.Write("b.txt", "b2");  // and a change here
-    const auto before = Snapshot(mRoot / "laptop");
+    const auto before = testsupport::Snapshot(mRoot / "laptop", true);
     for (int run = 0; run < 2; ++run) {  // the second sees the server as the first left it
         const Finished planned = mLaptop.Sync(mService, {"--dry-run"});
         ASSERT_EQ(planned.mStatus, 0) << planned.mErr;
         EXPECT_TRUE(Contains(planned.mOut, "delete    server group Stale")) << planned.mOut;
         EXPECT_TRUE(Contains(planned.mOut, "upload    Notes/b.txt: changed locally")) << planned.mOut;
         EXPECT_FALSE(Contains(planned.mOut, "uploaded"));
-        EXPECT_EQ(Snapshot(mRoot / "laptop"), before);  // the folder, no backup directory, the same cache file
+        EXPECT_EQ(testsupport::Snapshot(mRoot / "laptop", true),
+                  before);  // the folder, no backup directory, the same cache file
     }
 }
 

@@ -1,8 +1,6 @@
 #include "FolderSync.h"
 
 #include <algorithm>
-#include <chrono>
-#include <thread>
 
 #include "server/Accounts.h"
 #include "server/AssetStore.h"
@@ -45,14 +43,6 @@ std::unique_ptr<SyncHarness> FolderSync::NewHost()
     return host;
 }
 
-Files FolderSync::Local() const
-{
-    Files files;
-    for (const auto& entry : fs::directory_iterator(Folder()))
-        files[entry.path().filename().string()] = ReadFileBytes(entry.path());
-    return files;
-}
-
 Files FolderSync::Backups() const
 {
     Files saved;
@@ -64,12 +54,6 @@ Files FolderSync::Backups() const
             copies += (copies.empty() ? "" : "|") + ReadFileBytes(file.path());
         }
     return saved;
-}
-
-std::string FolderSync::CacheFile() const
-{
-    const fs::path path = mPrefs.Path() / "tolmonetsynccache.json";
-    return fs::exists(path) ? ReadFileBytes(path) : std::string("<none>");
 }
 
 std::string FolderSync::Group(const std::string& group, bool create)
@@ -105,11 +89,11 @@ Files FolderSync::Items(const std::string& group)
 
 void FolderSync::PutItem(const std::string& group, const std::string& name, const std::string& bytes)
 {
-    // Dates travel in whole seconds: a change staged in the second of the
-    // last sync would carry that sync's date.
-    std::this_thread::sleep_until(std::chrono::ceil<std::chrono::seconds>(std::chrono::system_clock::now()));
+    // Dates travel in whole seconds: each version gets a second of its own,
+    // as another computer's clock would give it, never the last sync's.
     RemoveItem(group, name);
-    server::TreeSeeder(*mService, kUser).Item(Group(group, true), name, bytes);
+    const std::string id = server::TreeSeeder(*mService, kUser).Item(Group(group, true), name, bytes);
+    mService->Assets().SetModified(mOwner, id, ++mRemoteSecond * 1000000);
 }
 
 void FolderSync::RemoveItem(const std::string& group, const std::string& name)

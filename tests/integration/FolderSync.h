@@ -42,16 +42,16 @@ protected:
     RunResult Sync(SyncMode mode) { return NewHost()->Sync(mode); }
 
     // The folder's files by name, ".temp" files included.
-    Files Local() const;
+    Files Local() const { return testsupport::Snapshot(Folder()); }
     // Every backed-up copy of a name, joined by "|".
     Files Backups() const;
     // The cache file's bytes; "<none>" without one.
-    std::string CacheFile() const;
+    std::string CacheFile() const { return CacheFileIn(mPrefs.Path()); }
 
     // The groups under this host's preferences root, sorted.
     std::vector<std::string> Groups();
     Files Items(const std::string& group);
-    // A new upload of the name, dated at least a second after any before it.
+    // A new upload of the name, dated a second after any before it.
     void PutItem(const std::string& group, const std::string& name, const std::string& bytes);
     void RemoveItem(const std::string& group, const std::string& name);
     void MakeGroup(const std::string& group) { Group(group, true); }
@@ -64,6 +64,7 @@ private:
     // The group's id (the preferences root's for ""); empty if missing.
     std::string Group(const std::string& group, bool create);
     std::int64_t mOwner;
+    std::int64_t mRemoteSecond = 1577836800;  // 2020-01-01, counting up
 };
 
 }  // namespace synctest

@@ -47,15 +47,6 @@ std::uint32_t Setting(const char* name, std::uint32_t fallback)
     return std::string(text) == "random" ? std::random_device()() : static_cast<std::uint32_t>(std::stoul(text));
 }
 
-// Every file directly in the directory by name, leftovers included.
-Contents FilesIn(const fs::path& dir)
-{
-    Contents files;
-    for (const auto& entry : fs::directory_iterator(dir))
-        files[entry.path().filename().string()] = testsupport::ReadFileBytes(entry.path());
-    return files;
-}
-
 // The host's folder and preference directory, the service, the second
 // computer, which changes the group straight in the service's store, and
 // the model of them all.
@@ -122,7 +113,7 @@ public:
         const synctest::RunResult result = Sync(mode);
         EXPECT_TRUE(result.Ok()) << result.mError;
         EXPECT_EQ(result.mMoved, static_cast<int>(expected.mUploaded.size() + expected.mDownloaded.size()));
-        EXPECT_EQ(FilesIn(Folder()), expected.mLocal);
+        EXPECT_EQ(testsupport::Snapshot(Folder()), expected.mLocal);
         const std::map<std::string, RemoteItem> items = Items();
         Contents remote;
         for (const auto& [name, item] : items) {
@@ -200,7 +191,8 @@ private:
     {
         Contents copies;
         for (const auto& run : fs::directory_iterator(mPrefs.Path() / "SyncBackup"))
-            if (run.is_directory() && mSeenRuns.insert(run.path()).second) copies.merge(FilesIn(run.path()));
+            if (run.is_directory() && mSeenRuns.insert(run.path()).second)
+                copies.merge(testsupport::Snapshot(run.path()));
         return copies;
     }
 

@@ -82,9 +82,8 @@ FileMap Stage::Local() const
 {
     FileMap files;
     for (const fs::path& dir : {mKeep, mFresh})
-        for (const auto& entry : fs::directory_iterator(dir))
-            if (entry.path().extension() == ".txt")
-                files[dir.filename().string() + "/" + entry.path().filename().string()] = ReadFileBytes(entry.path());
+        for (const auto& [name, bytes] : testsupport::Snapshot(dir))
+            if (fs::path(name).extension() == ".txt") files[dir.filename().string() + "/" + name] = bytes;
     return files;
 }
 
@@ -117,12 +116,6 @@ FileMap Stage::Backups(const std::set<std::string>& skip) const
             if (entry.is_regular_file()) files[entry.path().filename().string()] += ReadFileBytes(entry.path()) + "|";
     }
     return files;
-}
-
-std::string Stage::CacheFile() const
-{
-    const fs::path path = mPrefs.Path() / "tolmonetsynccache.json";
-    return fs::exists(path) ? ReadFileBytes(path) : std::string("<none>");
 }
 
 std::string Stage::GroupId(const char* group)

@@ -61,7 +61,7 @@ public:
     // Every backed-up copy, but for those in the directories named in `skip`.
     FileMap Backups(const std::set<std::string>& skip = std::set<std::string>()) const;
     // The cache file's bytes, or "<none>".
-    std::string CacheFile() const;
+    std::string CacheFile() const { return synctest::CacheFileIn(mPrefs.Path()); }
     const std::filesystem::path& PrefDir() const { return mPrefs.Path(); }
     tolmonetsync::server::LocalService& Service() { return *mService; }
     tolmonetsync::server::TreeSeeder& Seed() { return mSeed; }

@@ -10,6 +10,12 @@
 
 namespace synctest {
 
+std::string CacheFileIn(const std::filesystem::path& prefDir)
+{
+    const std::filesystem::path path = prefDir / "tolmonetsynccache.json";
+    return std::filesystem::exists(path) ? testsupport::ReadFileBytes(path) : std::string("<none>");
+}
+
 namespace {
 
 // Set when the last holder of a run's callbacks lets go of them.

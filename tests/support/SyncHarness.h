@@ -30,6 +30,8 @@ inline Dir DirAt(const std::filesystem::path& path)
 {
     return Dir(Path(path));
 }
+// The bytes of the cache file in `prefDir`, or "<none>".
+std::string CacheFileIn(const std::filesystem::path& prefDir);
 
 // A plan over `server`; without one, a plan whose server is never asked (for
 // the scan, the cache file and the local file operations).

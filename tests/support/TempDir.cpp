@@ -34,4 +34,18 @@ void WriteFileBytes(const std::filesystem::path& path, const std::string& bytes)
     if (!out) throw std::runtime_error("cannot write " + path.string());
 }
 
+std::map<std::string, std::string> Snapshot(const std::filesystem::path& root, bool recursive)
+{
+    namespace fs = std::filesystem;
+    std::map<std::string, std::string> files;
+    auto take = [&](const fs::directory_entry& entry) {
+        if (entry.is_regular_file()) files[fs::relative(entry.path(), root).string()] = ReadFileBytes(entry.path());
+    };
+    if (recursive)
+        for (const auto& entry : fs::recursive_directory_iterator(root)) take(entry);
+    else
+        for (const auto& entry : fs::directory_iterator(root)) take(entry);
+    return files;
+}
+
 }  // namespace testsupport

@@ -3,6 +3,7 @@
 // everything in it when the object goes.
 
 #include <filesystem>
+#include <map>
 #include <string>
 
 namespace testsupport {
@@ -24,5 +25,8 @@ private:
 // Whole-file helpers for tests.
 std::string ReadFileBytes(const std::filesystem::path& path);
 void WriteFileBytes(const std::filesystem::path& path, const std::string& bytes);
+// The regular files in `root` (below it too when `recursive`) and their
+// bytes, by path relative to root.
+std::map<std::string, std::string> Snapshot(const std::filesystem::path& root, bool recursive = false);
 
 }  // namespace testsupport
