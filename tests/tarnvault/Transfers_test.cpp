@@ -32,6 +32,16 @@ protected:
         EXPECT_TRUE(outcome.Wait());
         return outcome;
     }
+    // A failure with its status and, when one is given, exactly its text.
+    static void ExpectFailure(const Outcome& outcome, int status, const char* text)
+    {
+        EXPECT_FALSE(outcome.Succeeded());
+        EXPECT_EQ(outcome.Status(), status);
+        if (text)
+            EXPECT_EQ(outcome.ErrorText(), text);
+        else
+            EXPECT_FALSE(outcome.ErrorText().empty());
+    }
     File At(const std::filesystem::path& name) { return File(tolmocore::utility::ToUTF16((mDir / name).string())); }
 
     testsupport::TempDir mDir;
@@ -109,13 +119,7 @@ TEST_F(TransferTest, UploadFailures)
         const size_t before = mService.Requests().size();
         for (const HttpAnswer& reply : failure.mReplies) mService.Push(reply);
         const auto collection = Make("C");
-        const Outcome outcome = Upload(failure.mFile, collection);
-        EXPECT_FALSE(outcome.Succeeded());
-        EXPECT_EQ(outcome.Status(), failure.mStatus);
-        if (failure.mText)
-            EXPECT_EQ(outcome.ErrorText(), failure.mText);
-        else
-            EXPECT_FALSE(outcome.ErrorText().empty());
+        ExpectFailure(Upload(failure.mFile, collection), failure.mStatus, failure.mText);
         EXPECT_EQ(mService.Requests().size() - before, failure.mReplies.size());
         EXPECT_TRUE(collection->mChildren.empty());
     }
@@ -178,13 +182,7 @@ TEST_F(TransferTest, DownloadFailuresLeaveTheFileAsItWas)
         SCOPED_TRACE(failure.mWhat);
         const bool existed = std::filesystem::exists(mDir / failure.mTarget);
         mService.Push(failure.mReply);
-        const Outcome outcome = Download(failure.mTarget);
-        EXPECT_FALSE(outcome.Succeeded());
-        EXPECT_EQ(outcome.Status(), failure.mStatus);
-        if (failure.mText)
-            EXPECT_EQ(outcome.ErrorText(), failure.mText);
-        else
-            EXPECT_FALSE(outcome.ErrorText().empty());
+        ExpectFailure(Download(failure.mTarget), failure.mStatus, failure.mText);
         if (existed)
             EXPECT_EQ(ReadFileBytes(mDir / failure.mTarget), "old");
         else
