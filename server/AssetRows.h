@@ -26,6 +26,15 @@ AssetRecord Require(Connection& db, std::int64_t owner, const std::string& id);
 // Require, and 404 unless it is a collection.
 AssetRecord RequireCollection(Connection& db, std::int64_t owner, const std::string& id);
 std::vector<AssetRecord> MembersOf(Connection& db, const std::string& collectionId);
+// Lookups by exact name, through the name index, so their cost follows the
+// matches, not the size of the collection or of the tree. Only assets whose
+// trashed flag is `trashed` or `orTrashed` (pass 0 and 1 for either).
+// The direct members of the collection so named, in member order:
+std::vector<AssetRecord> MembersNamed(Connection& db, std::int64_t owner, const std::string& collectionId,
+                                      const std::string& name, std::int64_t trashed, std::int64_t orTrashed);
+// Every asset so named but client roots, in creation order:
+std::vector<AssetRecord> AssetsNamed(Connection& db, std::int64_t owner, const std::string& name, std::int64_t trashed,
+                                     std::int64_t orTrashed);
 void Insert(Connection& db, std::int64_t owner, const AssetRecord& record, const std::string& clientId);
 // Appends to the end of the collection's members unless already a member.
 void AppendMember(Connection& db, const std::string& collectionId, const std::string& assetId);

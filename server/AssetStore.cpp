@@ -4,6 +4,7 @@
 
 #include <chrono>
 #include <set>
+#include <utility>
 
 #include "server/AssetRows.h"
 #include "server/Random.h"
@@ -33,6 +34,14 @@ bool Matches(const SearchFilter& filter, const AssetRecord& record)
     if (!filter.mType.empty() && (!record.mCollection || record.mMediaType != filter.mType)) return false;
     if (!filter.mName.empty() && record.mName != filter.mName) return false;
     return MatchesTrashed(filter.mTrashed, record.mTrashed);
+}
+
+// The flag values a database lookup may narrow to; Matches still decides.
+std::pair<std::int64_t, std::int64_t> TrashedValues(const TrashedCriterion& criterion)
+{
+    if (!MatchesTrashed(criterion, false)) return {1, 1};
+    if (!MatchesTrashed(criterion, true)) return {0, 0};
+    return {0, 1};
 }
 
 }  // namespace
@@ -123,17 +132,28 @@ std::vector<AssetRecord> AssetStore::Search(std::int64_t owner, const SearchFilt
     EnsureUserRoot(owner);
     Database::Lease db = mDatabase.Acquire();
     Transaction snapshot(*db, false);
+    // A name narrows in the database, before any row is read; Matches stays
+    // the one definition of what is found.
+    const bool byName = !filter.mName.empty();
+    const std::pair<std::int64_t, std::int64_t> trashed = TrashedValues(filter.mTrashed);
     std::vector<AssetRecord> candidates;
     if (scopes.empty()) {
-        Statement all(*db, "SELECT " TOLMONETSYNC_ASSET_COLUMNS
-                           " FROM assets a WHERE a.owner = ?1 AND a.client_id IS NULL ORDER BY a.seq");
-        all.Bind(1, owner);
-        while (all.Step()) candidates.push_back(rows::ReadAsset(all));
+        if (byName) {
+            candidates = rows::AssetsNamed(*db, owner, filter.mName, trashed.first, trashed.second);
+        } else {
+            Statement all(*db, "SELECT " TOLMONETSYNC_ASSET_COLUMNS
+                               " FROM assets a WHERE a.owner = ?1 AND a.client_id IS NULL ORDER BY a.seq");
+            all.Bind(1, owner);
+            while (all.Step()) candidates.push_back(rows::ReadAsset(all));
+        }
     } else {
         std::set<std::string> seen;
         for (const std::string& scope : scopes) {
             rows::RequireCollection(*db, owner, scope);
-            for (AssetRecord& member : rows::MembersOf(*db, scope)) {
+            std::vector<AssetRecord> members =
+                byName ? rows::MembersNamed(*db, owner, scope, filter.mName, trashed.first, trashed.second)
+                       : rows::MembersOf(*db, scope);
+            for (AssetRecord& member : members) {
                 if (seen.insert(member.mId).second) candidates.push_back(std::move(member));
             }
         }

@@ -27,6 +27,8 @@ const char kSchema[] =
     " created INTEGER NOT NULL, modified INTEGER NOT NULL, trashed INTEGER NOT NULL DEFAULT 0,"
     " client_id TEXT);"
     "CREATE INDEX IF NOT EXISTS assets_owner ON assets(owner, seq);"
+    // A search by name reads only the assets so named, however large their collection.
+    "CREATE INDEX IF NOT EXISTS assets_name ON assets(owner, name, trashed);"
     "CREATE UNIQUE INDEX IF NOT EXISTS assets_client_root ON assets(owner, client_id)"
     " WHERE client_id IS NOT NULL;"
     "CREATE TABLE IF NOT EXISTS members ("

@@ -132,7 +132,17 @@ TEST_F(EndpointTest, SearchGivesCreationOrderAndDirectMembersAndSelectsByNameTyp
     const std::string lower = Upload(*mAlice, named, "name", "1");
     const std::string hostile = Upload(*mAlice, named, "name with ?&= and é", "2");
     const std::string trashed = Upload(*mAlice, named, "trashed", "t");
-    mService->Assets().SetTrashed(*mService->GetAccounts().UserForToken(kAliceToken), trashed, true);
+    // Two versions of one name, member order against creation order, each in both collections.
+    const std::string x = CreateCollection(*mAlice, "x");
+    const std::string y = CreateCollection(*mAlice, "y");
+    const std::string older = Upload(*mAlice, y, "same", "1");
+    const std::string newer = Upload(*mAlice, x, "same", "2");
+    AddMember(*mAlice, x, "/assets/" + older);
+    AddMember(*mAlice, y, "/assets/" + newer);
+    const std::int64_t alice = *mService->GetAccounts().UserForToken(kAliceToken);
+    mService->Assets().SetTrashed(alice, trashed, true);
+    mService->Assets().SetTrashed(alice, older, true);
+    const std::string xy = "[\"/collections/" + x + "\",\"/collections/" + y + "\"]";
     struct Row {
         const char* mLabel;
         std::string mQuery, mScope;
@@ -149,6 +159,10 @@ TEST_F(EndpointTest, SearchGivesCreationOrderAndDirectMembersAndSelectsByNameTyp
         {"trashed", "{\"trashed\":true}", Scope(named), {trashed}},
         {"trashed by $contains", "{\"trashed\":{\"$contains\":true}}", Scope(named), {trashed}},
         {"no condition", "{}", Scope(named), {lower, hostile, trashed}},
+        {"a name in member order, each once", "{\"name\":\"same\"}", xy, {newer, older}},
+        {"a name without a scope in creation order", "{\"name\":\"same\"}", "", {older, newer}},
+        {"a name, not trashed", "{\"name\":\"same\",\"trashed\":{\"$ne\":true}}", xy, {newer}},
+        {"a name, trashed", "{\"name\":\"same\",\"trashed\":true}", "", {older}},
     };
     for (const Row& row : rows) {
         SCOPED_TRACE(row.mLabel);
