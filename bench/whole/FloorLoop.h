@@ -17,8 +17,16 @@ struct FloorRequest {
     std::string mSaveAs;  // when set, the answer's body is written to this file, as a download must
 };
 
+// How a body given mSaveAs reaches its file.
+enum class Saving {
+    Plain,    // straight into the file, nothing made durable
+    Durable,  // a naive safe writer: a temporary beside the file, fsynced and
+              // renamed into place as each answer completes, one at a time;
+              // each directory fsynced once at the end
+};
+
 // Runs every request with at most `parallel` in flight; gives the seconds the
 // whole took. Throws if an answer has another status than expected.
-double RunFloor(const std::vector<FloorRequest>& requests, long parallel);
+double RunFloor(const std::vector<FloorRequest>& requests, long parallel, Saving saving = Saving::Plain);
 
 }  // namespace wholebench
