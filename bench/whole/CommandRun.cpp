@@ -7,6 +7,7 @@
 
 #include <algorithm>
 #include <chrono>
+#include <cstdlib>
 #include <fstream>
 #include <iterator>
 #include <stdexcept>
@@ -77,6 +78,11 @@ void WriteSmallFiles(const fs::path& folder, int count, std::size_t size, int sa
         for (std::size_t at = 0; at < size; ++at) bytes[at] = static_cast<char>((i * 131 + at * 7 + salt * 17) & 0xff);
         std::ofstream(folder / ("f" + std::to_string(10000 + i) + ".bin"), std::ios::binary) << bytes;
     }
+}
+
+void RemoveUnlessKept(const fs::path& path)
+{
+    if (!std::getenv("WHOLE_BENCH_KEEP")) fs::remove_all(path);
 }
 
 double Median(std::vector<double> figures)

@@ -25,6 +25,10 @@ CommandCost RunSync(const std::string& api, const std::filesystem::path& scratch
 // varying with the file and with `salt`.
 void WriteSmallFiles(const std::filesystem::path& folder, int count, std::size_t size, int salt);
 
+// Removes a finished part's folders, unless WHOLE_BENCH_KEEP is set (for a
+// look at what a run left behind).
+void RemoveUnlessKept(const std::filesystem::path& path);
+
 // The median of three or fewer figures (the middle one, or the mean of two).
 double Median(std::vector<double> figures);
 

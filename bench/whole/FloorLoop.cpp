@@ -67,7 +67,8 @@ void Start(CURLM* multi, Transfer& transfer, const FloorRequest& request, Saving
 // first. False if any step failed.
 bool Finish(Transfer& transfer, Saving saving, std::set<std::string>& directories)
 {
-    if (transfer.mFile == nullptr) return true;
+    if (transfer.mRequest->mSaveAs.empty()) return true;
+    if (transfer.mFile == nullptr) return false;  // never opened: a floor that wrote nothing would flatter
     bool ok = fflush(transfer.mFile) == 0;
     if (saving == Saving::Durable) ok = ok && fsync(fileno(transfer.mFile)) == 0;
     ok = fclose(transfer.mFile) == 0 && ok;

@@ -61,7 +61,7 @@ std::vector<StepCost> RunRound(const fs::path& root, int files)
     if (downloaded != files)
         throw std::runtime_error("scaling: " + std::to_string(downloaded) + " of " + std::to_string(files) +
                                  " files came down");
-    fs::remove_all(root);
+    RemoveUnlessKept(root);
     return steps;
 }
 

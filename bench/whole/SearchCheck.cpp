@@ -139,7 +139,7 @@ boost::json::object RunSearchCheck(const fs::path& work)
             replaced.push_back(TimeSearches(api, replacedId));
         }
     }
-    fs::remove_all(work);
+    RemoveUnlessKept(work);
     const double freshSeconds = Median(fresh);
     const double replacedSeconds = Median(replaced);
     const double ratio = replacedSeconds / freshSeconds;

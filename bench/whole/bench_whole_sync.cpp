@@ -295,7 +295,7 @@ int main(int argc, char** argv)
         for (int round = 0; round < kRounds; ++round) {
             const fs::path root = work / ("round-" + std::to_string(round));
             const std::vector<RowRun> rows = RunRound(root, round, floors);
-            fs::remove_all(root);
+            RemoveUnlessKept(root);
             for (int row = 0; row < kRowCount; ++row) {
                 byRow[row].push_back(rows[row]);
                 runs.push_back(rows[row].mFigures);
