@@ -1,5 +1,9 @@
 #include "server/AssetRoutes.h"
 
+#include <algorithm>
+#include <memory>
+#include <vector>
+
 #include "server/AssetJson.h"
 #include "server/AssetStore.h"
 #include "server/RequestParsing.h"
@@ -10,6 +14,8 @@ namespace server {
 namespace {
 
 const char kJsonMediaType[] = "application/json";
+// How much of an item's content is read for one write to the connection.
+constexpr std::size_t kSendChunk = 256 * 1024;
 
 std::string Required(const Exchange& exchange, const char* key)
 {
@@ -91,8 +97,8 @@ void Upload(Exchange& exchange)
 
 void Download(Exchange& exchange)
 {
-    AssetRecord item;
-    std::string bytes = exchange.mAssets.Content(exchange.mUser, exchange.mParams.at(0), item);
+    const std::string& id = exchange.mParams.at(0);
+    const AssetRecord item = exchange.mAssets.Item(exchange.mUser, id);
     exchange.Header("ETag", item.mEtag);
     exchange.Header("Last-Modified", HttpDate(item.mModified));
     const std::string wanted = exchange.mRequest.get_header_value("If-None-Match");
@@ -100,8 +106,23 @@ void Download(Exchange& exchange)
         exchange.mResponse.status = 304;
         return;
     }
+    // The bytes go out from their file as the connection takes them, so a
+    // large item costs the service no more memory than a small one.
+    const std::shared_ptr<const ContentFiles::Opened> content = exchange.mAssets.OpenContent(id);
+    const std::uint64_t size = content->Size();
     exchange.mResponse.status = 200;
-    exchange.mResponse.set_content(std::move(bytes), item.mMediaType.c_str());
+    if (size == 0) {
+        exchange.mResponse.set_content(std::string(), item.mMediaType.c_str());
+        return;
+    }
+    const auto buffer = std::make_shared<std::vector<char> >(std::min<std::uint64_t>(size, kSendChunk));
+    exchange.mResponse.set_content_provider(
+        static_cast<std::size_t>(size), item.mMediaType.c_str(),
+        [content, buffer](std::size_t offset, std::size_t length, httplib::DataSink& sink) {
+            const std::size_t got = content->ReadAt(offset, buffer->data(), std::min(length, buffer->size()));
+            // A file that shrank cannot give what was announced: the connection ends.
+            return got > 0 && sink.write(buffer->data(), got);
+        });
 }
 
 }  // namespace

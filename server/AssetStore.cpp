@@ -179,18 +179,30 @@ std::vector<AssetRecord> AssetStore::Members(std::int64_t owner, const std::stri
     return rows::MembersOf(*db, collectionId);
 }
 
+AssetRecord AssetStore::Item(std::int64_t owner, const std::string& itemId)
+{
+    Database::Lease db = mDatabase.Acquire();
+    boost::optional<AssetRecord> found = rows::Find(*db, owner, itemId);
+    if (!found || found->mCollection) throw StoreFailure(404, "no item '" + itemId + "'");
+    return *found;
+}
+
+std::shared_ptr<const ContentFiles::Opened> AssetStore::OpenContent(const std::string& itemId)
+{
+    try {
+        return mContent.Open(itemId);
+    } catch (const std::runtime_error&) {
+        // Deleted between the lookup and the read.
+        throw StoreFailure(404, "no item '" + itemId + "'");
+    }
+}
+
 std::string AssetStore::Content(std::int64_t owner, const std::string& itemId, AssetRecord& record)
 {
-    {
-        Database::Lease db = mDatabase.Acquire();
-        boost::optional<AssetRecord> found = rows::Find(*db, owner, itemId);
-        if (!found || found->mCollection) throw StoreFailure(404, "no item '" + itemId + "'");
-        record = *found;
-    }
+    record = Item(owner, itemId);
     try {
         return mContent.Read(itemId);
     } catch (const std::runtime_error&) {
-        // Deleted between the lookup and the read.
         throw StoreFailure(404, "no item '" + itemId + "'");
     }
 }

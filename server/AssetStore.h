@@ -57,6 +57,10 @@ public:
                                     const std::vector<std::string>& scopes);
     AssetRecord Get(std::int64_t owner, const std::string& id);
     std::vector<AssetRecord> Members(std::int64_t owner, const std::string& collectionId);
+    // An item's record; 404 for a collection or an unknown id.
+    AssetRecord Item(std::int64_t owner, const std::string& itemId);
+    // The item's bytes, opened (404 if they are gone), or read whole.
+    std::shared_ptr<const ContentFiles::Opened> OpenContent(const std::string& itemId);
     std::string Content(std::int64_t owner, const std::string& itemId, AssetRecord& record);
 
     AssetRecord CreateCollection(std::int64_t owner, const std::string& name, const std::string& mediaType);

@@ -121,24 +121,46 @@ void ContentFiles::Incoming::Keep(const std::string& id)
     SyncDirectory(mFiles.mDirectory);
 }
 
-std::string ContentFiles::Read(const std::string& id) const
+ContentFiles::Opened::~Opened()
+{
+    ::close(mFd);
+}
+
+std::size_t ContentFiles::Opened::ReadAt(std::uint64_t offset, char* buffer, std::size_t size) const
+{
+    for (;;) {
+        const ssize_t n = ::pread(mFd, buffer, size, static_cast<off_t>(offset));
+        if (n >= 0) return static_cast<std::size_t>(n);
+        if (errno != EINTR) throw std::runtime_error(std::string("cannot read content: ") + std::strerror(errno));
+    }
+}
+
+std::shared_ptr<const ContentFiles::Opened> ContentFiles::Open(const std::string& id) const
 {
     const std::string path = PathOf(id);
     const int fd = ::open(path.c_str(), O_RDONLY | O_CLOEXEC);
     if (fd < 0) Fail("cannot open", path);
-    std::string bytes;
-    char buffer[65536];
-    for (;;) {
-        const ssize_t n = ::read(fd, buffer, sizeof(buffer));
-        if (n < 0) {
-            if (errno == EINTR) continue;
-            ::close(fd);
-            Fail("cannot read", path);
-        }
-        if (n == 0) break;
-        bytes.append(buffer, static_cast<std::size_t>(n));
+    struct stat info;
+    if (::fstat(fd, &info) != 0) {
+        const int saved = errno;
+        ::close(fd);
+        errno = saved;
+        Fail("cannot read", path);
     }
-    ::close(fd);
+    return std::make_shared<const Opened>(fd, static_cast<std::uint64_t>(info.st_size));
+}
+
+std::string ContentFiles::Read(const std::string& id) const
+{
+    const std::shared_ptr<const Opened> opened = Open(id);
+    std::string bytes(static_cast<std::size_t>(opened->Size()), '\0');
+    std::size_t got = 0;
+    while (got < bytes.size()) {
+        const std::size_t n = opened->ReadAt(got, &bytes[got], bytes.size() - got);
+        if (n == 0) break;
+        got += n;
+    }
+    bytes.resize(got);
     return bytes;
 }
 

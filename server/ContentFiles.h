@@ -8,6 +8,7 @@
 // with the system's message; Remove ignores a missing file.
 
 #include <cstdint>
+#include <memory>
 #include <string>
 #include <vector>
 
@@ -43,6 +44,25 @@ public:
     // Makes the directory; removes temporaries a crash may have left.
     explicit ContentFiles(const std::string& dataDirectory);
 
+    // An item's bytes opened for reading. The descriptor keeps them readable
+    // while they are sent, even if the item is removed meanwhile.
+    class Opened {
+    public:
+        Opened(int fd, std::uint64_t size) : mFd(fd), mSize(size) {}
+        ~Opened();
+        Opened(const Opened&) = delete;
+        Opened& operator=(const Opened&) = delete;
+
+        // Up to `size` bytes from `offset`; 0 at the end (or if the file shrank).
+        std::size_t ReadAt(std::uint64_t offset, char* buffer, std::size_t size) const;
+        std::uint64_t Size() const { return mSize; }
+
+    private:
+        int mFd;
+        std::uint64_t mSize;
+    };
+
+    std::shared_ptr<const Opened> Open(const std::string& id) const;
     std::string Read(const std::string& id) const;
     void Remove(const std::string& id);
     // Every item id that has a file, temporaries left out.

@@ -63,6 +63,13 @@ TEST_F(DurabilityTest, WhatWasAcknowledgedSurvivesARestartAndNothingHalfMadeOrDe
     EXPECT_EQ(304, mAlice->Send("GET", "/assets/" + first, "", {"If-None-Match: " + etag}).mStatus);
     EXPECT_EQ(200, mAlice->Send("GET", "/assets/" + first, "", {"If-None-Match: \"stale\""}).mStatus);
     EXPECT_EQ(404, mBob->Send("GET", "/assets/" + first).mStatus);
+    // Content goes out from its file in pieces: one of several pieces, and none.
+    std::string large(600 * 1024, '\0');
+    for (std::size_t i = 0; i < large.size(); ++i) large[i] = static_cast<char>(i * 7 % 251);
+    EXPECT_EQ(large, mAlice->Send("GET", "/assets/" + Upload(*mAlice, folder, "large", large)).mBody);
+    const Reply empty = mAlice->Send("GET", "/assets/" + Upload(*mAlice, folder, "empty", ""));
+    EXPECT_EQ(200, empty.mStatus);
+    EXPECT_EQ("", empty.mBody);
 }
 
 TEST(AbruptExit, AnAcknowledgedUploadSurvivesIt)
