@@ -14,20 +14,18 @@
 #include "foundation/net/QuoteURL.h"
 #include "tarnvault/DownloadSinkPrivate.h"
 #include "tarnvault/TarnvaultPrivate.h"
+#include "tarnvault/UploadSourcePrivate.h"
 
 namespace tolmonetsync {
 namespace tarnvault {
 
 namespace json = tolmocore::serialization;
-using tolmocore::filesupport::File;
-using tolmocore::utility::UTF16to8;
 using boost::placeholders::_1;
 using boost::placeholders::_2;
+using tolmocore::filesupport::File;
+using tolmocore::utility::UTF16to8;
 
 namespace {
-
-// The 32-bit size argument of the block calls bounds one transfer.
-constexpr std::uint64_t kMaxBlock = std::uint64_t(1) << 32;
 
 using Assets = std::vector<boost::shared_ptr<AssetBase> >;
 
@@ -51,13 +49,27 @@ void _HandleHeaderUpload(const boost::shared_ptr<Collection>& collection, const 
     success(requestUID, item);
 }
 
+// Reports an upload whose file could not be read, or changed before it was
+// all sent; the server has no whole body of it.
+void FailUpload(const File& file, const ErrorCallback& error, const Guid& requestUID, const std::string& text)
+{
+    TOLMO_TRACE("Tarnvault", 1,
+                "Error: Upload: " << file.FullPath() << ", error: " << text << ", requestUID: " << requestUID);
+    error(requestUID, MakeErrorResponse(tolmocore::utility::AsciiToUTF16(text.c_str())));
+}
+
 void _HandleUpload(const boost::weak_ptr<Tarnvault>& self, const boost::shared_ptr<Collection>& collection,
-                   const ItemCallback& success, const ErrorCallback& error, const Guid& requestUID,
+                   const File& file, const boost::shared_ptr<UploadSource>& source, const ItemCallback& success,
+                   const ErrorCallback& error, const Guid& requestUID,
                    const boost::shared_ptr<tolmonet::Response>& response)
 {
     const boost::shared_ptr<Tarnvault> client = self.lock();
     if (!client) return;
     _HandleBody("Upload", requestUID, response);
+    if (source && !source->Failure().empty()) {
+        FailUpload(file, error, requestUID, source->Failure());
+        return;
+    }
     if (response->status != 201) {
         error(requestUID, response);
         return;
@@ -96,20 +108,15 @@ void Tarnvault::_HandleUploadAsyncSearch(const boost::weak_ptr<Tarnvault>& self,
     pairs.push_back(std::make_pair(kCollections, json::GetJSONUTF8String(collections, false)));
     const UTF8String url = client->mServerURL + "/assets" + "?" + tolmonet::QuoteURL(pairs);
 
-    boost::shared_ptr<std::vector<unsigned char> > bytes;
+    // The body streams from the file as it goes out; an empty file sends none.
+    boost::shared_ptr<UploadSource> source;
     std::uint64_t length = 0;
     try {
-        tolmocore::filesupport::IPlatformByteStream stream(file, 0);
-        length = stream.Length();
-        if (length >= kMaxBlock) throw std::runtime_error("File size beyond the limitation!");
-        if (length != 0) {
-            bytes.reset(new std::vector<unsigned char>(length));
-            stream.ReadBlock(bytes->data(), static_cast<unsigned int>(length));
-        }
+        source.reset(new UploadSource(file));
+        length = source->Size();
+        if (length == 0) source.reset();
     } catch (const std::exception& e) {
-        TOLMO_TRACE("Tarnvault", 1,
-                    "Error: Upload: " << file.FullPath() << ", error: " << e.what() << ", requestUID: " << requestUID);
-        error(requestUID, MakeErrorResponse(tolmocore::utility::AsciiToUTF16(e.what())));
+        FailUpload(file, error, requestUID, e.what());
         return;
     }
 
@@ -120,12 +127,14 @@ void Tarnvault::_HandleUploadAsyncSearch(const boost::weak_ptr<Tarnvault>& self,
     headers.insert(std::make_pair(tolmonet::kHEADER_CONTENT_LENGTH, ImmutableString::CreateDynamic(lengthText)));
     headers.insert(std::make_pair(kPersistencePolicy, kEthereal));
     TOLMO_TRACE("Tarnvault", 8,
-                "Upload" << ", path: " << file.FullPath() << ", collection: " << collection
-                         << ", url: " << RedactedForTrace(url) << ", requestUID: " << requestUID);
+                "Upload"
+                    << ", path: " << file.FullPath() << ", collection: " << collection
+                    << ", url: " << RedactedForTrace(url) << ", requestUID: " << requestUID);
+    tolmonet::Configuration configuration;
+    configuration.mBodySource = source;
     const bool taken = client->mProcessor->POST(
-        requestUID, boost::bind(&_HandleUpload, client, collection, success, error, _1, _2),
-        ImmutableString::CreateDynamic(url), RecycledMemory::AdaptAsRecycledMemory(bytes), headers,
-        tolmonet::Configuration());
+        requestUID, boost::bind(&_HandleUpload, client, collection, file, source, success, error, _1, _2),
+        ImmutableString::CreateDynamic(url), tolmonet::http::RequestProcessor::Body(), headers, configuration);
     if (!taken) error(requestUID, boost::shared_ptr<tolmonet::Response>());
 }
 

@@ -43,8 +43,9 @@ class CurlTransfer {
 public:
     // `contentType` is sent when the headers name none; null sends no
     // Content-Type at all rather than libcurl's form default. Of the
-    // configuration, mMaxResponseBody and mBodySink count: an answer whose
-    // body passes the bound is stopped as soon as it does.
+    // configuration, mMaxResponseBody, mBodySink and mBodySource count: an
+    // answer whose body passes the bound is stopped as soon as it does, and
+    // a body source takes the place of `body`.
     CurlTransfer(const Guid& requestUID, const ResponseHandler& handler, HttpMethod method, const ImmutableString& url,
                  const RequestProcessor::Body& body, const HeaderList& headers, const char* contentType,
                  const CurlTransferTimeouts& timeouts, const Configuration& configuration);
@@ -77,8 +78,12 @@ public:
 private:
     static size_t OnHeader(char* data, size_t size, size_t count, void* self);
     static size_t OnBody(char* data, size_t size, size_t count, void* self);
+    static size_t OnRead(char* buffer, size_t size, size_t count, void* self);
+    static int OnSeek(void* self, curl_off_t offset, int origin);
     // False: the transfer is to stop.
     bool TakeBody(const char* data, size_t length);
+    // The next bytes of mBodySource, or CURL_READFUNC_ABORT.
+    size_t GiveBody(unsigned char* buffer, size_t max);
     void AddHeaderLine(const char* data, size_t length);
 
     const Guid mRequestUID;
@@ -90,6 +95,9 @@ private:
     const CurlTransferTimeouts mTimeouts;
     const std::uint64_t mMaxBody;
     const boost::shared_ptr<ResponseBodySink> mBodySink;
+    const boost::shared_ptr<RequestBodySource> mBodySource;
+    std::uint64_t mSourceBytes = 0;  // given since the body last started
+    std::string mSourceFailure;      // why mBodySource stopped the transfer
 
     CURL* mEasy = nullptr;
     char mErrorText[CURL_ERROR_SIZE];

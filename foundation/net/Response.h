@@ -14,8 +14,9 @@
 
 namespace tolmonet {
 namespace http {
-class ResponseBodySink;  // ResponseBodySink.h
-}
+class RequestBodySource;  // RequestBodySource.h
+class ResponseBodySink;   // ResponseBodySink.h
+}  // namespace http
 
 using StatusCode = std::int32_t;
 
@@ -63,8 +64,8 @@ struct Response {
 bool IsResponseTooLarge(const Response& response);
 
 // Per-request options. Callers start from the default; the authorising layer
-// sets mAuthorized. A processor reads mMaxResponseBody and mBodySink; the
-// other fields are carried and not interpreted.
+// sets mAuthorized. A processor reads mMaxResponseBody, mBodySink and
+// mBodySource; the other fields are carried and not interpreted.
 struct Configuration {
     boost::shared_ptr<void> mExtension;
     bool mAuthorized = false;
@@ -85,6 +86,10 @@ struct Configuration {
     // declines comes in the Response, bounded by kDefaultMaxResponseBody at
     // most.
     boost::shared_ptr<http::ResponseBodySink> mBodySink;
+    // Null: a PUT, POST or PATCH sends the verb's Body. Else it sends the
+    // source's bytes as they are read, with the source's Size() as its
+    // Content-Length, and the Body is ignored (the caller gives none).
+    boost::shared_ptr<http::RequestBodySource> mBodySource;
 };
 
 namespace http {

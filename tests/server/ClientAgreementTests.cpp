@@ -4,9 +4,13 @@
 
 #include <chrono>
 #include <filesystem>
+#include <fstream>
+#include <functional>
 #include <memory>
+#include <random>
 
 #include <boost/date_time/posix_time/posix_time.hpp>
+#include <boost/make_shared.hpp>
 #include <boost/pointer_cast.hpp>
 #include <boost/shared_ptr.hpp>
 
@@ -15,6 +19,7 @@
 #include "foundation/core/ImmutableString.h"
 #include "support/CallRecorder.h"
 #include "support/HostClient.h"
+#include "support/RefusingProcessor.h"
 #include "tarnvault/Tarnvault.h"
 
 namespace servertest {
@@ -26,7 +31,8 @@ using tolmonetsync::server::AnswerStyle;
 // What the first callback of one operation received.
 struct Outcome {
     bool mSuccess = false;
-    int mStatus = 0;  // the error's
+    int mStatus = 0;    // the error's
+    std::string mText;  // the error's body
     boost::shared_ptr<AssetBase> mAsset;
     DownloadResult mDownload;
 };
@@ -57,6 +63,7 @@ ErrorCallback Failed(const Call& call)
     return [call](const Guid&, const boost::shared_ptr<tolmonet::Response>& response) {
         Outcome outcome;
         outcome.mStatus = response ? response->status : 0;
+        outcome.mText = response ? response->BodyText().ToStdString() : std::string();
         call.Add(outcome);
     };
 }
@@ -232,6 +239,82 @@ TEST_P(UploadLimitTest, AnUploadOverTheLimitReachesTheLibraryAsThe413)
 }
 
 INSTANTIATE_TEST_SUITE_P(OneStyle, UploadLimitTest, ::testing::Values(AnswerStyle()));
+
+class StreamedUploadTest : public ClientAgreementTest {
+protected:
+    Outcome UploadFile(const boost::shared_ptr<Collection>& into, const File& file)
+    {
+        Call upload;
+        mClient->UploadAsync(Done(upload), Failed(upload), into, file,
+                             ImmutableString::CreateStatic("application/octet-stream"), u"up.bin",
+                             Guid::CreateUnique());
+        return First(upload);
+    }
+    std::string Downloaded(const boost::shared_ptr<AssetBase>& asset)
+    {
+        Call download;
+        mClient->DownloadAsync(Done(download), Failed(download), boost::dynamic_pointer_cast<Item>(asset),
+                               FileNamed("copy"), UTF8String(), Guid::CreateUnique());
+        EXPECT_TRUE(First(download).mDownload.mDownloaded);
+        return testsupport::ReadFileBytes(mFiles.Path() / "copy");
+    }
+};
+
+// Uploads stream from their file. The service keeps the file byte for byte,
+// also when libcurl has to send it again, and nothing of a file that changed
+// after the upload took its length.
+TEST_P(StreamedUploadTest, TheServiceKeepsTheFileAsItWasOrNothing)
+{
+    const auto root = Root();
+    ASSERT_TRUE(root);
+    std::string large((3 << 20) + 5, '\0');  // far past libcurl's buffer
+    std::mt19937 random(11);
+    for (char& byte : large) byte = static_cast<char>(random());
+    // The third upload's kept-alive connection is dropped before any answer:
+    // libcurl sends it again on a new one, from the file's first byte.
+    server::FaultRule drop;
+    drop.mMethod = "POST";
+    drop.mPathPattern = "/api/assets";
+    drop.mNth = 3;
+    drop.mAction = server::FaultAction_CloseBeforeAnswer;
+    const auto dropped = mService->Faults().Install(drop);
+    for (const std::string& bytes : {std::string(), large, std::string("sent twice")}) {
+        const Outcome uploaded = UploadFile(root, Source(bytes));
+        ASSERT_TRUE(uploaded.mSuccess) << bytes.size() << " bytes: " << uploaded.mText;
+        EXPECT_TRUE(Downloaded(uploaded.mAsset) == bytes) << bytes.size() << " bytes";
+    }
+    EXPECT_EQ(dropped->Seen(), 4);
+
+    // The file changes as its post is handed to the processor: it grows, or
+    // is rewritten with its length kept.
+    const std::filesystem::path path = mFiles.Path() / "source";
+    const std::function<void()> changes[] = {
+        [&] { std::ofstream(path, std::ios::app) << 'x'; },
+        [&] {
+            std::filesystem::last_write_time(path, std::filesystem::last_write_time(path) + std::chrono::seconds(5));
+        },
+    };
+    const auto real = tolmonet::http::GetGlobalRequestProcessor();
+    for (const auto& change : changes) {
+        const File file = Source(large);
+        tolmonet::http::SetGlobalRequestProcessor(boost::make_shared<testsupport::RefusingProcessor>(
+            real, [&](const std::string& method, const std::string& url) {
+                if (method == "POST" && url.find("/assets?") != std::string::npos) change();
+                return false;
+            }));
+        mClient.reset(
+            new tarnvault::Tarnvault(testsupport::Parameters(mService->AssetServiceUrl(), kAliceToken, "desk app")));
+        tolmonet::http::SetGlobalRequestProcessor(real);
+        const Outcome changed = UploadFile(root, file);
+        EXPECT_FALSE(changed.mSuccess);
+        EXPECT_EQ(changed.mStatus, -100);
+        EXPECT_EQ(changed.mText, "Upload: the file changed while it was being sent");
+        // The namesake went first, and nothing came in its place.
+        EXPECT_TRUE(Ids(mAlice->Send("GET", "/collections/" + root->mId.ToStdString() + "/members")).empty());
+    }
+}
+
+INSTANTIATE_TEST_SUITE_P(OneStyle, StreamedUploadTest, ::testing::Values(AnswerStyle()));
 
 }  // namespace
 }  // namespace servertest

@@ -1,8 +1,11 @@
 // Upload (search, deletes, post, metadata) and conditional, streamed download.
 
+#include <fstream>
+#include <functional>
 #include <set>
 
 #include "ClientTestSupport.h"
+#include "tarnvault/UploadSourcePrivate.h"
 
 using namespace tvtest;
 using testsupport::ReadFileBytes;
@@ -92,6 +95,8 @@ TEST_F(TransferTest, UploadDeletesEveryNamesakeLastFirstThenPostsAndReadsBack)
 TEST_F(TransferTest, UploadFailures)
 {
     WriteFileBytes(mDir / "a.txt", "abc");
+    std::ofstream(mDir / "huge.bin").close();
+    std::filesystem::resize_file(mDir / "huge.bin", std::uint64_t(1) << 32);  // sparse
     const std::string noNamesake = "[]";
     const HttpHeaders created{{"Location", "/api/assets/n"}};
     const struct {
@@ -102,6 +107,7 @@ TEST_F(TransferTest, UploadFailures)
         const char* mText;  // null: any text but an empty one
     } cases[] = {
         {"no such file", "none.txt", {Answer(200, noNamesake)}, -100, nullptr},
+        {"a file of 4 GiB", "huge.bin", {Answer(200, noNamesake)}, -100, "File size beyond the limitation!"},
         {"a failed delete",
          "a.txt",
          {Answer(200, "[" + ItemJSON("old", "a.txt") + "]"), Answer(403, "locked")},
@@ -122,6 +128,36 @@ TEST_F(TransferTest, UploadFailures)
         ExpectFailure(Upload(failure.mFile, collection), failure.mStatus, failure.mText);
         EXPECT_EQ(mService.Requests().size() - before, failure.mReplies.size());
         EXPECT_TRUE(collection->mChildren.empty());
+    }
+}
+
+// An upload's body is its file as it was when the upload took its length. A
+// change before the file is opened to send stops the first read, so no byte
+// leaves; a later one stops the read of the last bytes.
+TEST_F(TransferTest, UploadSourceStopsWhenTheFileChanges)
+{
+    const std::filesystem::path path = mDir / "a.bin";
+    const std::function<void()> changes[] = {
+        [&] { std::ofstream(path, std::ios::app) << 'x'; },  // grows
+        [&] { std::filesystem::resize_file(path, 40); },     // ends early
+        [&] {                                                // rewritten in place
+            std::filesystem::last_write_time(path, std::filesystem::last_write_time(path) + std::chrono::seconds(5));
+        },
+    };
+    unsigned char buffer[64];
+    for (const auto& change : changes) {
+        for (const size_t readFirst : {0, 50}) {
+            SCOPED_TRACE(readFirst);
+            WriteFileBytes(path, std::string(100, 'a'));
+            UploadSource source(At("a.bin"));
+            EXPECT_EQ(source.Size(), 100u);
+            if (readFirst > 0) {
+                EXPECT_EQ(source.Read(buffer, readFirst), readFirst);
+            }
+            change();
+            EXPECT_THROW(source.Read(buffer, sizeof buffer), std::runtime_error);
+            EXPECT_EQ(source.Failure(), kUploadChangedText);
+        }
     }
 }
 

@@ -1,8 +1,11 @@
 // Every verb over loopback: what the server sees, what the handler gets, and
 // how a request that gets no HTTP answer ends.
 
+#include <algorithm>
+#include <cstring>
 #include <functional>
 #include <random>
+#include <stdexcept>
 
 #include <boost/make_shared.hpp>
 
@@ -10,6 +13,7 @@
 
 #include "foundation/net/CurlRequestProcessor.h"
 #include "foundation/net/HeaderConstants.h"
+#include "foundation/net/RequestBodySource.h"
 #include "foundation/net/ResponseBodySink.h"
 #include "support/LoopbackHttpServer.h"
 #include "support/ResponseRecorder.h"
@@ -67,6 +71,39 @@ public:
 RequestProcessor::Body Bytes(const std::string& text)
 {
     return RecycledMemory::CopyOf(text.data(), text.size());
+}
+
+// Gives a body from memory a piece at a time, as a file would; throws
+// before its last piece when told to fail.
+class StringSource : public RequestBodySource {
+public:
+    StringSource(const std::string& bytes, bool fail) : mBytes(bytes), mFail(fail) {}
+    std::uint64_t Size() const override { return mBytes.size(); }
+    std::size_t Read(unsigned char* buffer, std::size_t max) override
+    {
+        const size_t count = std::min(max, mBytes.size() - mOffset);
+        if (mFail && mOffset + count == mBytes.size()) throw std::runtime_error("the source failed");
+        std::memcpy(buffer, mBytes.data() + mOffset, count);
+        mOffset += count;
+        return count;
+    }
+    bool Rewind() override
+    {
+        mOffset = 0;
+        return true;
+    }
+
+private:
+    const std::string mBytes;
+    const bool mFail;
+    size_t mOffset = 0;
+};
+
+Configuration Streaming(const std::string& bytes, bool fail = false)
+{
+    Configuration configuration;
+    configuration.mBodySource = boost::make_shared<StringSource>(bytes, fail);
+    return configuration;
 }
 
 using Send = std::function<bool(const Guid&, ResponseHandler, const ImmutableString&)>;
@@ -148,6 +185,12 @@ TEST_F(CurlRequestsTest, EachVerbSendsItsMethodBodyAndContentTypeAndGetsStatusAn
         {"DELETE", [&](auto id, auto h, auto& url) { return processor.DEL(id, h, url, {}, c); }, "", "", "none"},
         {"PUT", [&](auto id, auto h, auto& url) { return processor.PUT(id, h, url, Bytes(large), {}, c); }, large, "",
          std::to_string(large.size())},
+        // From a body source: far more than libcurl's buffer, and a small one.
+        {"POST", [&](auto id, auto h, auto& url) { return processor.POST(id, h, url, nullptr, {}, Streaming(large)); },
+         large, "", std::to_string(large.size())},
+        {"PATCH",
+         [&](auto id, auto h, auto& url) { return processor.PATCH(id, h, url, nullptr, json, Streaming("[3]")); },
+         "[3]", "application/json", "3"},
     };
     const int port = testsupport::ClosedLoopbackPort();
     for (const Row& row : rows) {
@@ -223,6 +266,18 @@ TEST_F(CurlRequestsTest, AnswerIsBoundedOrStreamedAsTheRequestAsks)
     const boost::shared_ptr<Response> refused = send("/ok", kDefaultMaxResponseBody, refusing);
     EXPECT_EQ(refused->status, kStatusNoResponse);
     EXPECT_EQ(refused->BodyText().ToStdString(), kBodySinkRefusedText);
+}
+
+TEST_F(CurlRequestsTest, ABodySourceThatFailsStopsTheRequestWithItsText)
+{
+    const boost::shared_ptr<Response> got = Answer(
+        *mProcessor,
+        [&](const Guid& id, ResponseHandler handler, const ImmutableString& url) {
+            return mProcessor->PUT(id, handler, url, nullptr, HeaderList(), Streaming(std::string(1 << 20, 's'), true));
+        },
+        mServer.Url("/put"));
+    EXPECT_EQ(got->status, kStatusNoResponse);
+    EXPECT_EQ(got->BodyText().ToStdString(), "the source failed");
 }
 
 TEST_F(CurlRequestsTest, TraceLinesShowNeitherTheAuthorizationNorTheQuery)
