@@ -113,8 +113,19 @@ void SyncCache::LoadCache()
     }
 }
 
+void SyncCache::NoteSwap(const File& file)
+{
+    mSwappedDirs.insert(file.Parent().FullPath());
+}
+
 void SyncCache::SaveCache()
 {
+    // The cache file vouches for each swapped file: its rename must be on the
+    // disk first. One sync per directory covers every swap of the pass.
+    while (!mSwappedDirs.empty()) {
+        Dir(*mSwappedDirs.begin()).Sync();
+        mSwappedDirs.erase(mSwappedDirs.begin());
+    }
     for (CachedSyncFile& record : mFiles) {
         record.mCachedLocalModDate = record.mLocalModDate;
         record.mCachedLocalChecksum = record.mLocalChecksum;

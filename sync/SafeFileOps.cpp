@@ -91,13 +91,13 @@ void CachedSyncFile::SafeRenameSwap(const Dir& backupDir)
 {
     // The copy goes aside first; then the rename replaces the target in one
     // step, so there is never a moment without a file under the target name.
-    // The download takes the old file's permissions before it is renamed, and
-    // the directory is synced before the cache file may record the swap.
+    // The download takes the old file's permissions before it is renamed.
+    // The directory sync is left to the cache file's save, which does it once
+    // for all the swaps of a pass before it records any of them.
     if (mFile.Exists()) CopyIntoBackup(mFile, backupDir);
     File downloaded = GetSafeRenameFile();
     downloaded.PrepareToReplace(mFile);
     downloaded.Rename(mFile.GetName());
-    mFile.Parent().Sync();
 }
 
 Guid CachedSyncFile::ComputeChecksum() const

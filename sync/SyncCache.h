@@ -79,9 +79,13 @@ public:
     // kept values into mFiles. Never throws: a bad file is traced and ignored.
     void LoadCache();
     // Writes every record's kept values to the cache file (0600, replacing a
-    // link planted at its name rather than writing through it). Throws on
-    // failure.
+    // link planted at its name rather than writing through it), after syncing
+    // every directory a noted swap renamed into. Throws on failure, the cache
+    // file then as it was.
     void SaveCache();
+    // Notes a swap into `file`'s directory, for SaveCache to sync. Completion
+    // thread.
+    void NoteSwap(const File& file);
 
     // Makes this run's backup directory under the preference directory (the
     // preference directory, "SyncBackup" and the new one 0700 when made here)
@@ -130,6 +134,8 @@ private:
 
     void AddServerItems();
     File FileForItem(const SyncDir& dir, const boost::shared_ptr<Item>& item) const;
+
+    std::set<UTF16String, UTF16Less> mSwappedDirs;  // not yet synced; completion thread
 
     mutable std::mutex mBatchMutex;  // guards mBatch only, for the copy of the pointer
     boost::weak_ptr<utility::DeferredList> mBatch;

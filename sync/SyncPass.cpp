@@ -94,6 +94,7 @@ void BatchSync::_HandleQueueDownload(const boost::shared_ptr<BatchSync>& self, s
     if (result.mDownloaded) {
         try {
             record.SafeRenameSwap(cache->mBackupDir);
+            cache->NoteSwap(record.mFile);
             record.mCachedServerEtag = result.mEtag;
             record.FreshenModDate();
         } catch (const std::exception& e) {

@@ -89,7 +89,9 @@ public:
     // The file beside mFile that a download writes: its name plus ".temp".
     File GetSafeRenameFile() const;
     // Puts the downloaded ".temp" file in place of mFile, copying mFile into
-    // backupDir first. Throws on failure, leaving the ".temp" file.
+    // backupDir first. Throws on failure, leaving the ".temp" file. The
+    // rename is durable only once mFile's directory is synced
+    // (SyncCache::NoteSwap).
     void SafeRenameSwap(const Dir& backupDir);
     // The content checksum; nil if the file is missing or unreadable.
     Guid ComputeChecksum() const;

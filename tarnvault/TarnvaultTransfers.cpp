@@ -13,6 +13,7 @@
 #include "foundation/net/HeaderConstants.h"
 #include "foundation/net/QuoteURL.h"
 #include "tarnvault/DownloadSinkPrivate.h"
+#include "tarnvault/DownloadSinkWorkers.h"
 #include "tarnvault/TarnvaultPrivate.h"
 #include "tarnvault/UploadSourcePrivate.h"
 
@@ -167,8 +168,34 @@ void FailDownload(const File& file, const ErrorCallback& error, const Guid& requ
     }
 }
 
-void _HandleDownload(const File& file, const boost::shared_ptr<DownloadSink>& sink, std::uint64_t limit,
-                     const DownloadCallback& success, const ErrorCallback& error, const Guid& requestUID,
+// What a finished download hands from its worker back to the completion
+// thread. The callbacks are taken out there, so that whatever they keep alive
+// is let go on that thread, never on the worker.
+struct FinishedDownload {
+    File mFile;
+    boost::shared_ptr<DownloadSink> mSink;
+    DownloadResult mResult;
+    DownloadCallback mSuccess;
+    ErrorCallback mError;
+    Guid mRequestUID;
+    std::string mFailure;
+};
+
+void _ReportFinishedDownload(const boost::shared_ptr<FinishedDownload>& finished)
+{
+    DownloadCallback success;
+    ErrorCallback error;
+    success.swap(finished->mSuccess);
+    error.swap(finished->mError);
+    if (!finished->mFailure.empty())
+        FailDownload(finished->mFile, error, finished->mRequestUID, finished->mFailure.c_str());
+    else
+        success(finished->mRequestUID, finished->mResult);
+}
+
+void _HandleDownload(const boost::shared_ptr<tolmonet::http::RequestProcessor>& processor, const File& file,
+                     const boost::shared_ptr<DownloadSink>& sink, std::uint64_t limit, const DownloadCallback& success,
+                     const ErrorCallback& error, const Guid& requestUID,
                      const boost::shared_ptr<tolmonet::Response>& response)
 {
     const UTF8String body = _HandleBody("Download", requestUID, response);
@@ -196,22 +223,33 @@ void _HandleDownload(const File& file, const boost::shared_ptr<DownloadSink>& si
         // not stream, came whole in the response.
         if (sink->Size() + body.size() >= limit) throw std::runtime_error(kDownloadTooLarge);
         sink->Append(body);
-        result.mContentType = LastHeader(response, tolmonet::kHEADER_CONTENT_TYPE);
-        result.mEtag = LastHeader(response, tolmonet::kHEADER_ETAG);
-        result.mLastModified = tolmocore::utility::UTF8to16(LastHeader(response, kLastModified));
-        result.mContentSize = sink->Size();
-        result.mDownloaded = true;
-        TOLMO_TRACE("Tarnvault", 8,
-                    "Download" << ", content-type: " << result.mContentType << ", content-size: "
-                               << result.mContentSize << ", etag: " << result.mEtag
-                               << ", last_modified: " << result.mLastModified << ", requestUID: " << requestUID);
-        sink->Close();
     } catch (const std::exception& e) {
         sink->Discard();
         FailDownload(file, error, requestUID, e.what());
         return;
     }
-    success(requestUID, result);
+    result.mContentType = LastHeader(response, tolmonet::kHEADER_CONTENT_TYPE);
+    result.mEtag = LastHeader(response, tolmonet::kHEADER_ETAG);
+    result.mLastModified = tolmocore::utility::UTF8to16(LastHeader(response, kLastModified));
+    result.mContentSize = sink->Size();
+    result.mDownloaded = true;
+    TOLMO_TRACE("Tarnvault", 8,
+                "Download" << ", content-type: " << result.mContentType << ", content-size: "
+                           << result.mContentSize << ", etag: " << result.mEtag
+                           << ", last_modified: " << result.mLastModified << ", requestUID: " << requestUID);
+    // The file's sync waits on the disk: on a worker it overlaps other
+    // downloads' syncs, and the host still hears on the completion thread.
+    const boost::shared_ptr<FinishedDownload> finished(
+        new FinishedDownload{file, sink, result, success, error, requestUID, std::string()});
+    RunOnDownloadWorker([processor, finished] {
+        try {
+            finished->mSink->Finish();
+        } catch (const std::exception& e) {
+            finished->mFailure = *e.what() ? e.what() : "Download: the file could not be written";
+        }
+        finished->mSink.reset();
+        processor->CallAsynchronously(boost::bind(&_ReportFinishedDownload, finished), 0);
+    });
 }
 
 }  // namespace
@@ -222,18 +260,20 @@ Guid Tarnvault::DownloadAsync(const DownloadCallback& success, const ErrorCallba
 {
     const UTF8String url = mServerURL + "/assets/" + item->mId;
     tolmonet::HeaderList headers;
-    if (!etag.empty()) headers.insert(std::make_pair(tolmonet::kHEADER_IF_NONE_MATCH, ImmutableString::CreateDynamic(etag)));
+    if (!etag.empty())
+        headers.insert(std::make_pair(tolmonet::kHEADER_IF_NONE_MATCH, ImmutableString::CreateDynamic(etag)));
     TOLMO_TRACE("Tarnvault", 8,
-                "Download" << ", path: " << file.FullPath() << ", asset: " << item << ", url: " << RedactedForTrace(url)
-                           << ", etag: " << etag << ", requestUID: " << requestUID);
+                "Download"
+                    << ", path: " << file.FullPath() << ", asset: " << item << ", url: " << RedactedForTrace(url)
+                    << ", etag: " << etag << ", requestUID: " << requestUID);
     const std::uint64_t limit = DownloadSizeLimit();
     const boost::shared_ptr<DownloadSink> sink(new DownloadSink(file));
     tolmonet::Configuration configuration;
     configuration.mMaxResponseBody = limit - 1;
     configuration.mBodySink = sink;
-    const bool taken =
-        mProcessor->GET(requestUID, boost::bind(&_HandleDownload, file, sink, limit, success, error, _1, _2),
-                        ImmutableString::CreateDynamic(url), headers, configuration);
+    const bool taken = mProcessor->GET(
+        requestUID, boost::bind(&_HandleDownload, mProcessor, file, sink, limit, success, error, _1, _2),
+        ImmutableString::CreateDynamic(url), headers, configuration);
     return Sent(taken, requestUID);
 }
 

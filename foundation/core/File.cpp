@@ -107,7 +107,6 @@ void File::PrepareToReplace(const File& target) const
         // Downloads arrive private; a new file gets what any new file gets.
         result = ops->Fchmod(fd, 0666 & ~CurrentUmask());
     }
-    if (result == 0 && ops->Fsync(fd) != 0 && errno != EINVAL) result = -1;
     const int error = errno;
     ops->Close(fd);
     if (result != 0)

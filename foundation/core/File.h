@@ -53,8 +53,11 @@ public:
     void Rename(const UTF16String& newName);
     // Readies this file to be renamed over `target`: gives it the target's
     // permission bits and, where the process may, its owner and group (with
-    // no target, the umask's default for a new file), then syncs it. Done before the rename, the file under
-    // the target's name is never more open than it was. Goes through FileOps;
+    // no target, the umask's default for a new file). Done before the rename,
+    // the file under the target's name is never more open than it was. Not
+    // synced: the change is durable once the rename's directory is synced,
+    // and until then a crash leaves the file as private as it came (the
+    // caller synced its bytes). Goes through FileOps;
     // a symbolic link in this file's place is refused. Throws on failure, a
     // refused change of owner (EPERM) aside.
     void PrepareToReplace(const File& target) const;

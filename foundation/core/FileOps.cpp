@@ -55,6 +55,11 @@ int FileOps::Rename(const std::string& from, const std::string& to)
     return ::rename(from.c_str(), to.c_str());
 }
 
+int FileOps::Unlink(const std::string& path)
+{
+    return ::unlink(path.c_str());
+}
+
 int FileOps::SyncDirectory(const std::string& path)
 {
     // The system calls directly: a wrapper sees one operation, not three.

@@ -1,7 +1,8 @@
 #pragma once
 // The seam through which the engine's writes reach the disk: the output
-// stream's atomic write, the download swap and its backup copy, the cache
-// file, directory syncs and the permission changes that go with them.
+// stream's atomic write, a download's ".temp" file, the download swap and
+// its backup copy, the cache file, directory syncs and the permission
+// changes that go with them.
 //
 // Each operation is the system call of the same name and reports the same
 // way: -1 (or a negative count) with errno set on failure, so that callers
@@ -38,6 +39,8 @@ public:
     // rename(2): replaces `to` in one step (a link at `to` is replaced, never
     // followed).
     virtual int Rename(const std::string& from, const std::string& to);
+    // unlink(2): removes the name (a link itself, never what it points to).
+    virtual int Unlink(const std::string& path);
     // Opens the directory, fsyncs it and closes it: entries renamed or made
     // in it are durable afterwards. Some file systems cannot sync a directory
     // and say EINVAL; callers decide what that means.

@@ -24,8 +24,8 @@ struct DiskFault {
     const char* mName;
     const char* mOperation;
     // The first operation of that kind in the pass whose path ends so. The
-    // downloads stream into hidden siblings of random names first, so an
-    // empty end meets the first download's write.
+    // downloads write their ".temp" files on worker threads in no set order,
+    // so an empty end meets whichever download's operation comes first.
     const char* mPathEnd;
     int mError;
 };
@@ -33,9 +33,10 @@ struct DiskFault {
 const DiskFault kDiskFaults[] = {
     {"no space while writing a download", "write", "", ENOSPC},
     {"a download's fsync fails", "fsync", "", EIO},
-    {"the fsync before the swap fails", "fsync", "Presets/A.txt.temp", EIO},
+    {"A's fsync fails", "fsync", "Presets/A.txt.temp", EIO},
+    {"the mode change before the swap fails", "chmod", "Presets/A.txt.temp", EIO},
     {"the swap's rename fails", "rename", "Presets/A.txt", EIO},
-    {"syncing the folder fails", "dirsync", "Presets", EIO},
+    {"syncing the folder after the swaps fails", "dirsync", "Presets", EIO},
     {"read-only file system", "open", "", EROFS},
     {"directory not writable", "open", "", EACCES},
     {"the cache file cannot be saved", "rename", "/tolmonetsynccache.json", EIO},

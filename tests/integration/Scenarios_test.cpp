@@ -143,6 +143,8 @@ TEST_F(Scenarios, TheCacheFileIsSavedOnlyAfterEverySwapIsDurable)
     for (const fs::path& swapped : {Folder() / "A.txt", SettingsPath()}) {
         const int renamed = disk.IndexOf("rename " + swapped.string() + ".temp -> " + swapped.string());
         ASSERT_GE(renamed, 0) << swapped;
+        const int written = disk.IndexOf("fsync " + swapped.string() + ".temp");
+        EXPECT_TRUE(written >= 0 && written < renamed) << swapped << " was renamed before its bytes were synced";
         const int synced = disk.IndexOf("dirsync " + swapped.parent_path().string(), renamed);
         EXPECT_GT(synced, renamed) << swapped;
         EXPECT_LT(synced, cacheSaved) << swapped;

@@ -54,6 +54,7 @@ public:
     {
         return Fails("rename", from, " -> " + to, to) ? -1 : FileOps::Rename(from, to);
     }
+    int Unlink(const std::string& path) override { return Fails("unlink", path) ? -1 : FileOps::Unlink(path); }
     int SyncDirectory(const std::string& path) override
     {
         return Fails("dirsync", path) ? -1 : FileOps::SyncDirectory(path);

@@ -4,7 +4,7 @@
 // a chosen errno instead of doing them. Everything else reaches the disk.
 //
 // Lines: "open PATH", "write PATH", "fsync PATH", "close PATH",
-// "rename FROM -> TO", "dirsync PATH", "chmod PATH 0600", "chown PATH";
+// "rename FROM -> TO", "unlink PATH", "dirsync PATH", "chmod PATH 0600", "chown PATH";
 // descriptors are named by the path they were opened with.
 
 #include <cerrno>
@@ -25,7 +25,7 @@ public:
     FileOpsRecorder& operator=(const FileOpsRecorder&) = delete;
 
     // Fails the next operation of `kind` ("open", "write", "fsync", "close",
-    // "rename", "dirsync", "chmod", "chown") whose path ends with `pathEnd`
+    // "rename", "unlink", "dirsync", "chmod", "chown") whose path ends with `pathEnd`
     // (for a rename, either path), with `error`; with `after`, only once a
     // line that is `after` has been recorded. Failed operations are recorded
     // too, with " FAILED" after them.

@@ -195,6 +195,15 @@ TEST_F(TransferTest, DownloadIsConditionalOnTheTagAndReportsTheHeaders)
     EXPECT_TRUE(empty.Last().mDownload.mDownloaded);
     EXPECT_TRUE(empty.Last().mDownload.mEtag.empty());
     EXPECT_EQ(ReadFileBytes(mDir / "f.txt"), "");
+
+    // A link planted at the name is replaced, never written through.
+    WriteFileBytes(mDir / "victim", "theirs");
+    std::filesystem::create_symlink(mDir / "victim", mDir / "link.txt.temp");
+    mService.Push(Answer(200, "ours"));
+    ASSERT_TRUE(Download("link.txt.temp").Succeeded());
+    EXPECT_EQ(ReadFileBytes(mDir / "victim"), "theirs");
+    EXPECT_FALSE(std::filesystem::is_symlink(mDir / "link.txt.temp"));
+    EXPECT_EQ(ReadFileBytes(mDir / "link.txt.temp"), "ours");
 }
 
 // Each failure reaches the error callback and leaves the target as it was.
