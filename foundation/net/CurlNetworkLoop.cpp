@@ -1,5 +1,6 @@
 #include "foundation/net/CurlNetworkLoop.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <stdexcept>
@@ -54,6 +55,8 @@ CurlNetworkLoop::CurlNetworkLoop(const CurlTransferEnvironment& environment, lon
     : mEnvironment(environment),
       mCompletions(completions),
       mMulti(MakeMulti(maxConnections, maxConnectionsPerHost)),
+      // Twice the connections: a handle is ready whenever one frees up.
+      mMaxRunning(static_cast<size_t>(std::max(2 * maxConnections, 8L))),
       mWakeFd(MakeWakeFd())
 {
     mThread = std::thread([this] { Run(); });
@@ -141,14 +144,26 @@ void CurlNetworkLoop::Run()
         }
         for (auto& transfer : cancelled) Deliver(std::move(transfer), CurlTransfer::MakeCancelledResponse());
         cancelled.clear();
-        for (auto& transfer : incoming) Begin(std::move(transfer));
+        for (auto& transfer : incoming) mWaiting.push_back(std::move(transfer));
         incoming.clear();
         if (cancelPending) EndCancelled();
+        Admit();
 
         int running = 0;
         curl_multi_perform(mMulti, &running);
         CollectFinished();
+        // Finished transfers made room: start the next ones without sleeping.
+        if (!mWaiting.empty() && HasRoom()) continue;
         Poll();
+    }
+}
+
+void CurlNetworkLoop::Admit()
+{
+    while (!mWaiting.empty() && HasRoom()) {
+        std::unique_ptr<CurlTransfer> transfer(std::move(mWaiting.front()));
+        mWaiting.pop_front();
+        Begin(std::move(transfer));
     }
 }
 
@@ -179,11 +194,17 @@ void CurlNetworkLoop::Begin(std::unique_ptr<CurlTransfer> transfer)
 void CurlNetworkLoop::EndCancelled()
 {
     std::vector<CurlTransfer*> cancelled;
+    std::deque<std::unique_ptr<CurlTransfer> > unsent;
     {
         std::lock_guard<std::mutex> lock(mMutex);
         for (const auto& running : mRunning)
             if (running.first->mCancelled) cancelled.push_back(running.first);
+        // One sweep keeps the order of the rest: a cancel-all stays linear.
+        std::deque<std::unique_ptr<CurlTransfer> > kept;
+        for (auto& transfer : mWaiting) (transfer->mCancelled ? unsent : kept).push_back(std::move(transfer));
+        mWaiting.swap(kept);
     }
+    for (auto& transfer : unsent) Deliver(std::move(transfer), CurlTransfer::MakeCancelledResponse());
     for (CurlTransfer* transfer : cancelled) Finish(transfer, CURLE_OK, true);
 }
 
@@ -293,6 +314,7 @@ void CurlNetworkLoop::Stop()
     // Handlers go here, uncalled; whatever their destructors start is kept
     // in mIncoming and never sent.
     mRunning.clear();
+    mWaiting.clear();
     incoming.clear();
 }
 
