@@ -20,6 +20,10 @@ namespace {
 constexpr int kIdlePollMilliseconds = 1000;
 // Handles kept for reuse: enough for the connections in use, no more.
 constexpr size_t kMaxSpareHandles = 32;
+// Answers waiting for their handlers, beyond which no new transfer starts:
+// when handlers are slower than the network (a download's file is made
+// durable there), what they would hold (open files, bodies) stays bounded.
+constexpr size_t kMaxCompletionBacklog = 64;
 
 CURLM* MakeMulti(long maxConnections, long maxConnectionsPerHost)
 {
@@ -59,6 +63,7 @@ CurlNetworkLoop::CurlNetworkLoop(const CurlTransferEnvironment& environment, lon
       mMaxRunning(static_cast<size_t>(std::max(2 * maxConnections, 8L))),
       mWakeFd(MakeWakeFd())
 {
+    mCompletions->SetBacklogWaker(kMaxCompletionBacklog, [this] { Wake(); });
     mThread = std::thread([this] { Run(); });
 }
 
@@ -153,13 +158,14 @@ void CurlNetworkLoop::Run()
         curl_multi_perform(mMulti, &running);
         CollectFinished();
         // Finished transfers made room: start the next ones without sleeping.
-        if (!mWaiting.empty() && HasRoom()) continue;
+        if (!mWaiting.empty() && HasRoom() && !mCompletions->IsBacklogged()) continue;
         Poll();
     }
 }
 
 void CurlNetworkLoop::Admit()
 {
+    if (mWaiting.empty() || !HasRoom() || mCompletions->IsBacklogged()) return;
     while (!mWaiting.empty() && HasRoom()) {
         std::unique_ptr<CurlTransfer> transfer(std::move(mWaiting.front()));
         mWaiting.pop_front();
@@ -294,6 +300,7 @@ void CurlNetworkLoop::Stop()
         if (mStopping && !mThread.joinable()) return;
         mStopping = true;
     }
+    mCompletions->SetBacklogWaker(0, boost::function<void()>());  // the wake descriptor closes below
     Wake();
     if (mThread.joinable()) mThread.join();
 
