@@ -78,13 +78,25 @@ std::vector<CachedSyncFile> ReadCacheFile(const File& cacheFile)
     // One more byte, zero, so that the text ends in a NUL.
     UTF8String text(static_cast<std::size_t>(length) + 1, 0);
     in.ReadBlock(&text[0], static_cast<unsigned int>(length));
-    json::JSONConvertStdVector<CachedSyncFile>::FromJSON(json::JSONParse(text), parsed);
+    boost::any tree = json::JSONParse(text);
+    text = UTF8String();
+    // Each entry's subtree goes as soon as it is converted: the tree is many
+    // times the size of the records, and the two never need to be whole at once.
+    json::JSONArray& entries = boost::any_cast<json::JSONArray&>(tree);
+    parsed.reserve(entries.size());
+    for (boost::shared_ptr<boost::any>& entry : entries) {
+        parsed.push_back(json::JSONConvert<CachedSyncFile>::FromJSON(entry ? *entry : boost::any()));
+        entry.reset();
+    }
     return parsed;
 }
 
 }  // namespace
 
-File SyncCache::GetCache() { return File(Dir::PrefDir(), u"tolmonetsynccache.json"); }
+File SyncCache::GetCache()
+{
+    return File(Dir::PrefDir(), u"tolmonetsynccache.json");
+}
 
 void SyncCache::LoadCache()
 {
