@@ -4,6 +4,7 @@
 
 #include "assets/AssetJSON.h"
 #include "foundation/net/QuoteURL.h"
+#include "tarnvault/AssetListReader.h"
 #include "tarnvault/TarnvaultPrivate.h"
 
 namespace tolmonetsync {
@@ -29,7 +30,7 @@ void _HandleSearch(const AssetsCallback& success, const ErrorCallback& error, co
             return;
         }
         try {
-            assets = ParseAssetList(body);
+            assets = ReadAssetList(body);
         } catch (const std::exception& e) {
             ReportParseFailure("_HandleSearch", error, requestUID, e);
             return;
