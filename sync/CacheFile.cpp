@@ -7,6 +7,7 @@
 #include "foundation/core/ByteStreams.h"
 #include "foundation/core/Trace.h"
 #include "foundation/json/JSON.h"
+#include "sync/CacheFileReader.h"
 #include "sync/SyncCache.h"
 
 namespace tolmocore {
@@ -78,13 +79,43 @@ std::vector<CachedSyncFile> ReadCacheFile(const File& cacheFile)
     // One more byte, zero, so that the text ends in a NUL.
     UTF8String text(static_cast<std::size_t>(length) + 1, 0);
     in.ReadBlock(&text[0], static_cast<unsigned int>(length));
-    json::JSONConvertStdVector<CachedSyncFile>::FromJSON(json::JSONParse(text), parsed);
+    if (ReadCacheEntries(text, parsed)) return parsed;
+    boost::any tree = json::JSONParse(text);
+    text = UTF8String();
+    // Each entry's subtree goes as soon as it is converted: the tree is many
+    // times the size of the records, and the two never need to be whole at once.
+    json::JSONArray& entries = boost::any_cast<json::JSONArray&>(tree);
+    parsed.reserve(entries.size());
+    for (boost::shared_ptr<boost::any>& entry : entries) {
+        parsed.push_back(json::JSONConvert<CachedSyncFile>::FromJSON(entry ? *entry : boost::any()));
+        entry.reset();
+    }
     return parsed;
+}
+
+// The same bytes as printing the whole list as one tree, one record at a
+// time: the tree of 10,000 records was the largest thing a pass held.
+void WriteRecords(OPlatformByteStream& out, const std::vector<CachedSyncFile>& records)
+{
+    constexpr std::size_t kChunk = 64 * 1024;
+    UTF8String text("[");
+    for (std::size_t index = 0; index < records.size(); ++index) {
+        if (index > 0) text.append(",", 1);
+        text += json::GetJSONUTF8String(json::JSONConvert<CachedSyncFile>::ToJSON(records[index]), false);
+        if (text.size() < kChunk) continue;
+        out.WriteBlock(text.data(), static_cast<unsigned int>(text.size()));
+        text.clear();
+    }
+    text.append("]", 1);
+    out.WriteBlock(text.data(), static_cast<unsigned int>(text.size()));
 }
 
 }  // namespace
 
-File SyncCache::GetCache() { return File(Dir::PrefDir(), u"tolmonetsynccache.json"); }
+File SyncCache::GetCache()
+{
+    return File(Dir::PrefDir(), u"tolmonetsynccache.json");
+}
 
 void SyncCache::LoadCache()
 {
@@ -136,9 +167,7 @@ void SyncCache::SaveCache()
     // old file or the new one, never a torn one. Private, and a link planted
     // at its name is replaced, not written through.
     OPlatformByteStream out(cacheFile, 1, 0600);
-    const UTF8String text =
-        json::GetJSONUTF8String(json::JSONConvertStdContainer<CachedSyncFile>::ToJSON(mFiles), false);
-    out.WriteBlock(text.data(), static_cast<unsigned int>(text.size()));
+    WriteRecords(out, mFiles);
     out.Close();
 }
 

@@ -4,6 +4,7 @@
 
 #include "assets/AssetJSON.h"
 #include "foundation/net/QuoteURL.h"
+#include "tarnvault/AssetListReader.h"
 #include "tarnvault/TarnvaultPrivate.h"
 
 namespace tolmonetsync {
@@ -18,15 +19,24 @@ namespace {
 void _HandleSearch(const AssetsCallback& success, const ErrorCallback& error, const Guid& requestUID,
                    const boost::shared_ptr<tolmonet::Response>& response)
 {
-    const UTF8String body = _HandleBody("Search", requestUID, response);
-    if (ReportStoppedAnswer("_HandleSearch", error, requestUID, response)) return;
-    if (response->status != 200) {
-        error(requestUID, response);
-        return;
+    std::vector<boost::shared_ptr<AssetBase> > assets;
+    {
+        // The text goes before the callback runs: a whole scan may run
+        // inside it, and a large group's answer is megabytes long.
+        const UTF8String body = _HandleBody("Search", requestUID, response);
+        if (ReportStoppedAnswer("_HandleSearch", error, requestUID, response)) return;
+        if (response->status != 200) {
+            error(requestUID, response);
+            return;
+        }
+        try {
+            assets = ReadAssetList(body);
+        } catch (const std::exception& e) {
+            ReportParseFailure("_HandleSearch", error, requestUID, e);
+            return;
+        }
     }
     try {
-        const std::vector<boost::shared_ptr<AssetBase> > assets =
-            ParseAssetList(body);
         success(requestUID, assets);
     } catch (const std::exception& e) {
         ReportParseFailure("_HandleSearch", error, requestUID, e);
@@ -83,8 +93,9 @@ Guid Tarnvault::SearchAsync(const AssetsCallback& success, const ErrorCallback& 
     }
     const UTF8String url = mServerURL + "/search?" + tolmonet::QuoteURL(pairs);
     TOLMO_TRACE("Tarnvault", 8,
-                "Search" << ", q: " << q << ", scope: " << scope
-                         << ", url: " << RedactedForTrace(url) << ", requestUID: " << requestUID);
+                "Search"
+                    << ", q: " << q << ", scope: " << scope << ", url: " << RedactedForTrace(url)
+                    << ", requestUID: " << requestUID);
     const bool taken = mProcessor->POST(requestUID, boost::bind(&_HandleSearch, success, error, _1, _2),
                                         ImmutableString::CreateDynamic(url), tolmonet::http::RequestProcessor::Body(),
                                         tolmonet::HeaderList(), tolmonet::Configuration());
@@ -100,10 +111,11 @@ Guid Tarnvault::SearchOneAsync(const AssetCallback& success, const ErrorCallback
 Guid Tarnvault::HeaderAsync(const AssetCallback& success, const ErrorCallback& error, const UTF8String& uid,
                             bool isCollection, const Guid& requestUID)
 {
-    const UTF8String url = mServerURL + (isCollection ? "/collections/" : "/assets/") + uid +
-                           (isCollection ? "/header" : "/metadata");
-    TOLMO_TRACE("Tarnvault", 8, "Header" << ", uid: " << uid
-                                         << ", url: " << RedactedForTrace(url) << ", requestUID: " << requestUID);
+    const UTF8String url =
+        mServerURL + (isCollection ? "/collections/" : "/assets/") + uid + (isCollection ? "/header" : "/metadata");
+    TOLMO_TRACE("Tarnvault", 8,
+                "Header"
+                    << ", uid: " << uid << ", url: " << RedactedForTrace(url) << ", requestUID: " << requestUID);
     const bool taken =
         mProcessor->GET(requestUID, boost::bind(&_HandleHeader, uid, success, error, _1, _2),
                         ImmutableString::CreateDynamic(url), tolmonet::HeaderList(), tolmonet::Configuration());

@@ -63,6 +63,22 @@ void CompletionQueue::PostAfter(CompletionJob job, std::chrono::milliseconds del
     mWake.notify_one();
 }
 
+void CompletionQueue::SetBacklogWaker(std::size_t mark, const boost::function<void()>& waker)
+{
+    std::lock_guard<std::mutex> lock(mMutex);
+    mBacklogMark = mark;
+    mBacklogWaker = waker;
+    mBacklogWakerArmed = false;
+}
+
+bool CompletionQueue::IsBacklogged()
+{
+    std::lock_guard<std::mutex> lock(mMutex);
+    if (!mBacklogWaker || mReady.size() < mBacklogMark) return false;
+    mBacklogWakerArmed = true;
+    return true;
+}
+
 void CompletionQueue::Run()
 {
     pthread_setname_np(pthread_self(), "tolmo-handlers");
@@ -78,6 +94,10 @@ void CompletionQueue::Run()
         if (!mReady.empty()) {
             CompletionJob job(std::move(mReady.front()));
             mReady.pop_front();
+            if (mBacklogWakerArmed && mReady.size() < mBacklogMark) {
+                mBacklogWakerArmed = false;
+                mBacklogWaker();
+            }
             lock.unlock();
             job.Run();
             // Destroyed before the lock is taken again: what the job held may

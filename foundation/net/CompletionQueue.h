@@ -48,6 +48,15 @@ public:
 
     bool IsCurrentThread() const { return std::this_thread::get_id() == mThreadId; }
 
+    // Back-pressure for a producer that must not run far ahead of the
+    // handlers. `waker` is called on the completion thread, under the
+    // queue's lock (so it must only wake someone), once the jobs due fall
+    // below `mark` after IsBacklogged() has found them at or above it. An
+    // empty waker removes it; after that returns, it is never called again.
+    void SetBacklogWaker(std::size_t mark, const boost::function<void()>& waker);
+    // Whether `mark` jobs or more are due; if so, arms the waker.
+    bool IsBacklogged();
+
     // Ends the thread once the job that runs now has returned, and destroys
     // every pending job without running it. Called from a job, the thread is
     // left to end by itself when that job returns.
@@ -68,6 +77,9 @@ private:
     std::deque<CompletionJob> mReady;                        // guarded by mMutex
     std::multimap<Clock::time_point, CompletionJob> mTimed;  // guarded by mMutex; equal times keep post order
     bool mStopping = false;                                  // guarded by mMutex
+    std::size_t mBacklogMark = 0;                            // guarded by mMutex
+    boost::function<void()> mBacklogWaker;                   // guarded by mMutex
+    bool mBacklogWakerArmed = false;                         // guarded by mMutex
     std::thread mThread;
     std::thread::id mThreadId;  // written before any job can run, then constant
 };

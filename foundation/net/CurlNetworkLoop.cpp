@@ -1,5 +1,6 @@
 #include "foundation/net/CurlNetworkLoop.h"
 
+#include <algorithm>
 #include <cerrno>
 #include <cstring>
 #include <stdexcept>
@@ -19,6 +20,10 @@ namespace {
 constexpr int kIdlePollMilliseconds = 1000;
 // Handles kept for reuse: enough for the connections in use, no more.
 constexpr size_t kMaxSpareHandles = 32;
+// Answers waiting for their handlers, beyond which no new transfer starts:
+// when handlers are slower than the network (a download's file is made
+// durable there), what they would hold (open files, bodies) stays bounded.
+constexpr size_t kMaxCompletionBacklog = 64;
 
 CURLM* MakeMulti(long maxConnections, long maxConnectionsPerHost)
 {
@@ -54,8 +59,11 @@ CurlNetworkLoop::CurlNetworkLoop(const CurlTransferEnvironment& environment, lon
     : mEnvironment(environment),
       mCompletions(completions),
       mMulti(MakeMulti(maxConnections, maxConnectionsPerHost)),
+      // Twice the connections: a handle is ready whenever one frees up.
+      mMaxRunning(static_cast<size_t>(std::max(2 * maxConnections, 8L))),
       mWakeFd(MakeWakeFd())
 {
+    mCompletions->SetBacklogWaker(kMaxCompletionBacklog, [this] { Wake(); });
     mThread = std::thread([this] { Run(); });
 }
 
@@ -141,14 +149,27 @@ void CurlNetworkLoop::Run()
         }
         for (auto& transfer : cancelled) Deliver(std::move(transfer), CurlTransfer::MakeCancelledResponse());
         cancelled.clear();
-        for (auto& transfer : incoming) Begin(std::move(transfer));
+        for (auto& transfer : incoming) mWaiting.push_back(std::move(transfer));
         incoming.clear();
         if (cancelPending) EndCancelled();
+        Admit();
 
         int running = 0;
         curl_multi_perform(mMulti, &running);
         CollectFinished();
+        // Finished transfers made room: start the next ones without sleeping.
+        if (!mWaiting.empty() && HasRoom() && !mCompletions->IsBacklogged()) continue;
         Poll();
+    }
+}
+
+void CurlNetworkLoop::Admit()
+{
+    if (mWaiting.empty() || !HasRoom() || mCompletions->IsBacklogged()) return;
+    while (!mWaiting.empty() && HasRoom()) {
+        std::unique_ptr<CurlTransfer> transfer(std::move(mWaiting.front()));
+        mWaiting.pop_front();
+        Begin(std::move(transfer));
     }
 }
 
@@ -179,11 +200,17 @@ void CurlNetworkLoop::Begin(std::unique_ptr<CurlTransfer> transfer)
 void CurlNetworkLoop::EndCancelled()
 {
     std::vector<CurlTransfer*> cancelled;
+    std::deque<std::unique_ptr<CurlTransfer> > unsent;
     {
         std::lock_guard<std::mutex> lock(mMutex);
         for (const auto& running : mRunning)
             if (running.first->mCancelled) cancelled.push_back(running.first);
+        // One sweep keeps the order of the rest: a cancel-all stays linear.
+        std::deque<std::unique_ptr<CurlTransfer> > kept;
+        for (auto& transfer : mWaiting) (transfer->mCancelled ? unsent : kept).push_back(std::move(transfer));
+        mWaiting.swap(kept);
     }
+    for (auto& transfer : unsent) Deliver(std::move(transfer), CurlTransfer::MakeCancelledResponse());
     for (CurlTransfer* transfer : cancelled) Finish(transfer, CURLE_OK, true);
 }
 
@@ -273,6 +300,7 @@ void CurlNetworkLoop::Stop()
         if (mStopping && !mThread.joinable()) return;
         mStopping = true;
     }
+    mCompletions->SetBacklogWaker(0, boost::function<void()>());  // the wake descriptor closes below
     Wake();
     if (mThread.joinable()) mThread.join();
 
@@ -293,6 +321,7 @@ void CurlNetworkLoop::Stop()
     // Handlers go here, uncalled; whatever their destructors start is kept
     // in mIncoming and never sent.
     mRunning.clear();
+    mWaiting.clear();
     incoming.clear();
 }
 

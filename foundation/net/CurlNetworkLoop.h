@@ -2,6 +2,7 @@
 // The network thread: one libcurl multi handle driving every transfer of a
 // processor, and the bookkeeping of live request identifiers.
 
+#include <deque>
 #include <memory>
 #include <mutex>
 #include <thread>
@@ -54,6 +55,9 @@ private:
     void Poll();
     void Wake();
     void Begin(std::unique_ptr<CurlTransfer> transfer);
+    // Hands waiting transfers to libcurl, oldest first, while there is room.
+    void Admit();
+    bool HasRoom() const { return mRunning.size() < mMaxRunning; }
     void EndCancelled();
     void CollectFinished();
     // Ends a transfer that libcurl has (or had) and hands its handler over.
@@ -67,6 +71,10 @@ private:
     const CurlTransferEnvironment mEnvironment;
     const boost::shared_ptr<CompletionQueue> mCompletions;
     CURLM* const mMulti;
+    // libcurl's multi walks all its handles on every perform and removal, so
+    // thousands queued there cost quadratic time; it holds a few more than it
+    // can connect, and the rest wait in mWaiting in the order they came.
+    const size_t mMaxRunning;
 
     std::mutex mMutex;
     std::unordered_map<Guid, CurlTransfer*, GuidHash> mLive;  // guarded by mMutex
@@ -81,6 +89,7 @@ private:
 
     // The network thread's own, and after the join the stopping thread's.
     std::unordered_map<CurlTransfer*, std::unique_ptr<CurlTransfer> > mRunning;
+    std::deque<std::unique_ptr<CurlTransfer> > mWaiting;
     std::vector<CURL*> mSpareHandles;
 
     std::thread mThread;

@@ -115,13 +115,14 @@ TEST_F(CacheFileTest, EntriesMatchByNameGroupAndMediaTypeFirstOneWins)
 {
     WriteFileBytes(CacheFilePath(), R"([
         {"mName":"a.xmp","mMimeType":"image/png","mCollectionName":"Group","mCachedServerEtag":"other type"},
-        {"mName":"a.xmp","mMimeType":"text/xml","mCollectionName":"Group","mCachedServerEtag":"first"},
+        {"mName":"a.xmp","mCachedServerEtag":"dropped","mMimeType":"text/xml","mCollectionName":"Group",
+         "mCachedServerEtag":"first"},
         {"mName":"a.xmp","mMimeType":"text/xml","mCollectionName":"Group","mCachedServerEtag":"second"},
         {"mName":"b.xmp","mMimeType":"text/xml","mCollectionName":"Group","mCachedServerEtag":"b's"}])");
     fs::remove(mWork / "b.xmp");
     auto cache = Plan();
     cache->LoadCache();
-    EXPECT_EQ(cache->mFiles[0].mCachedServerEtag.ToStdString(), "first");
+    EXPECT_EQ(cache->mFiles[0].mCachedServerEtag.ToStdString(), "first") << "the last of a key wins";
     // A matching entry whose local file is gone is ignored: the record stays blank.
     EXPECT_TRUE(cache->mFiles[1].mCachedServerEtag.empty());
 }

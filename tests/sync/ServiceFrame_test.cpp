@@ -114,4 +114,15 @@ TEST_F(ServiceFrameTest, ServerItemsGetRecordsWithServerLimitsAndHostileNamesAre
     EXPECT_FALSE(std::filesystem::exists(mWork.Path().parent_path() / "escape.xmp"));
     EXPECT_TRUE(trace.Contains("escape.xmp"));
     EXPECT_TRUE(trace.Contains("Unexpected collection: "));
+
+    // A lookup by name finds the first item so named, as a walk would, also
+    // after uploads append and after a fetch replaces the children.
+    EXPECT_FALSE(cache.GetItem(FileNamed("nested")));
+    boost::shared_ptr<Item> first(new Item), later(new Item);
+    first->mName = later->mName = u"twin.xmp";
+    group->mChildren.push_back(first);
+    group->mChildren.push_back(later);
+    EXPECT_EQ(cache.GetItem(FileNamed("twin.xmp")), first);
+    group->mChildren = {later};
+    EXPECT_EQ(cache.GetItem(FileNamed("twin.xmp")), later);
 }

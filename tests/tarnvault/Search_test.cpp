@@ -95,6 +95,7 @@ TEST_F(ClientTest, UnusableAnswersReachTheErrorCallback)
         {"search: refused", search, Answer(404, "gone"), 404, "gone"},
         {"search: an object", search, Answer(200, R"({"id":"x"})"), -100, searchText},
         {"search: not JSON", search, Answer(200, "not json"), -100, searchText},
+        {"search: more after the list", search, Answer(200, twoItems + "]"), -100, searchText},
         {"search: an identifier not a string", search, Answer(200, R"([{"id":5}])"), -100, searchText},
         {"search: past the bound", search, Large("[", huge), -100, "_HandleSearch: JSON answer is larger than 64 MiB"},
         {"search one: two", searchOne, Answer(200, twoItems), -100, "SearchOne: too many results"},

@@ -20,6 +20,7 @@ namespace {
 CurlProcessorSettings OneConnection()
 {
     CurlProcessorSettings settings;
+    settings.mMaxConnections = 1;
     settings.mMaxConnectionsPerHost = 1;                        // a second request waits for the first
     settings.mConnectTimeout = std::chrono::milliseconds(200);  // shorter than a "/slow" answer takes
     return settings;
@@ -97,18 +98,25 @@ TEST_F(CurlIdentifiersTest, HandlerStartsTheNextStepUnderItsOwnIdentifier)
 
 TEST_F(CurlIdentifiersTest, CancelEndsRunningWaitingAndJustStartedRequestsAndFreesTheirIdentifiers)
 {
-    const Guid running = Guid::CreateUnique(), waiting = Guid::CreateUnique();
+    const Guid running = Guid::CreateUnique();
     ASSERT_TRUE(Get(running, "/hang", mRecorder.Handler()));
     EXPECT_FALSE(Get(running, "/other", mRecorder.Handler())) << "a second request under a live identifier";
     EXPECT_FALSE(Get(Guid::CreateUnique(), "/other", ResponseHandler())) << "an empty handler";
     ASSERT_TRUE(mServer.WaitForRequests(1, std::chrono::seconds(30)));
-    ASSERT_TRUE(Get(waiting, "/hang", mRecorder.Handler()));
-    mProcessor->TryToCancelRequest(waiting);
-    ASSERT_TRUE(mRecorder.WaitFor(1));
-    EXPECT_EQ(mRecorder.Responses().at(0).mRequestUID, waiting);
+    // More than libcurl is handed at once: the last ones wait in the processor.
+    std::vector<Guid> waiting(12);
+    for (Guid& requestUID : waiting) {
+        requestUID = Guid::CreateUnique();
+        ASSERT_TRUE(Get(requestUID, "/hang", mRecorder.Handler()));
+    }
+    for (auto it = waiting.rbegin(); it != waiting.rend(); ++it) {
+        mProcessor->TryToCancelRequest(*it);
+        ASSERT_TRUE(mRecorder.WaitFor(it - waiting.rbegin() + 1));
+        EXPECT_EQ(mRecorder.Responses().back().mRequestUID, *it);
+    }
     mProcessor->TryToCancelRequest(running);
-    ASSERT_TRUE(mRecorder.WaitFor(2));
-    EXPECT_EQ(mRecorder.Responses().at(1).mRequestUID, running);
+    ASSERT_TRUE(mRecorder.WaitFor(13));
+    EXPECT_EQ(mRecorder.Responses().at(12).mRequestUID, running);
     EXPECT_EQ(mServer.RequestsReceived(), 1u) << "neither the waiting nor the refused requests left";
 
     for (int i = 0; i < 40; ++i) {
@@ -116,14 +124,14 @@ TEST_F(CurlIdentifiersTest, CancelEndsRunningWaitingAndJustStartedRequestsAndFre
         ASSERT_TRUE(Get(quick, "/hang", mRecorder.Handler()));
         mProcessor->TryToCancelRequest(quick);
     }
-    ASSERT_TRUE(mRecorder.WaitFor(42));
+    ASSERT_TRUE(mRecorder.WaitFor(53));
     for (const auto& recorded : mRecorder.Responses()) {
         EXPECT_EQ(recorded.mResponse->status, kStatusNoResponse);
         EXPECT_EQ(recorded.mResponse->BodyText().ToStdString(), "Request cancelled");
     }
     ASSERT_TRUE(Get(running, "/after", mRecorder.Handler())) << "cancelling retires the identifier";
-    ASSERT_TRUE(mRecorder.WaitFor(43));
-    EXPECT_EQ(mRecorder.Responses().at(42).mResponse->status, 200);
+    ASSERT_TRUE(mRecorder.WaitFor(54));
+    EXPECT_EQ(mRecorder.Responses().at(53).mResponse->status, 200);
 }
 
 TEST_F(CurlIdentifiersTest, CallAsynchronouslyRunsOnTheCompletionThreadAfterItsDelay)
