@@ -88,7 +88,9 @@ TEST_F(JSONValuesTest, GuidsAndTimesGoAsTextAndBadTextIsRefused)
     const ptime never(boost::posix_time::not_a_date_time);
     EXPECT_EQ(GetJSONUTF8String(JSONConvert<ptime>::ToJSON(never), false), "\"\"");
     EXPECT_TRUE(RoundTrip(never).is_not_a_date_time());
-    EXPECT_THROW(JSONConvert<ptime>::FromJSON(boost::any(UTF8String("2014-Foo-05 09:41:07"))), std::exception);
+    for (const char* text : {"2014-Foo-05 09:41:07", "2014-Mar-5 09:41:07", "2014-Mar-05 09:41:07.",
+                             "2014-Mar-05 09:41:07.1234567890", "2014-Mar-05 09:41:0x", "2014-mar-05 09:41:07"})
+        EXPECT_THROW(JSONConvert<ptime>::FromJSON(boost::any(UTF8String(text))), std::exception) << text;
 }
 
 TEST_F(JSONValuesTest, ISO8601TimesReadToTheSecond)
