@@ -260,29 +260,26 @@ TEST_F(SyncCommand, RestoreBringsBackTheReplacedBytesAndBacksUpTheNewOnes)
 
 TEST_F(SyncCommand, KeepServerCopiesKeepsTheServersLosingVersionOnlyWhenAsked)
 {
-    SyncBothComputers();
-    // Changed on both computers: each upload replaces the server's version.
-    mLaptop.Write("b.txt", "server b");
+    // Computers without history: each one's file replaces the server's.
+    mLaptop.Write("a.txt", "laptop a");
     ASSERT_EQ(mLaptop.Sync(mService).mStatus, 0);
-    mDesktop.Write("b.txt", "mine b");
+    mDesktop.Write("a.txt", "desktop a");
     ASSERT_EQ(mDesktop.Sync(mService).mStatus, 0);
-    mLaptop.Write("a.txt", "server a");
-    ASSERT_EQ(mLaptop.Sync(mService).mStatus, 0);
-    mDesktop.Write("a.txt", "mine a");
-    const Finished keptRun = mDesktop.Sync(mService, {"--keep-server-copies"});
-    ASSERT_EQ(keptRun.mStatus, 0) << keptRun.mErr;
-    const Finished dbg = mDesktop.Backups({"backups"}); std::cerr << keptRun.mOut << dbg.mOut << dbg.mErr << dbg.mStatus;
+    EXPECT_EQ(mDesktop.Backups({"backups"}).mOut, "no backup copies\n");  // nothing kept unasked
+    const Computer fresh(mRoot.Path(), "fresh");
+    fresh.Write("a.txt", "fresh a");
+    ASSERT_EQ(fresh.Sync(mService, {"--keep-server-copies"}).mStatus, 0);
 
-    const boost::json::value runs = boost::json::parse(mDesktop.Backups({"backups", "--json"}).mOut).at("runs");
-    ASSERT_EQ(runs.as_array().size(), 1u) << runs;  // nothing kept without the option
+    const boost::json::value runs = boost::json::parse(fresh.Backups({"backups", "--json"}).mOut).at("runs");
+    ASSERT_EQ(runs.as_array().size(), 1u) << runs;
     const boost::json::value& kept = runs.at(0).at("copies").at(0);
     EXPECT_EQ(kept.at("reason").as_string(), "server-copy-kept");
     EXPECT_EQ(kept.at("copy").as_string(), "a.txt.server-copy");
-    EXPECT_EQ(testsupport::ReadFileBytes(mDesktop.mPref / "SyncBackup" / runs.at(0).at("run").as_string().c_str() /
+    EXPECT_EQ(testsupport::ReadFileBytes(fresh.mPref / "SyncBackup" / runs.at(0).at("run").as_string().c_str() /
                                          "a.txt.server-copy"),
-              "server a");
+              "desktop a");
     EXPECT_EQ(Computer(mRoot.Path(), "probe").Sync(mService).mStatus, 0);
-    EXPECT_EQ(testsupport::ReadFileBytes(mRoot / "probe" / "folder" / "a.txt"), "mine a");  // and then uploaded
+    EXPECT_EQ(testsupport::ReadFileBytes(mRoot / "probe" / "folder" / "a.txt"), "fresh a");  // and then uploaded
 }
 
 TEST(CommandUsage, BadOptionsAndSpecsExitTwoNamingTheMistake)
