@@ -115,6 +115,7 @@ int RunRestore(GlobalOptions globals, const std::vector<std::string>& arguments)
         return 0;
     }
     ApplyGlobalOptions(globals);
+    EnsurePrefDir();  // a restore writes there: refused if others could change it
     // The index names files by the absolute paths the sync was given.
     const std::string absolute = std::filesystem::absolute(path).lexically_normal().string();
     RestoreResult result;

@@ -3,6 +3,7 @@
 // backup index describes it.
 
 #include <cstdint>
+#include <string>
 
 #include "foundation/core/Dir.h"
 #include "foundation/core/File.h"
@@ -19,6 +20,9 @@ struct BackupCopy {
 // Copies `source` into `backupDir` under its own name (replacing a copy of
 // that name), with the original's permission bits. Throws on failure.
 BackupCopy CopyIntoBackup(const tolmocore::filesupport::File& source, const tolmocore::filesupport::Dir& backupDir);
+
+// The records' content checksum of bytes in memory.
+Guid ChecksumOfBytes(const std::string& bytes);
 
 // The index entry for a copy of `original` named `copyName` in `backupDir`,
 // made now; mName is the original's file name.

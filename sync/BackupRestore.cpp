@@ -45,10 +45,8 @@ std::string ReadCopy(const BackupEntry& entry)
     std::string bytes(static_cast<std::size_t>(in.Length()), '\0');
     if (!bytes.empty())
         in.ReadBlock(reinterpret_cast<unsigned char*>(&bytes[0]), static_cast<unsigned int>(bytes.size()));
-    // The records' checksum of what was read, compared with what was copied.
-    CachedSyncFile record;
-    record.mFile = copy;
-    if (bytes.size() != entry.mSize || record.ComputeChecksum().AsStdString() != entry.mChecksum)
+    // What was read, against what was copied.
+    if (bytes.size() != entry.mSize || ChecksumOfBytes(bytes).AsStdString() != entry.mChecksum)
         throw NoBackupCopy("the copy in " + entry.mRun + " was changed after it was made; not restored");
     return bytes;
 }

@@ -142,6 +142,16 @@ BackupCopy CopyIntoBackup(const File& source, const Dir& backupDir)
     return made;
 }
 
+Guid ChecksumOfBytes(const std::string& bytes)
+{
+    ContentChecksum checksum;
+    const auto* data = reinterpret_cast<const unsigned char*>(bytes.data());
+    for (std::size_t offset = 0; offset < bytes.size(); offset += kBlockSize)
+        checksum.Add(data + offset,
+                     static_cast<unsigned int>(std::min<std::size_t>(kBlockSize, bytes.size() - offset)));
+    return checksum.Value();
+}
+
 BackupEntry DescribeBackup(const File& original, const Dir& backupDir, const UTF16String& copyName,
                            const UTF16String& group, BackupReason reason, const BackupCopy& copy)
 {
