@@ -12,7 +12,7 @@ namespace {
 
 const char kSyncUsage[] =
     "usage: tolmonetsync [global options] sync [--mode two-way|server-wins|local-wins] [--dry-run]\n"
-    "         [--prune-groups] [--migrate major|previous-major]...\n"
+    "         [--prune-groups] [--keep-server-copies] [--migrate major|previous-major]...\n"
     "         --dir path=DIR,group=NAME,ext=.EXT[,max-size=BYTES][,checksum]...\n"
     "         --file path=FILE,group=NAME[,name=NAME][,type=MIME][,max-size=BYTES][,checksum]...\n";
 
@@ -24,13 +24,16 @@ const char kSyncHelp[] =
     "                     local-wins: the local state replaces the server's\n"
     "  --dry-run          print the plan and stop: nothing changes on the server or on disk\n"
     "  --prune-groups     allow deleting server groups that no --dir or --file names\n"
+    "  --keep-server-copies  before an upload replaces a server version changed since the last\n"
+    "                     sync, download it into the backup directory as NAME.server-copy\n"
     "  --migrate FORM     let a new host version copy an earlier version's preferences\n"
     "  --dir SPEC         every file of one extension in a directory (the directory must exist)\n"
     "  --file SPEC        one file (it may be missing: the sync brings it back)\n"
     "Defaults: size limit 16 MiB (files at or above it are not uploaded), media type\n"
     "application/octet-stream, a change is seen by the modification date (checksum: by content).\n"
     "Replaced and removed local files are copied into a backup directory under the preference\n"
-    "directory first. Exit status: 0 done, 1 the sync failed (reason on stderr), 2 bad usage.\n";
+    "directory first ('tolmonetsync backups' lists them, 'restore' puts one back).\n"
+    "Exit status: 0 done, 1 the sync failed (reason on stderr), 2 bad usage.\n";
 
 SyncJob ParseSync(GlobalOptions& globals, const std::vector<std::string>& arguments)
 {
@@ -46,6 +49,8 @@ SyncJob ParseSync(GlobalOptions& globals, const std::vector<std::string>& argume
             job.mDryRun = true;
         } else if (option == "--prune-groups") {
             job.mPruneGroups = true;
+        } else if (option == "--keep-server-copies") {
+            job.mKeepServerCopies = true;
         } else if (option == "--migrate") {
             const std::string& form = OptionValue(arguments, i);
             if (form != "major" && form != "previous-major")

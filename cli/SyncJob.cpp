@@ -243,6 +243,7 @@ int RunSyncJob(const SyncJob& job, Output output, std::ostream& out, std::ostrea
     notice.reset();
     const std::size_t removals = job.mMode == SyncMode_ServerWins ? ServerWinsRemovals(*cache, job.mDirs).size() : 0;
 
+    service->SetKeepServerCopies(job.mKeepServerCopies);
     const RunOutcome passed = RunPass(*service, cache, job.mMode, [&] { bar.Draw("syncing  ", service->Progress()); });
     bar.Clear();
     if (!passed.Ok()) return report.Fail(passed.mError.empty() ? "the sync did not finish" : passed.mError);

@@ -23,6 +23,7 @@ struct SyncJob {
     SyncMode mMode = SyncMode_TwoWay;
     bool mDryRun = false;
     bool mPruneGroups = false;
+    bool mKeepServerCopies = false;  // the server's version, before an upload replaces it
 };
 
 enum class Output {

@@ -7,6 +7,7 @@
 #include <string>
 #include <vector>
 
+#include "cli/BackupCommands.h"
 #include "cli/CommandLine.h"
 #include "cli/DemoCommand.h"
 #include "cli/ServeCommand.h"
@@ -26,6 +27,8 @@ const char kUsage[] =
     "  status   connected, not-logged-in or connection-failed\n"
     "  sync     keep directories and files in step with the asset service\n"
     "  demo     the main job end to end on a local service with temporary data\n"
+    "  backups  the backup copies, newest run first, with where each came from and why\n"
+    "  restore  PATH [--from RUN]: put back a backup copy (the current file is backed up first)\n"
     "'tolmonetsync COMMAND --help' tells more.\n";
 
 int RunCommand(const std::string& command, const GlobalOptions& globals, const std::vector<std::string>& rest)
@@ -36,6 +39,8 @@ int RunCommand(const std::string& command, const GlobalOptions& globals, const s
     if (command == "login") return RunLogin(globals, rest);
     if (command == "logout") return RunLogout(globals, rest);
     if (command == "status") return RunStatus(globals, rest);
+    if (command == "backups") return RunBackups(globals, rest);
+    if (command == "restore") return RunRestore(globals, rest);
     if (command == "help") {
         std::cout << kUsage << "\n" << kGlobalOptionsHelp;
         return 0;

@@ -19,6 +19,7 @@
 #include "identity/dialogs/MerrowLoginDialog.h"
 #include "identity/dialogs/MerrowLoginExtensionInfo.h"
 #include "identity/dialogs/SyncAuthenticationDialog.h"
+#include "sync/BackupRestore.h"
 #include "sync/SyncDecision.h"
 #include "sync/SyncFilesService.h"
 #include "sync/SyncPreview.h"

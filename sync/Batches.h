@@ -54,8 +54,22 @@ public:
                               CachedSyncFile& record);
     static Guid QueueDeleteItem(const boost::shared_ptr<BatchSync>& self, std::size_t index,
                                 const boost::shared_ptr<SyncCache>& cache, const boost::shared_ptr<Item>& item);
+    // Downloads the server's `item` into the cache's backup directory as
+    // NAME.server-copy, then uploads `record` under the same identifier. A
+    // failed download fails the slot and nothing is uploaded.
+    static Guid QueueKeepThenUpload(const boost::shared_ptr<BatchSync>& self, std::size_t index,
+                                    const boost::shared_ptr<Item>& item,
+                                    const boost::shared_ptr<Collection>& collection,
+                                    const boost::shared_ptr<SyncCache>& cache, CachedSyncFile& record);
 
 private:
+    static Guid SendUpload(const boost::shared_ptr<BatchSync>& self, std::size_t index,
+                           const boost::shared_ptr<Collection>& collection, const boost::shared_ptr<SyncCache>& cache,
+                           CachedSyncFile& record, const Guid& guid);
+    static void _HandleKeepServerCopy(const boost::shared_ptr<BatchSync>& self, std::size_t index,
+                                      const boost::shared_ptr<Collection>& collection,
+                                      const boost::shared_ptr<SyncCache>& cache, CachedSyncFile& record,
+                                      const File& copy, const Guid& requestID, const DownloadResult& result);
     static void _HandleQueueUpload(const boost::shared_ptr<BatchSync>& self, std::size_t index,
                                    const boost::shared_ptr<SyncCache>& cache, CachedSyncFile& record,
                                    const Guid& requestID, const boost::shared_ptr<Item>& item);

@@ -8,6 +8,7 @@
 
 #include "assets/ChildrenMutex.h"
 #include "foundation/core/Trace.h"
+#include "sync/PrefDirLock.h"
 #include "sync/SyncMutex.h"
 
 namespace tolmonetsync {
@@ -40,10 +41,23 @@ SyncCache::SyncCache(const std::vector<SyncFile>& files, const std::vector<SyncD
     // Registered files always have a record, whatever their size or extension.
     mFiles.reserve(files.size());
     for (const SyncFile& file : files) mFiles.emplace_back(file);
-    if (makeBackupDir) mBackupDir = NewBackupDir();
+    if (makeBackupDir) {
+        // Before the backup directory, whose pruning a restore must not meet.
+        try {
+            Dir::PrefDir().CreatePrivate();
+            mPrefDirLock.reset(new PrefDirLock(PrefDirLock::Shared));
+        } catch (const std::exception& e) {
+            // Only restores rely on it; the sync goes on without.
+            TOLMO_TRACE("tolmonetsync", 1, "Warning: sync lock not taken: " << e.what());
+        }
+        mBackupDir = NewBackupDir();
+    }
 }
 
-SyncCache::~SyncCache() = default;
+SyncCache::~SyncCache()
+{
+    FinishPass();  // copies of a pass that never reached its end
+}
 
 SyncCache::Clock SyncCache::BackupClock()
 {
@@ -115,8 +129,7 @@ void SyncCache::AddServerItems()
         if (!dir) continue;
         for (const boost::shared_ptr<AssetBase>& child : collection->mChildren) {
             if (child->is_collection()) {
-                TOLMO_TRACE("tolmonetsync", 1,
-                            "Unexpected collection: " << child << " inside " << collection);
+                TOLMO_TRACE("tolmonetsync", 1, "Unexpected collection: " << child << " inside " << collection);
                 continue;
             }
             const boost::shared_ptr<Item> item = boost::static_pointer_cast<Item>(child);

@@ -18,6 +18,7 @@
 #include <boost/weak_ptr.hpp>
 
 #include "assets/SyncServer.h"
+#include "sync/BackupIndex.h"
 #include "sync/DeferredList.h"
 #include "sync/SyncRecords.h"
 
@@ -40,12 +41,16 @@ struct UTF16Less {
 };
 using GroupNameSet = std::set<UTF16String, UTF16Less>;
 
+class PrefDirLock;
+
 class SyncCache : private boost::noncopyable {
 public:
     // Copies the lists; makes this run's backup directory (exceptions pass
-    // out). `makeBackupDir` false is for a read-only preview.
-    SyncCache(const std::vector<SyncFile>& files, const std::vector<SyncDir>& dirs,
-              const ProgressCallback& progress, const ItemToFileCallback& itemToFile, bool makeBackupDir = true);
+    // out), holding the preference directory's lock shared first so that no
+    // restore runs during the sync. `makeBackupDir` false is for a read-only
+    // preview, which takes neither.
+    SyncCache(const std::vector<SyncFile>& files, const std::vector<SyncDir>& dirs, const ProgressCallback& progress,
+              const ItemToFileCallback& itemToFile, bool makeBackupDir = true);
     virtual ~SyncCache();
 
     virtual const boost::shared_ptr<SyncServer>& GetApi() const = 0;
@@ -93,12 +98,24 @@ public:
     // through a link, whatever else lies there. A "SyncBackup" that is a
     // symbolic link is refused: throws FileSystemError naming it.
     static Dir NewBackupDir();
+    // The same without pruning, for a restore: it never removes the run it
+    // restores from.
+    static Dir NewBackupDirWithoutPruning();
     // The clock backup directories are named by (local time); replaceable by tests.
     using Clock = boost::function<boost::posix_time::ptime()>;
     static Clock BackupClock();
     static void SetBackupClock(const Clock& clock);
     // Copies the file into mBackupDir and removes it; failures are traced.
     void SafeDelete(File& file);
+    // SafeRenameSwap into mBackupDir, noting the copy for the backup index.
+    // Completion thread; throws like SafeRenameSwap.
+    void SwapDownloaded(CachedSyncFile& record);
+    // Notes a copy made into mBackupDir for the backup index. Any thread.
+    void NoteBackup(BackupEntry entry);
+    // The end of a pass, whatever its outcome: writes the noted copies into
+    // the backup index in one write and lets go of the lock. Never throws: a
+    // failed write is traced and the copies stay noted for a later call.
+    void FinishPass();
 
     // Directory files of `dir`'s extension, in name order.
     static void getAllLocalSyncFiles(const SyncDir& dir, std::vector<SyncFile>& out);
@@ -136,6 +153,10 @@ private:
     File FileForItem(const SyncDir& dir, const boost::shared_ptr<Item>& item) const;
 
     std::set<UTF16String, UTF16Less> mSwappedDirs;  // not yet synced; completion thread
+
+    std::mutex mBackupsMutex;  // guards mNotedBackups and mPrefDirLock
+    std::vector<BackupEntry> mNotedBackups;
+    std::unique_ptr<PrefDirLock> mPrefDirLock;
 
     mutable std::mutex mBatchMutex;  // guards mBatch only, for the copy of the pointer
     boost::weak_ptr<utility::DeferredList> mBatch;

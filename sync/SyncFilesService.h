@@ -50,8 +50,7 @@ public:
     virtual const boost::shared_ptr<SyncServer>& GetApi() const = 0;
     virtual SyncServiceType GetType() const = 0;
     virtual boost::shared_ptr<SyncCache> CreateCache(const std::vector<SyncFile>& files,
-                                                     const std::vector<SyncDir>& dirs,
-                                                     const ProgressCallback& progress,
+                                                     const std::vector<SyncDir>& dirs, const ProgressCallback& progress,
                                                      const ItemToFileCallback& itemToFile) = 0;
 
     // True if added; false (and nothing changes) if that File is registered.
@@ -83,6 +82,12 @@ public:
     // read or sent.
     bool PreviewSync(const PreviewSuccessCallback& success, const SyncErrorCallback& error, SyncMode mode,
                      const ItemToFileCallback& itemToFile);
+
+    // Before an upload replaces a server item that changed since the last
+    // sync (or has no history), download that version into the pass's backup
+    // directory as NAME.server-copy. Off by default: it adds requests. Set it
+    // from the thread that calls DoSync.
+    void SetKeepServerCopies(bool keep) { mKeepServerCopies = keep; }
 
     void CancelAll();
     float Progress() const;
@@ -120,6 +125,7 @@ private:
     void _HandleSync(const boost::shared_ptr<SyncCache>& cache, const SyncSuccessCallback& success,
                      const SyncErrorCallback& error);
 
+    bool mKeepServerCopies = false;
     mutable std::mutex mCacheMutex;  // guards mCache only, for the copy of the pointer
     boost::weak_ptr<SyncCache> mCache;
 };

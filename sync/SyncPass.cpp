@@ -6,6 +6,7 @@
 
 #include "assets/RestException.h"
 #include "foundation/core/Trace.h"
+#include "sync/BackupCopy.h"
 #include "sync/Batches.h"
 #include "sync/SyncDecision.h"
 #include "sync/SyncFilesService.h"
@@ -39,14 +40,20 @@ Guid BatchSync::QueueUpload(const boost::shared_ptr<BatchSync>& self, std::size_
                             const boost::shared_ptr<Collection>& collection, const boost::shared_ptr<SyncCache>& cache,
                             CachedSyncFile& record)
 {
-    const Guid guid = self->BeginSlot(index);
+    return SendUpload(self, index, collection, cache, record, self->BeginSlot(index));
+}
+
+Guid BatchSync::SendUpload(const boost::shared_ptr<BatchSync>& self, std::size_t index,
+                           const boost::shared_ptr<Collection>& collection, const boost::shared_ptr<SyncCache>& cache,
+                           CachedSyncFile& record, const Guid& guid)
+{
     CachedSyncFile* target = &record;  // mFiles does not change size during the pass
     const ItemCallback uploaded = [self, index, cache, target](const Guid& requestID,
                                                               const boost::shared_ptr<Item>& item) {
         _HandleQueueUpload(self, index, cache, *target, requestID, item);
     };
-    return cache->GetApi()->UploadAsync(uploaded, BindErrback(self, index), collection, record.mFile,
-                                        record.mMimeType, record.mName, guid);
+    return cache->GetApi()->UploadAsync(uploaded, BindErrback(self, index), collection, record.mFile, record.mMimeType,
+                                        record.mName, guid);
 }
 
 Guid BatchSync::QueueDownload(const boost::shared_ptr<BatchSync>& self, std::size_t index,
@@ -62,6 +69,22 @@ Guid BatchSync::QueueDownload(const boost::shared_ptr<BatchSync>& self, std::siz
     // Into the ".temp" file beside the target; an empty tag downloads unconditionally.
     return cache->GetApi()->DownloadAsync(downloaded, BindErrback(self, index), item, record.GetSafeRenameFile(),
                                           record.mCachedServerEtag, guid);
+}
+
+Guid BatchSync::QueueKeepThenUpload(const boost::shared_ptr<BatchSync>& self, std::size_t index,
+                                    const boost::shared_ptr<Item>& item,
+                                    const boost::shared_ptr<Collection>& collection,
+                                    const boost::shared_ptr<SyncCache>& cache, CachedSyncFile& record)
+{
+    const Guid guid = self->BeginSlot(index);
+    CachedSyncFile* target = &record;
+    const File copy(cache->mBackupDir, record.mFile.GetName() + UTF16String(u".server-copy"));
+    const DownloadCallback kept = [self, index, collection, cache, target, copy](const Guid& requestID,
+                                                                                 const DownloadResult& result) {
+        _HandleKeepServerCopy(self, index, collection, cache, *target, copy, requestID, result);
+    };
+    // Unconditional: the copy is of the server's version as it is now.
+    return cache->GetApi()->DownloadAsync(kept, BindErrback(self, index), item, copy, UTF8String(), guid);
 }
 
 Guid BatchSync::QueueDeleteItem(const boost::shared_ptr<BatchSync>& self, std::size_t index,
@@ -87,13 +110,39 @@ void BatchSync::_HandleQueueUpload(const boost::shared_ptr<BatchSync>& self, std
     Callback(self, index, requestID);
 }
 
+void BatchSync::_HandleKeepServerCopy(const boost::shared_ptr<BatchSync>& self, std::size_t index,
+                                      const boost::shared_ptr<Collection>& collection,
+                                      const boost::shared_ptr<SyncCache>& cache, CachedSyncFile& record,
+                                      const File& copy, const Guid& requestID, const DownloadResult& result)
+{
+    try {
+        if (!result.mDownloaded) throw std::runtime_error("the server's version was not downloaded");
+        CachedSyncFile kept;
+        kept.mFile = copy;
+        BackupCopy made;
+        made.mSize = copy.Size(FileSizeSelector_Data);
+        made.mChecksum = kept.ComputeChecksum();
+        BackupEntry entry = DescribeBackup(record.mFile, cache->mBackupDir, copy.GetName(), record.mCollectionName,
+                                           BackupReason::ServerCopyKept, made);
+        entry.mName = tolmocore::utility::ToNarrow(record.mName);
+        cache->NoteBackup(std::move(entry));
+    } catch (const std::exception& e) {
+        // Not kept, so not replaced: the server's version stays where it is.
+        Errback(self, index, requestID, MakeErrorResponse(AsciiToUTF16(e.what())));
+        return;
+    }
+    // The same identifier, so that CancelAll reaches the upload too.
+    if (SendUpload(self, index, collection, cache, record, requestID).IsNil())
+        Errback(self, index, requestID, MakeErrorResponse(u"QueueUpload error"));
+}
+
 void BatchSync::_HandleQueueDownload(const boost::shared_ptr<BatchSync>& self, std::size_t index,
                                      const boost::shared_ptr<SyncCache>& cache, const boost::shared_ptr<Item>& item,
                                      CachedSyncFile& record, const Guid& requestID, const DownloadResult& result)
 {
     if (result.mDownloaded) {
         try {
-            record.SafeRenameSwap(cache->mBackupDir);
+            cache->SwapDownloaded(record);
             cache->NoteSwap(record.mFile);
             record.mCachedServerEtag = result.mEtag;
             record.FreshenModDate();
@@ -123,8 +172,13 @@ bool SyncFilesService::DoSync(const boost::shared_ptr<SyncCache>& cache, const S
     cache->mSyncCount = cache->mDownloadCount = cache->mUploadCount = 0;
     cache->mStatus = SyncStatus_Syncing;
 
+    // A failed pass ends in `error` instead of _HandleSync: both end the pass.
+    const SyncErrorCallback failed = [cache, error](const UTF16String& text) {
+        cache->FinishPass();
+        error(text);
+    };
     boost::shared_ptr<BatchSync> batch(new BatchSync(
-        cache->mFiles.size(), [this, cache, success, error] { _HandleSync(cache, success, error); }, error,
+        cache->mFiles.size(), [this, cache, success, error] { _HandleSync(cache, success, error); }, failed,
         cache->mProgress, SyncErrorCallback()));
     cache->SetBatch(batch);
 
@@ -160,8 +214,15 @@ bool SyncFilesService::DoSync(const boost::shared_ptr<SyncCache>& cache, const S
             break;
         case SyncAction_Upload: {
             const boost::shared_ptr<Collection> collection = cache->GetCollection(record);
-            if (!collection || BatchSync::QueueUpload(batch, index, collection, cache, record).IsNil())
-                error(u"QueueUpload error");
+            // The server's version goes into the backups first, chained
+            // before its upload in the same slot.
+            const bool keep = mKeepServerCopies && decision.mItem &&
+                              (!decision.mHistory || decision.mItem->mModified != record.mCachedServerModDate);
+            const Guid queued =
+                !collection ? Guid()
+                : keep ? BatchSync::QueueKeepThenUpload(batch, index, decision.mItem, collection, cache, record)
+                       : BatchSync::QueueUpload(batch, index, collection, cache, record);
+            if (queued.IsNil()) error(u"QueueUpload error");
             break;
         }
         case SyncAction_DeleteRemote:
@@ -177,6 +238,7 @@ bool SyncFilesService::DoSync(const boost::shared_ptr<SyncCache>& cache, const S
 void SyncFilesService::_HandleSync(const boost::shared_ptr<SyncCache>& cache, const SyncSuccessCallback& success,
                                    const SyncErrorCallback& error)
 {
+    cache->FinishPass();
     try {
         cache->SaveCache();
         success(static_cast<int>(cache->mSyncCount));

@@ -4,6 +4,11 @@
 
 #include <gtest/gtest.h>
 
+#include <sys/file.h>
+
+#include <fcntl.h>
+#include <unistd.h>
+
 #include <map>
 
 #include <boost/json/parse.hpp>
@@ -44,6 +49,13 @@ public:
         return "path=" + mFolder.string() + ",group=" + group + ",ext=.txt";
     }
     void Write(const std::string& name, const std::string& bytes) const { WriteFileBytes(mFolder / name, bytes); }
+    std::string Read(const std::string& name) const { return testsupport::ReadFileBytes(mFolder / name); }
+    // `backups` or `restore` on this computer's preference directory.
+    Finished Backups(std::vector<std::string> arguments) const
+    {
+        arguments.insert(arguments.begin(), {"--pref-dir", mPref.string()});
+        return RunCli(arguments);
+    }
 
     fs::path mFolder;
     fs::path mPref;
@@ -206,6 +218,70 @@ TEST_F(SyncCommand, MigrateCopiesTheEarlierVersionsPreferencesAndSaysFromWhich)
     EXPECT_TRUE(migrated.mErr.empty()) << migrated.mErr;  // nothing traced unasked
 }
 
+TEST_F(SyncCommand, RestoreBringsBackTheReplacedBytesAndBacksUpTheNewOnes)
+{
+    SyncBothComputers();
+    mLaptop.Write("a.txt", "a2");
+    ASSERT_EQ(mLaptop.Sync(mService).mStatus, 0);
+    ASSERT_EQ(mDesktop.Sync(mService).mStatus, 0);  // a1 is replaced by a download
+    const std::string path = (mDesktop.mFolder / "a.txt").string();
+    const Finished listed = mDesktop.Backups({"backups"});
+    EXPECT_TRUE(Contains(listed.mOut, "replaced-by-download  " + path + " (Notes/a.txt), 2 bytes")) << listed.mOut;
+
+    const int lock = ::open((mDesktop.mPref / "tolmonetsync.lock").c_str(), O_RDONLY);
+    ASSERT_EQ(::flock(lock, LOCK_SH), 0);  // as a running sync holds it
+    const Finished refused = mDesktop.Backups({"restore", path});
+    ::close(lock);
+    EXPECT_EQ(refused.mStatus, 1);
+    EXPECT_TRUE(Contains(refused.mErr, "a sync of this preference directory is running")) << refused.mErr;
+    EXPECT_EQ(mDesktop.Read("a.txt"), "a2");
+
+    const Finished restored = mDesktop.Backups({"restore", path});
+    ASSERT_EQ(restored.mStatus, 0) << restored.mErr;
+    EXPECT_TRUE(Contains(restored.mOut, "restored " + path + " from Backup_")) << restored.mOut;
+    EXPECT_EQ(std::count(restored.mOut.begin(), restored.mOut.end(), '\n'), 1);
+    EXPECT_EQ(mDesktop.Read("a.txt"), "a1");
+    const boost::json::value runs = boost::json::parse(mDesktop.Backups({"backups", "--json"}).mOut).at("runs");
+    ASSERT_EQ(runs.as_array().size(), 2u);
+    const boost::json::value& newest = runs.at(0).at("copies").at(0);
+    EXPECT_EQ(newest.at("reason").as_string(), "replaced-by-restore");
+    EXPECT_EQ(
+        testsupport::ReadFileBytes(mDesktop.mPref / "SyncBackup" / runs.at(0).at("run").as_string().c_str() / "a.txt"),
+        "a2");
+
+    for (const std::vector<std::string>& nothing :
+         {std::vector<std::string>{"restore", (mDesktop.mFolder / "b.txt").string()},
+          std::vector<std::string>{"restore", path, "--from", "Backup_19990101-000000_000000"}}) {
+        const Finished missing = mDesktop.Backups(nothing);
+        EXPECT_EQ(missing.mStatus, 1);
+        EXPECT_TRUE(Contains(missing.mErr, "no backup copy of ")) << missing.mErr;
+    }
+}
+
+TEST_F(SyncCommand, KeepServerCopiesKeepsTheServersLosingVersionOnlyWhenAsked)
+{
+    // Computers without history: each one's file replaces the server's.
+    mLaptop.Write("a.txt", "laptop a");
+    ASSERT_EQ(mLaptop.Sync(mService).mStatus, 0);
+    mDesktop.Write("a.txt", "desktop a");
+    ASSERT_EQ(mDesktop.Sync(mService).mStatus, 0);
+    EXPECT_EQ(mDesktop.Backups({"backups"}).mOut, "no backup copies\n");  // nothing kept unasked
+    const Computer fresh(mRoot.Path(), "fresh");
+    fresh.Write("a.txt", "fresh a");
+    ASSERT_EQ(fresh.Sync(mService, {"--keep-server-copies"}).mStatus, 0);
+
+    const boost::json::value runs = boost::json::parse(fresh.Backups({"backups", "--json"}).mOut).at("runs");
+    ASSERT_EQ(runs.as_array().size(), 1u) << runs;
+    const boost::json::value& kept = runs.at(0).at("copies").at(0);
+    EXPECT_EQ(kept.at("reason").as_string(), "server-copy-kept");
+    EXPECT_EQ(kept.at("copy").as_string(), "a.txt.server-copy");
+    EXPECT_EQ(testsupport::ReadFileBytes(fresh.mPref / "SyncBackup" / runs.at(0).at("run").as_string().c_str() /
+                                         "a.txt.server-copy"),
+              "desktop a");
+    EXPECT_EQ(Computer(mRoot.Path(), "probe").Sync(mService).mStatus, 0);
+    EXPECT_EQ(testsupport::ReadFileBytes(mRoot / "probe" / "folder" / "a.txt"), "fresh a");  // and then uploaded
+}
+
 TEST(CommandUsage, BadOptionsAndSpecsExitTwoNamingTheMistake)
 {
     testsupport::TempDir root;
@@ -231,6 +307,8 @@ TEST(CommandUsage, BadOptionsAndSpecsExitTwoNamingTheMistake)
         {{"sync", "--file", "path=" + dir + "/nowhere/a.txt,group=G"}, "does not exist"},
         {{"sync", "--migrate", "minor", "--file", "path=" + dir + "/a.txt,group=G"}, "--migrate minor"},
         {{"frobnicate"}, "unknown command 'frobnicate'"},
+        {{"restore"}, "give the PATH"},
+        {{"backups", "--all"}, "unknown option '--all'"},
         {{"--ca-file", dir + "/missing.pem", "status"}, "--ca-file: no such file"},
         {{"login", "--user", "ann", "--password", "secret"}, "unknown option '--password'"},  // never an argument
         {{"serve", "--listen", "127.0.0.1:0"}, "--data is required"},
@@ -247,7 +325,8 @@ TEST(CommandUsage, BadOptionsAndSpecsExitTwoNamingTheMistake)
     const Finished missingFile = RunCli({"--server", "http://127.0.0.1:9/api", "--token", "t", "--pref-dir",
                                          (root / "pref").string(), "sync", "--file", "path=" + dir + "/a.txt,group=G"});
     EXPECT_EQ(missingFile.mStatus, 1) << missingFile.mErr;
-    for (const char* command : {"sync", "serve", "demo"}) EXPECT_EQ(RunCli({command, "--help"}).mStatus, 0) << command;
+    for (const char* command : {"sync", "serve", "demo", "backups", "restore"})
+        EXPECT_EQ(RunCli({command, "--help"}).mStatus, 0) << command;
 }
 
 TEST(DemoCommand, RunsTheMainJobAndRemovesWhatItMade)

@@ -48,11 +48,13 @@ Files FolderSync::Backups() const
     Files saved;
     const fs::path root = mPrefs.Path() / "SyncBackup";
     if (!fs::exists(root)) return saved;
-    for (const auto& dir : fs::directory_iterator(root))
+    for (const auto& dir : fs::directory_iterator(root)) {
+        if (!dir.is_directory()) continue;  // the backup index
         for (const auto& file : fs::directory_iterator(dir.path())) {
             std::string& copies = saved[file.path().filename().string()];
             copies += (copies.empty() ? "" : "|") + ReadFileBytes(file.path());
         }
+    }
     return saved;
 }
 

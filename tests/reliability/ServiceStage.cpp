@@ -103,7 +103,7 @@ std::set<std::string> Stage::BackupDirs() const
     std::set<std::string> names;
     if (!fs::exists(mPrefs.Path() / "SyncBackup")) return names;
     for (const auto& entry : fs::directory_iterator(mPrefs.Path() / "SyncBackup"))
-        names.insert(entry.path().filename().string());
+        if (entry.is_directory()) names.insert(entry.path().filename().string());
     return names;
 }
 
