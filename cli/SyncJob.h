@@ -23,6 +23,8 @@ struct SyncJob {
     SyncMode mMode = SyncMode_TwoWay;
     bool mDryRun = false;
     bool mPruneGroups = false;
+    SyncLimits mLimits;       // off unless --max-delete or --max-overwrite
+    bool mEveryFile = false;  // -v: a long plan is listed whole
 };
 
 enum class Output {

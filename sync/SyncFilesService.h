@@ -27,6 +27,7 @@
 #include "sync/SyncCache.h"
 #include "sync/SyncMutex.h"
 #include "sync/SyncRecords.h"
+#include "sync/SyncRisks.h"
 
 namespace tolmonetsync {
 
@@ -50,8 +51,7 @@ public:
     virtual const boost::shared_ptr<SyncServer>& GetApi() const = 0;
     virtual SyncServiceType GetType() const = 0;
     virtual boost::shared_ptr<SyncCache> CreateCache(const std::vector<SyncFile>& files,
-                                                     const std::vector<SyncDir>& dirs,
-                                                     const ProgressCallback& progress,
+                                                     const std::vector<SyncDir>& dirs, const ProgressCallback& progress,
                                                      const ItemToFileCallback& itemToFile) = 0;
 
     // True if added; false (and nothing changes) if that File is registered.
@@ -84,12 +84,21 @@ public:
     bool PreviewSync(const PreviewSuccessCallback& success, const SyncErrorCallback& error, SyncMode mode,
                      const ItemToFileCallback& itemToFile);
 
+    // Opt-in limits, off by default (SyncRisks.h counts them). DoSync over a
+    // plan beyond one calls `error` once with a line naming it and queues
+    // nothing; a preview carries them (SyncPreview::ExceededLimit) so that a
+    // host can refuse before PrepareSync, which already changes the server.
+    void SetMaxDelete(std::size_t count) { mLimits.mMaxDelete = count; }
+    void SetMaxOverwrite(std::size_t count) { mLimits.mMaxOverwrite = count; }
+    const SyncLimits& Limits() const { return mLimits; }
+
     void CancelAll();
     float Progress() const;
     std::int32_t GetStatus() const;
     // The cache file's modification date; not-a-date-time without one.
     boost::posix_time::ptime GetLatestSyncDate() const;
-    // Forgets what was last synchronised. Never throws.
+    // Forgets what was last synchronised: the cache file and its
+    // fingerprint. Never throws.
     void DeleteCaches();
 
     const std::vector<SyncFile>& SyncFiles() const { return mSyncFiles; }
@@ -120,6 +129,7 @@ private:
     void _HandleSync(const boost::shared_ptr<SyncCache>& cache, const SyncSuccessCallback& success,
                      const SyncErrorCallback& error);
 
+    SyncLimits mLimits;
     mutable std::mutex mCacheMutex;  // guards mCache only, for the copy of the pointer
     boost::weak_ptr<SyncCache> mCache;
 };
