@@ -44,8 +44,8 @@ class SyncCache : private boost::noncopyable {
 public:
     // Copies the lists; makes this run's backup directory (exceptions pass
     // out). `makeBackupDir` false is for a read-only preview.
-    SyncCache(const std::vector<SyncFile>& files, const std::vector<SyncDir>& dirs, const ProgressCallback& progress,
-              const ItemToFileCallback& itemToFile, bool makeBackupDir = true);
+    SyncCache(const std::vector<SyncFile>& files, const std::vector<SyncDir>& dirs,
+              const ProgressCallback& progress, const ItemToFileCallback& itemToFile, bool makeBackupDir = true);
     virtual ~SyncCache();
 
     virtual const boost::shared_ptr<SyncServer>& GetApi() const = 0;

@@ -9,21 +9,15 @@ namespace tolmonetsync {
 const char* SyncDecision::ActionName() const
 {
     switch (mAction) {
-        case SyncAction_Nothing:
-            return "nothing";
-        case SyncAction_Upload:
-            return "upload";
-        case SyncAction_Download:
-            // A conditional download of a file unchanged here: only a check unless the server changed it.
-            return mHistory && !mDropCachedEtag ? "check" : "download";
-        case SyncAction_DeleteRemote:
-            return "delete on server";
-        case SyncAction_SkipMissingRemote:
-            return "skip";
-        case SyncAction_SkipMissingLocal:
-            return "skip";
-        case SyncAction_SkipTooBig:
-            return "skip";
+    case SyncAction_Nothing: return "nothing";
+    case SyncAction_Upload: return "upload";
+    case SyncAction_Download:
+        // A conditional download of a file unchanged here: only a check unless the server changed it.
+        return mHistory && !mDropCachedEtag ? "check" : "download";
+    case SyncAction_DeleteRemote: return "delete on server";
+    case SyncAction_SkipMissingRemote: return "skip";
+    case SyncAction_SkipMissingLocal: return "skip";
+    case SyncAction_SkipTooBig: return "skip";
     }
     return "?";
 }
@@ -31,24 +25,19 @@ const char* SyncDecision::ActionName() const
 const char* SyncDecision::Reason() const
 {
     switch (mAction) {
-        case SyncAction_Nothing:
-            return "unchanged on both sides";
-        case SyncAction_Upload:
-            if (!mItem) return "not on the server";
-            if (!mHistory) return "no earlier sync: the local file is taken as the truth";
-            return mState == CachedSyncFile::State_Push ? "changed locally" : "the local side wins over the server";
-        case SyncAction_Download:
-            if (mDropCachedEtag) return "the server wins over the local file";
-            if (!mHistory) return "missing locally";
-            return "unchanged locally: comes down only if changed on the server";
-        case SyncAction_DeleteRemote:
-            return "deleted locally and the local side wins";
-        case SyncAction_SkipMissingRemote:
-            return "not on the server";
-        case SyncAction_SkipMissingLocal:
-            return "no local file to send";
-        case SyncAction_SkipTooBig:
-            return "at or above its size limit";
+    case SyncAction_Nothing: return "unchanged on both sides";
+    case SyncAction_Upload:
+        if (!mItem) return "not on the server";
+        if (!mHistory) return "no earlier sync: the local file is taken as the truth";
+        return mState == CachedSyncFile::State_Push ? "changed locally" : "the local side wins over the server";
+    case SyncAction_Download:
+        if (mDropCachedEtag) return "the server wins over the local file";
+        if (!mHistory) return "missing locally";
+        return "unchanged locally: comes down only if changed on the server";
+    case SyncAction_DeleteRemote: return "deleted locally and the local side wins";
+    case SyncAction_SkipMissingRemote: return "not on the server";
+    case SyncAction_SkipMissingLocal: return "no local file to send";
+    case SyncAction_SkipTooBig: return "at or above its size limit";
     }
     return "";
 }
@@ -57,8 +46,7 @@ SyncDecision DecideRecord(const SyncCache& cache, const CachedSyncFile& record, 
 {
     SyncDecision decision;
     decision.mState = record.GetState(mode);
-    decision.mHistory =
-        !record.mCachedServerModDate.is_not_a_date_time() && !record.mServerModDate.is_not_a_date_time();
+    decision.mHistory = !record.mCachedServerModDate.is_not_a_date_time() && !record.mServerModDate.is_not_a_date_time();
     if (decision.mState == CachedSyncFile::State_Current) return decision;
 
     bool upload;

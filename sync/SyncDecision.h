@@ -11,7 +11,7 @@
 namespace tolmonetsync {
 
 enum SyncAction {
-    SyncAction_Nothing,  // unchanged on both sides (only when the local side wins)
+    SyncAction_Nothing,            // unchanged on both sides (only when the local side wins)
     SyncAction_Upload,
     SyncAction_Download,           // conditional on the kept entity tag, if any
     SyncAction_DeleteRemote,       // the local file is gone and the local side wins

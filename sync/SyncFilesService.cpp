@@ -32,8 +32,8 @@ bool SyncFilesService::RegisterSyncFile(const SyncFile& file)
 
 bool SyncFilesService::UnregisterSyncFile(const File& file)
 {
-    auto found =
-        std::find_if(mSyncFiles.begin(), mSyncFiles.end(), [&](const SyncFile& entry) { return entry.mFile == file; });
+    auto found = std::find_if(mSyncFiles.begin(), mSyncFiles.end(),
+                              [&](const SyncFile& entry) { return entry.mFile == file; });
     if (found == mSyncFiles.end()) return false;
     mSyncFiles.erase(found);
     return true;
@@ -41,8 +41,8 @@ bool SyncFilesService::UnregisterSyncFile(const File& file)
 
 bool SyncFilesService::RegisterSyncDirectory(const SyncDir& dir)
 {
-    const bool known =
-        std::any_of(mSyncDirs.begin(), mSyncDirs.end(), [&](const SyncDir& entry) { return entry.mDir == dir.mDir; });
+    const bool known = std::any_of(mSyncDirs.begin(), mSyncDirs.end(),
+                                   [&](const SyncDir& entry) { return entry.mDir == dir.mDir; });
     if (known) return false;
     mSyncDirs.push_back(dir);
     return true;
@@ -50,8 +50,8 @@ bool SyncFilesService::RegisterSyncDirectory(const SyncDir& dir)
 
 bool SyncFilesService::UnregisterSyncDirectory(const Dir& dir)
 {
-    auto found =
-        std::find_if(mSyncDirs.begin(), mSyncDirs.end(), [&](const SyncDir& entry) { return entry.mDir == dir; });
+    auto found = std::find_if(mSyncDirs.begin(), mSyncDirs.end(),
+                              [&](const SyncDir& entry) { return entry.mDir == dir; });
     if (found == mSyncDirs.end()) return false;
     mSyncDirs.erase(found);
     return true;

@@ -51,7 +51,8 @@ public:
     virtual const boost::shared_ptr<SyncServer>& GetApi() const = 0;
     virtual SyncServiceType GetType() const = 0;
     virtual boost::shared_ptr<SyncCache> CreateCache(const std::vector<SyncFile>& files,
-                                                     const std::vector<SyncDir>& dirs, const ProgressCallback& progress,
+                                                     const std::vector<SyncDir>& dirs,
+                                                     const ProgressCallback& progress,
                                                      const ItemToFileCallback& itemToFile) = 0;
 
     // True if added; false (and nothing changes) if that File is registered.

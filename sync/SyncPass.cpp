@@ -55,11 +55,11 @@ Guid BatchSync::QueueUpload(const boost::shared_ptr<BatchSync>& self, std::size_
     const Guid guid = self->BeginSlot(index);
     CachedSyncFile* target = &record;  // mFiles does not change size during the pass
     const ItemCallback uploaded = [self, index, cache, target](const Guid& requestID,
-                                                               const boost::shared_ptr<Item>& item) {
+                                                              const boost::shared_ptr<Item>& item) {
         _HandleQueueUpload(self, index, cache, *target, requestID, item);
     };
-    return cache->GetApi()->UploadAsync(uploaded, BindErrback(self, index), collection, record.mFile, record.mMimeType,
-                                        record.mName, guid);
+    return cache->GetApi()->UploadAsync(uploaded, BindErrback(self, index), collection, record.mFile,
+                                        record.mMimeType, record.mName, guid);
 }
 
 Guid BatchSync::QueueDownload(const boost::shared_ptr<BatchSync>& self, std::size_t index,
@@ -69,7 +69,7 @@ Guid BatchSync::QueueDownload(const boost::shared_ptr<BatchSync>& self, std::siz
     const Guid guid = self->BeginSlot(index);
     CachedSyncFile* target = &record;
     const DownloadCallback downloaded = [self, index, cache, item, target](const Guid& requestID,
-                                                                           const DownloadResult& result) {
+                                                                          const DownloadResult& result) {
         _HandleQueueDownload(self, index, cache, item, *target, requestID, result);
     };
     // Into the ".temp" file beside the target; an empty tag downloads unconditionally.
@@ -117,8 +117,8 @@ void BatchSync::_HandleQueueDownload(const boost::shared_ptr<BatchSync>& self, s
     }
     TOLMO_TRACE("tolmonetsync", 8,
                 "Done: " << record.mFile.FullPath() << ", downloaded: " << (result.mDownloaded ? 1 : 0)
-                         << ", cache: " << record.mCachedLocalModDate << ", modified: " << PresentModDate(record.mFile)
-                         << ", requestID: " << requestID);
+                         << ", cache: " << record.mCachedLocalModDate << ", modified: "
+                         << PresentModDate(record.mFile) << ", requestID: " << requestID);
     if (result.mDownloaded) {
         ++cache->mSyncCount;
         ++cache->mDownloadCount;
@@ -157,35 +157,35 @@ bool SyncFilesService::DoSync(const boost::shared_ptr<SyncCache>& cache, const S
         // it downloads now: the saved cache must never vouch for that file.
         if (decision.mDropCachedEtag) record.mCachedServerEtag.clear();
         switch (decision.mAction) {
-            case SyncAction_Nothing:
-                batch->Skip(index);
-                break;
-            case SyncAction_SkipMissingRemote:
-                TOLMO_TRACE("tolmonetsync", 8, "Skipping missing remote: " << record.mFile.FullPath());
-                batch->Skip(index);
-                break;
-            case SyncAction_SkipMissingLocal:
-                TOLMO_TRACE("tolmonetsync", 8, "Skipping missing local: " << record.mFile.FullPath());
-                batch->Skip(index);
-                break;
-            case SyncAction_SkipTooBig:
-                TOLMO_TRACE("tolmonetsync", 1, "Skipping (too big): " << record.mFile.FullPath());
-                batch->Skip(index);
-                break;
-            case SyncAction_Download:
-                if (BatchSync::QueueDownload(batch, index, decision.mItem, cache, record).IsNil())
-                    error(u"QueueDownload error");
-                break;
-            case SyncAction_Upload: {
-                const boost::shared_ptr<Collection> collection = cache->GetCollection(record);
-                if (!collection || BatchSync::QueueUpload(batch, index, collection, cache, record).IsNil())
-                    error(u"QueueUpload error");
-                break;
-            }
-            case SyncAction_DeleteRemote:
-                if (BatchSync::QueueDeleteItem(batch, index, cache, decision.mItem).IsNil())
-                    error(u"QueueDeleteItem error");
-                break;
+        case SyncAction_Nothing:
+            batch->Skip(index);
+            break;
+        case SyncAction_SkipMissingRemote:
+            TOLMO_TRACE("tolmonetsync", 8, "Skipping missing remote: " << record.mFile.FullPath());
+            batch->Skip(index);
+            break;
+        case SyncAction_SkipMissingLocal:
+            TOLMO_TRACE("tolmonetsync", 8, "Skipping missing local: " << record.mFile.FullPath());
+            batch->Skip(index);
+            break;
+        case SyncAction_SkipTooBig:
+            TOLMO_TRACE("tolmonetsync", 1, "Skipping (too big): " << record.mFile.FullPath());
+            batch->Skip(index);
+            break;
+        case SyncAction_Download:
+            if (BatchSync::QueueDownload(batch, index, decision.mItem, cache, record).IsNil())
+                error(u"QueueDownload error");
+            break;
+        case SyncAction_Upload: {
+            const boost::shared_ptr<Collection> collection = cache->GetCollection(record);
+            if (!collection || BatchSync::QueueUpload(batch, index, collection, cache, record).IsNil())
+                error(u"QueueUpload error");
+            break;
+        }
+        case SyncAction_DeleteRemote:
+            if (BatchSync::QueueDeleteItem(batch, index, cache, decision.mItem).IsNil())
+                error(u"QueueDeleteItem error");
+            break;
         }
     }
     batch.reset();

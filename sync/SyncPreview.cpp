@@ -53,8 +53,9 @@ public:
     {
         auto self = shared_from_this();
         return !mCache->GetApi()
-                    ->GetRootAsync([self](const Guid& id,
-                                          const boost::shared_ptr<Collection>& root) { self->_HandleRoot(id, root); },
+                    ->GetRootAsync([self](const Guid& id, const boost::shared_ptr<Collection>& root) {
+                        self->_HandleRoot(id, root);
+                    },
                                    BindError(), Guid::CreateUnique())
                     .IsNil();
     }
@@ -200,8 +201,8 @@ private:
 
 }  // namespace
 
-bool SyncFilesService::PreviewSync(const PreviewSuccessCallback& success, const SyncErrorCallback& error, SyncMode mode,
-                                   const ItemToFileCallback& itemToFile)
+bool SyncFilesService::PreviewSync(const PreviewSuccessCallback& success, const SyncErrorCallback& error,
+                                   SyncMode mode, const ItemToFileCallback& itemToFile)
 {
     try {
         Dir::CheckPrefDir();
