@@ -225,13 +225,15 @@ int RunSyncJob(const SyncJob& job, Output output, std::ostream& out, std::ostrea
     report.Plan(*preview.mPreview);
     if (job.mDryRun) return report.Done(nullptr);
 
+    // Before the prepare, which already deletes and creates groups; the
+    // items of groups the guard below keeps count too.
+    const std::string overLimit = preview.mPreview->ExceededLimit();
+    if (!overLimit.empty()) return report.Fail(overLimit);
+
     // Deleting a group deletes everything in it: only on request.
     if (!preview.mPreview->mGroupsToDelete.empty() && !job.mPruneGroups)
         return report.Fail("refusing to delete server groups that no --dir or --file names: " +
                            JoinGroupNames(preview.mPreview->mGroupsToDelete) + " (give --prune-groups to delete them)");
-    // Before the prepare, which already deletes and creates groups.
-    const std::string overLimit = preview.mPreview->ExceededLimit();
-    if (!overLimit.empty()) return report.Fail(overLimit);
 
     // Preparing may make the preferences root and copy an earlier version's into it.
     std::unique_ptr<MigrationNotice> notice;
