@@ -107,7 +107,7 @@ std::vector<SyncRisk> FindRisks(const SyncPreview& preview)
         if (decision.mAction == SyncAction_Upload && decision.mItem) {
             if (!decision.mHistory)
                 risks.push_back(RecordRisk(SyncRisk_FirstSyncOverwrite, i, record,
-                                           "no earlier sync of this file: the local file replaces the server's"));
+                                           "the server's version is replaced, though this computer never synced it"));
             else if (record.mServerModDate != record.mCachedServerModDate)
                 risks.push_back(RecordRisk(SyncRisk_Conflict, i, record,
                                            "the server's version changed since the last sync and is replaced"));
