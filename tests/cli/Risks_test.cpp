@@ -38,26 +38,16 @@ protected:
         for (const auto& [file, bytes] : files) Write(computer, file, bytes);
         return computer;
     }
-    // A change the modification date shows whatever the file system's clock.
     static void Write(const Computer& computer, const std::string& name, const std::string& bytes)
     {
-        const fs::path path = computer.mFolder / name;
-        const bool existed = fs::exists(path);
-        const auto before = existed ? fs::last_write_time(path) : fs::file_time_type();
-        WriteFileBytes(path, bytes);
-        if (existed) fs::last_write_time(path, before + std::chrono::seconds(5));
+        WriteFileBytes(computer.mFolder / name, bytes);
     }
     Finished Sync(const Computer& computer, std::vector<std::string> options, const std::string& group = "Notes")
     {
-        std::vector<std::string> arguments = {"--server",
-                                              mService->AssetServiceUrl(),
-                                              "--pref-dir",
-                                              computer.mPref.string(),
-                                              "--client-id",
-                                              kClientId,
-                                              "sync",
-                                              "--dir",
-                                              "path=" + computer.mFolder.string() + ",group=" + group + ",ext=.txt"};
+        const std::string dir = "path=" + computer.mFolder.string() + ",group=" + group + ",ext=.txt";
+        std::vector<std::string> arguments = {"--server", mService->AssetServiceUrl(), "--pref-dir",
+                                              computer.mPref.string()};
+        arguments.insert(arguments.end(), {"--client-id", kClientId, "sync", "--dir", dir});
         arguments.insert(arguments.end(), options.begin(), options.end());
         return clitest::RunCli(arguments, {std::string("TOLMONETSYNC_TOKEN=") + testsupport::kAliceToken});
     }
