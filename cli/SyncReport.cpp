@@ -20,6 +20,11 @@ std::string Printable(const UTF16String& name)
     return PrintableName(ToNarrow(name));
 }
 
+std::string Printable(const std::string& text)
+{
+    return PrintableName(text);
+}
+
 std::string RecordName(const CachedSyncFile& record)
 {
     return Printable(record.mCollectionName) + "/" + Printable(record.mName);
@@ -34,11 +39,6 @@ struct PlanLine {
     const SyncRisk* mRisk;
     bool mAlwaysShown;  // a group or the root: never left out of a summary
 };
-
-std::string Printable(const std::string& text)
-{
-    return PrintableName(text);
-}
 
 boost::json::array RisksToJson(const std::vector<SyncRisk>& risks)
 {
