@@ -80,14 +80,14 @@ private:
 class JobReport {
 public:
     JobReport(const SyncJob& job, Output output, std::ostream& out, std::ostream& err)
-        : mOutput(output), mMode(job.mMode), mOut(out), mErr(err)
+        : mOutput(output), mMode(job.mMode), mEveryFile(job.mEveryFile), mOut(out), mErr(err)
     {
         mJson["mode"] = ModeName(job.mMode);
         mJson["dryRun"] = job.mDryRun;
     }
     void Plan(const SyncPreview& preview)
     {
-        if (mOutput == Output::Text) PrintPlan(mOut, preview);
+        if (mOutput == Output::Text) PrintPlan(mOut, preview, mEveryFile);
         if (mOutput == Output::Json) mJson["plan"] = PlanToJson(preview);
     }
     void Migrated(const std::string& version, const std::string& oldRootName, const boost::shared_ptr<SyncCache>& cache,
@@ -100,7 +100,7 @@ public:
         if (mOutput == Output::Text) {
             mOut << "migration: this host version had no preferences on the server; version " << version << "'s ("
                  << PrintableName(oldRootName) << ") were copied into its new root. The plan now:\n";
-            PrintPlan(mOut, after);
+            PrintPlan(mOut, after, mEveryFile);
         }
         mJson["migratedFrom"] = version;
         if (mOutput == Output::Json) mJson["planAfterMigration"] = PlanToJson(after);
@@ -132,6 +132,7 @@ private:
 
     Output mOutput;
     SyncMode mMode;
+    bool mEveryFile;
     std::ostream& mOut;
     std::ostream& mErr;
     boost::json::object mJson;
@@ -213,12 +214,21 @@ int RunSyncJob(const SyncJob& job, Output output, std::ostream& out, std::ostrea
         }
     }
 
+    // The pass checks them again on the plan it carries out.
+    service->SetMaxDelete(job.mLimits.mMaxDelete);
+    service->SetMaxOverwrite(job.mLimits.mMaxOverwrite);
+
     ProgressBar bar(out, output == Output::Text && isatty(STDOUT_FILENO) == 1);
     const RunOutcome preview = RunPreview(*service, job.mMode);
     if (!preview.mStarted) return report.Fail("could not send the first request");
     if (!preview.Ok()) return report.Fail(preview.mError);
     report.Plan(*preview.mPreview);
     if (job.mDryRun) return report.Done(nullptr);
+
+    // Before the prepare, which already deletes and creates groups; the
+    // items of groups the guard below keeps count too.
+    const std::string overLimit = preview.mPreview->ExceededLimit();
+    if (!overLimit.empty()) return report.Fail(overLimit);
 
     // Deleting a group deletes everything in it: only on request.
     if (!preview.mPreview->mGroupsToDelete.empty() && !job.mPruneGroups)

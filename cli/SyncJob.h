@@ -24,6 +24,8 @@ struct SyncJob {
     bool mDryRun = false;
     bool mPruneGroups = false;
     bool mKeepServerCopies = false;  // the server's version, before an upload replaces it
+    SyncLimits mLimits;       // off unless --max-delete or --max-overwrite
+    bool mEveryFile = false;  // -v: a long plan is listed whole
 };
 
 enum class Output {

@@ -25,9 +25,11 @@ struct SyncSummary {
     std::size_t mBackedUp = 0;  // files in the backup directory
 };
 
-// One line per record ("upload    prefs/colors.json: changed locally"),
-// then the group changes and local removals.
-void PrintPlan(std::ostream& out, const SyncPreview& preview);
+// The group changes and local removals, then one line per record ("upload
+// prefs/colors.json: changed locally"); a risky line ends with "[risk KIND:
+// why]". A plan longer than a screenful gives counts per action and only the
+// root, group and risky lines, unless `everyFile`.
+void PrintPlan(std::ostream& out, const SyncPreview& preview, bool everyFile);
 void PrintSummary(std::ostream& out, const SyncSummary& summary);
 
 boost::json::object PlanToJson(const SyncPreview& preview);

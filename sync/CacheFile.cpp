@@ -3,11 +3,13 @@
 #include "sync/CacheFile.h"
 
 #include <unordered_map>
+#include <unordered_set>
 
 #include "foundation/core/ByteStreams.h"
 #include "foundation/core/Trace.h"
 #include "foundation/json/JSON.h"
 #include "sync/CacheFileReader.h"
+#include "sync/CacheFingerprint.h"
 #include "sync/SyncCache.h"
 
 namespace tolmocore {
@@ -169,6 +171,22 @@ void SyncCache::SaveCache()
     OPlatformByteStream out(cacheFile, 1, 0600);
     WriteRecords(out, mFiles);
     out.Close();
+    // Whom the records are about, for the next run to compare.
+    if (GetApi()) WriteCacheFingerprint(FingerprintOf(*GetApi()));
+}
+
+std::set<std::size_t> SyncCache::RecordsDeletedLocally() const
+{
+    std::set<std::size_t> deleted;
+    try {
+        std::unordered_set<std::string> kept;
+        for (const CachedSyncFile& entry : ReadCacheFile(GetCache())) kept.insert(KeyOf(entry));
+        for (std::size_t index = 0; index < mFiles.size(); ++index)
+            if (kept.count(KeyOf(mFiles[index])) > 0 && !mFiles[index].mFile.Exists()) deleted.insert(index);
+    } catch (const std::exception& e) {
+        TOLMO_TRACE("tolmonetsync", 1, "cache file unreadable: " << e.what());
+    }
+    return deleted;
 }
 
 }  // namespace tolmonetsync

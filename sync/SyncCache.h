@@ -85,9 +85,12 @@ public:
     void LoadCache();
     // Writes every record's kept values to the cache file (0600, replacing a
     // link planted at its name rather than writing through it), after syncing
-    // every directory a noted swap renamed into. Throws on failure, the cache
-    // file then as it was.
+    // every directory a noted swap renamed into; then the fingerprint beside
+    // it (CacheFingerprint.h). Throws on failure, the cache file then as it was.
     void SaveCache();
+    // Indices of mFiles that the cache file lists but whose local file is
+    // gone: deleted here since the last sync. Never throws.
+    std::set<std::size_t> RecordsDeletedLocally() const;
     // Notes a swap into `file`'s directory, for SaveCache to sync. Completion
     // thread.
     void NoteSwap(const File& file);

@@ -11,7 +11,9 @@ const char* SyncDecision::ActionName() const
     switch (mAction) {
     case SyncAction_Nothing: return "nothing";
     case SyncAction_Upload: return "upload";
-    case SyncAction_Download: return "download";
+    case SyncAction_Download:
+        // A conditional download of a file unchanged here: only a check unless the server changed it.
+        return mHistory && !mDropCachedEtag ? "check" : "download";
     case SyncAction_DeleteRemote: return "delete on server";
     case SyncAction_SkipMissingRemote: return "skip";
     case SyncAction_SkipMissingLocal: return "skip";

@@ -32,7 +32,8 @@ struct SyncDecision {
 
     // Why, in words a person reads ("changed locally", ...).
     const char* Reason() const;
-    // What, in one word ("upload", "download", ...).
+    // What, in one word ("upload", "download", "check" for a conditional
+    // download of a file unchanged here, ...).
     const char* ActionName() const;
 };
 

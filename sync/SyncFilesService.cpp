@@ -5,6 +5,8 @@
 #include <algorithm>
 #include <stdexcept>
 
+#include "sync/CacheFingerprint.h"
+
 namespace tolmonetsync {
 
 boost::recursive_mutex& SyncMutex()
@@ -95,6 +97,8 @@ void SyncFilesService::DeleteCaches()
     try {
         const File cacheFile = SyncCache::GetCache();
         if (cacheFile.Exists()) cacheFile.Delete();
+        const File fingerprint = CacheFingerprintFile();
+        if (fingerprint.Exists()) fingerprint.Delete();
     } catch (const std::exception&) {
     }
 }

@@ -27,6 +27,7 @@
 #include "sync/SyncCache.h"
 #include "sync/SyncMutex.h"
 #include "sync/SyncRecords.h"
+#include "sync/SyncRisks.h"
 
 namespace tolmonetsync {
 
@@ -88,13 +89,21 @@ public:
     // directory as NAME.server-copy. Off by default: it adds requests. Set it
     // from the thread that calls DoSync.
     void SetKeepServerCopies(bool keep) { mKeepServerCopies = keep; }
+    // Opt-in limits, off by default (SyncRisks.h counts them). DoSync over a
+    // plan beyond one calls `error` once with a line naming it and queues
+    // nothing; a preview carries them (SyncPreview::ExceededLimit) so that a
+    // host can refuse before PrepareSync, which already changes the server.
+    void SetMaxDelete(std::size_t count) { mLimits.mMaxDelete = count; }
+    void SetMaxOverwrite(std::size_t count) { mLimits.mMaxOverwrite = count; }
+    const SyncLimits& Limits() const { return mLimits; }
 
     void CancelAll();
     float Progress() const;
     std::int32_t GetStatus() const;
     // The cache file's modification date; not-a-date-time without one.
     boost::posix_time::ptime GetLatestSyncDate() const;
-    // Forgets what was last synchronised. Never throws.
+    // Forgets what was last synchronised: the cache file and its
+    // fingerprint. Never throws.
     void DeleteCaches();
 
     const std::vector<SyncFile>& SyncFiles() const { return mSyncFiles; }
@@ -126,6 +135,7 @@ private:
                      const SyncErrorCallback& error);
 
     bool mKeepServerCopies = false;
+    SyncLimits mLimits;
     mutable std::mutex mCacheMutex;  // guards mCache only, for the copy of the pointer
     boost::weak_ptr<SyncCache> mCache;
 };

@@ -34,6 +34,19 @@ boost::posix_time::ptime PresentModDate(const File& file)
     }
 }
 
+// The refusal of a pass beyond the service's limits; empty within them. The
+// groups are gone by now: the preview counted their items.
+std::string ExceededLimitOfPass(const SyncCache& cache, SyncMode mode, const std::vector<SyncDir>& dirs,
+                                const SyncLimits& limits)
+{
+    if (limits.mMaxDelete == SyncLimits::kNone && limits.mMaxOverwrite == SyncLimits::kNone) return std::string();
+    std::vector<SyncDecision> plan;
+    plan.reserve(cache.mFiles.size());
+    for (const CachedSyncFile& record : cache.mFiles) plan.push_back(DecideRecord(cache, record, mode));
+    const std::size_t removals = mode == SyncMode_ServerWins ? ServerWinsRemovals(cache, dirs).size() : 0;
+    return ExceededLimit(limits, CountPlan(cache.mFiles, plan, removals, 0));
+}
+
 }  // namespace
 
 Guid BatchSync::QueueUpload(const boost::shared_ptr<BatchSync>& self, std::size_t index,
@@ -167,6 +180,11 @@ bool SyncFilesService::DoSync(const boost::shared_ptr<SyncCache>& cache, const S
                               const SyncErrorCallback& error, SyncMode mode)
 {
     boost::lock_guard<boost::recursive_mutex> lock(SyncMutex());
+    const std::string refused = ExceededLimitOfPass(*cache, mode, mSyncDirs, mLimits);
+    if (!refused.empty()) {
+        error(AsciiToUTF16(refused.c_str()));
+        return true;
+    }
     SetCache(cache);
     cache->SetSyncMode(mode);
     cache->mSyncCount = cache->mDownloadCount = cache->mUploadCount = 0;

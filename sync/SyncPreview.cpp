@@ -5,9 +5,12 @@
 #include "sync/SyncPreview.h"
 
 #include <boost/enable_shared_from_this.hpp>
+#include <boost/thread/lock_guard.hpp>
 
+#include "assets/ChildrenMutex.h"
 #include "assets/RestException.h"
 #include "sync/Batches.h"
+#include "sync/CacheFingerprint.h"
 #include "sync/SyncFilesService.h"
 
 namespace tolmonetsync {
@@ -35,8 +38,14 @@ private:
 class PreviewChain : public boost::enable_shared_from_this<PreviewChain> {
 public:
     PreviewChain(const boost::shared_ptr<SyncCache>& cache, const std::vector<SyncDir>& liveDirs, SyncMode mode,
-                 const PreviewSuccessCallback& success, const SyncErrorCallback& error)
-        : mCache(cache), mLiveDirs(liveDirs), mMode(mode), mSuccess(success), mError(error)
+                 const SyncLimits& limits, const PreviewSuccessCallback& success, const SyncErrorCallback& error)
+        : mCache(cache),
+          mDoomed(new PreviewCache(cache->GetApi(), {}, {}, ItemToFileCallback())),
+          mLiveDirs(liveDirs),
+          mMode(mode),
+          mLimits(limits),
+          mSuccess(success),
+          mError(error)
     {
     }
 
@@ -100,14 +109,26 @@ private:
         for (const boost::shared_ptr<AssetBase>& child : mCache->mRoot->mChildren)
             if (child->is_collection()) mCache->mServerGroupNames.insert(child->mName);
         mCache->DiffGroupNames();
+        // The groups a prepare would delete are listed first, for their item
+        // counts, into a plan of their own so that the scan never sees them.
+        auto self = shared_from_this();
+        FetchGroups(mDoomed, mCache->mGroupsToDelete, [self] { self->FetchGroupsOnBothSides(); });
+    }
 
+    void FetchGroupsOnBothSides()
+    {
         // Groups to create count as empty; groups on both sides are listed.
         auto self = shared_from_this();
-        const boost::shared_ptr<BatchFetchChildren> batch(new BatchFetchChildren(
-            mCache->mGroupsToFetch.size(), [self] { self->Finish(); }, mError, ProgressCallback(),
-            SyncErrorCallback()));
+        FetchGroups(mCache, mCache->mGroupsToFetch, [self] { self->Finish(); });
+    }
+
+    void FetchGroups(const boost::shared_ptr<SyncCache>& into, const GroupNameSet& names,
+                     const boost::function<void()>& then)
+    {
+        const boost::shared_ptr<BatchFetchChildren> batch(
+            new BatchFetchChildren(names.size(), then, mError, ProgressCallback(), SyncErrorCallback()));
         std::size_t index = 0;
-        for (const UTF16String& name : mCache->mGroupsToFetch) {
+        for (const UTF16String& name : names) {
             const std::size_t slot = index++;
             boost::shared_ptr<AssetBase> group;
             for (const boost::shared_ptr<AssetBase>& child : mCache->mRoot->mChildren) {
@@ -120,7 +141,7 @@ private:
                 batch->Skip(slot);
                 continue;
             }
-            if (BatchFetchChildren::QueueFetchChildren(batch, slot, mCache, boost::static_pointer_cast<Collection>(group))
+            if (BatchFetchChildren::QueueFetchChildren(batch, slot, into, boost::static_pointer_cast<Collection>(group))
                     .IsNil()) {
                 mError(u"QueueFetchChildren error");
                 break;
@@ -138,6 +159,10 @@ private:
             preview->mGroupsToDelete = mCache->mGroupsToDelete;
             preview->mGroupsToAdd = mCache->mGroupsToAdd;
             preview->mRootMissing = mRootMissing;
+            preview->mGroupsToDeleteItems = CountItems(mDoomed->mCollections);
+            preview->mDeletedLocally = mCache->RecordsDeletedLocally();
+            preview->mForeignCache = ForeignCacheReason(FingerprintOf(*mCache->GetApi()));
+            preview->mLimits = mLimits;
             if (mMode == SyncMode_ServerWins) preview->mLocalRemovals = ServerWinsRemovals(*mCache, mLiveDirs);
             preview->mDecisions.reserve(mCache->mFiles.size());
             for (const CachedSyncFile& record : mCache->mFiles) {
@@ -151,9 +176,24 @@ private:
         }
     }
 
+    static std::map<UTF16String, std::size_t, UTF16Less> CountItems(
+        const std::vector<boost::shared_ptr<Collection> >& groups)
+    {
+        std::map<UTF16String, std::size_t, UTF16Less> counts;
+        boost::lock_guard<boost::recursive_mutex> lock(ChildrenMutex());
+        for (const boost::shared_ptr<Collection>& group : groups) {
+            std::size_t& count = counts[group->mName];
+            for (const boost::shared_ptr<AssetBase>& child : group->mChildren)
+                if (!child->is_collection()) ++count;
+        }
+        return counts;
+    }
+
     boost::shared_ptr<SyncCache> mCache;
+    boost::shared_ptr<SyncCache> mDoomed;  // holds the groups a prepare would delete
     std::vector<SyncDir> mLiveDirs;
     SyncMode mMode;
+    SyncLimits mLimits;
     PreviewSuccessCallback mSuccess;
     SyncErrorCallback mError;
     bool mRootMissing = false;
@@ -171,7 +211,7 @@ bool SyncFilesService::PreviewSync(const PreviewSuccessCallback& success, const 
         return true;  // the error callback has run
     }
     const boost::shared_ptr<SyncCache> cache(new PreviewCache(GetApi(), mSyncFiles, mSyncDirs, itemToFile));
-    const boost::shared_ptr<PreviewChain> chain(new PreviewChain(cache, mSyncDirs, mode, success, error));
+    const boost::shared_ptr<PreviewChain> chain(new PreviewChain(cache, mSyncDirs, mode, mLimits, success, error));
     return chain->Start();
 }
 

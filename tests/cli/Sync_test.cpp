@@ -306,6 +306,7 @@ TEST(CommandUsage, BadOptionsAndSpecsExitTwoNamingTheMistake)
         {{"sync", "--file", "path=" + dir + "/a.txt,group=G,type=text"}, "not a media type"},
         {{"sync", "--file", "path=" + dir + "/nowhere/a.txt,group=G"}, "does not exist"},
         {{"sync", "--migrate", "minor", "--file", "path=" + dir + "/a.txt,group=G"}, "--migrate minor"},
+        {{"sync", "--max-delete", "-1", "--file", "path=" + dir + "/a.txt,group=G"}, "--max-delete -1: give a whole"},
         {{"frobnicate"}, "unknown command 'frobnicate'"},
         {{"restore"}, "give the PATH"},
         {{"backups", "--all"}, "unknown option '--all'"},
