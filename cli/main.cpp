@@ -9,6 +9,7 @@
 
 #include "cli/CommandLine.h"
 #include "cli/DemoCommand.h"
+#include "cli/DoctorCommand.h"
 #include "cli/ServeCommand.h"
 #include "cli/SignInCommands.h"
 #include "cli/SyncCommand.h"
@@ -26,6 +27,8 @@ const char kUsage[] =
     "  status   connected, not-logged-in or connection-failed\n"
     "  sync     keep directories and files in step with the asset service\n"
     "  demo     the main job end to end on a local service with temporary data\n"
+    "  doctor   sign-in, connection, clock, cache file, leftovers, names, backups: what needs attention\n"
+    "'tolmonetsync --version' prints the version.\n"
     "'tolmonetsync COMMAND --help' tells more.\n";
 
 int RunCommand(const std::string& command, const GlobalOptions& globals, const std::vector<std::string>& rest)
@@ -36,6 +39,7 @@ int RunCommand(const std::string& command, const GlobalOptions& globals, const s
     if (command == "login") return RunLogin(globals, rest);
     if (command == "logout") return RunLogout(globals, rest);
     if (command == "status") return RunStatus(globals, rest);
+    if (command == "doctor") return RunDoctor(globals, rest);
     if (command == "help") {
         std::cout << kUsage << "\n" << kGlobalOptionsHelp;
         return 0;
@@ -56,6 +60,10 @@ int main(int argc, char** argv)
     std::size_t index = 0;
     try {
         while (index < arguments.size() && ReadGlobalOption(arguments, index, globals)) ++index;
+        if (index < arguments.size() && arguments[index] == "--version") {
+            std::cout << "tolmonetsync " << TOLMONETSYNC_VERSION << "\n";
+            return 0;
+        }
     } catch (const UsageError& e) {
         std::cerr << "tolmonetsync: " << e.what() << "\n" << kUsage;
         return 2;
