@@ -75,6 +75,11 @@ std::string CountAndExamples(const std::vector<std::string>& names)
     return text + (names.size() > 3 ? ", ...)" : ")");
 }
 
+std::string Counted(std::size_t count, const char* one, const char* many)
+{
+    return std::to_string(count) + " " + (count == 1 ? one : many);
+}
+
 std::string SizeText(std::uintmax_t bytes)
 {
     const char* units[] = {"bytes", "KiB", "MiB", "GiB", "TiB"};
@@ -121,7 +126,11 @@ DoctorFinding CheckCacheFile(const DoctorSetup& setup)
             gone.push_back(RecordName(record));
         }
     }
-    finding.mDetail = std::to_string(records.size()) + " entries";
+    finding.mDetail = Counted(records.size(), "entry", "entries");
+    if (setup.mDirs.empty() && setup.mFiles.empty()) {
+        finding.mDetail += " (give the --dir and --file of the sync to check them)";
+        return finding;
+    }
     if (!unregistered.empty())
         finding.mDetail += "; for files no --dir or --file names: " + CountAndExamples(unregistered);
     if (!gone.empty())
