@@ -8,6 +8,7 @@
 
 #include "cli/DoctorChecks.h"
 #include "cli/PrintableName.h"
+#include "cli/ProgressBar.h"
 #include "foundation/json/JSON.h"
 #include "sync/CacheFile.h"
 #include "sync/CacheFileReader.h"
@@ -78,21 +79,6 @@ std::string CountAndExamples(const std::vector<std::string>& names)
 std::string Counted(std::size_t count, const char* one, const char* many)
 {
     return std::to_string(count) + " " + (count == 1 ? one : many);
-}
-
-std::string SizeText(std::uintmax_t bytes)
-{
-    const char* units[] = {"bytes", "KiB", "MiB", "GiB", "TiB"};
-    double value = static_cast<double>(bytes);
-    std::size_t unit = 0;
-    while (value >= 1024 && unit + 1 < sizeof(units) / sizeof(units[0])) {
-        value /= 1024;
-        ++unit;
-    }
-    std::ostringstream text;
-    text.precision(unit == 0 ? 0 : 1);
-    text << std::fixed << value << " " << units[unit];
-    return text.str();
 }
 
 }  // namespace
@@ -206,8 +192,8 @@ DoctorFinding CheckBackups(const DoctorSetup& setup)
             bytes += copy->file_size(inner);
         }
     }
-    finding.mDetail =
-        std::to_string(runs) + " backup directories, " + std::to_string(files) + " copies, " + SizeText(bytes) + "; ";
+    finding.mDetail = std::to_string(runs) + " backup directories, " + std::to_string(files) + " copies, " +
+                      ByteCountText(bytes) + "; ";
     const std::size_t syncs = runs + 1 >= kBackupsThatPrune ? 1 : kBackupsThatPrune - runs;
     finding.mDetail += syncs == 1 ? "the next sync prunes the oldest " + std::to_string(kBackupsThatPrune - 1)
                                   : "a prune of the oldest " + std::to_string(kBackupsThatPrune - 1) + " comes in " +

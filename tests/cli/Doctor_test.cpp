@@ -9,6 +9,7 @@
 #include <boost/json/parse.hpp>
 
 #include "cli/NameForms.h"
+#include "cli/ProgressBar.h"
 #include "server/Accounts.h"
 #include "support/CliProcess.h"
 #include "support/TempDir.h"
@@ -159,6 +160,20 @@ TEST(VersionOption, PrintsTheNameAndTheProjectVersion)
     const Finished version = RunCli({"--version"});
     EXPECT_EQ(version.mStatus, 0);
     EXPECT_EQ(version.mOut, "tolmonetsync " TOLMONETSYNC_VERSION "\n");
+}
+
+TEST(ProgressBar, ShowsFilesDoneOfTotalBytesMovedAndTheRateOnlyOnATerminal)
+{
+    std::ostringstream terminal;
+    {
+        tolmonetsync::cli::ProgressBar bar(terminal, true);
+        bar.DrawTransfer("syncing", 0.5f, 4, 3 * 512 * 1024, 2.0);
+    }
+    EXPECT_EQ(terminal.str().substr(0, terminal.str().find('\r', 1)),
+              "\rsyncing [###############...............] 50% 2/4 files, 1.5 MiB at 768.0 KiB/s");
+    std::ostringstream pipe;
+    tolmonetsync::cli::ProgressBar(pipe, false).DrawTransfer("syncing", 0.5f, 4, 1, 1.0);
+    EXPECT_EQ(pipe.str(), "");
 }
 
 }  // namespace
