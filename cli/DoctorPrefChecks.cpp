@@ -192,8 +192,8 @@ DoctorFinding CheckBackups(const DoctorSetup& setup)
             bytes += copy->file_size(inner);
         }
     }
-    finding.mDetail = std::to_string(runs) + " backup directories, " + std::to_string(files) + " copies, " +
-                      ByteCountText(bytes) + "; ";
+    finding.mDetail = Counted(runs, "backup directory", "backup directories") + ", " +
+                      Counted(files, "copy", "copies") + ", " + ByteCountText(bytes) + "; ";
     const std::size_t syncs = runs + 1 >= kBackupsThatPrune ? 1 : kBackupsThatPrune - runs;
     finding.mDetail += syncs == 1 ? "the next sync prunes the oldest " + std::to_string(kBackupsThatPrune - 1)
                                   : "a prune of the oldest " + std::to_string(kBackupsThatPrune - 1) + " comes in " +

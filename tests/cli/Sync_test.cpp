@@ -231,6 +231,7 @@ TEST(CommandUsage, BadOptionsAndSpecsExitTwoNamingTheMistake)
         {{"sync", "--file", "path=" + dir + "/nowhere/a.txt,group=G"}, "does not exist"},
         {{"sync", "--migrate", "minor", "--file", "path=" + dir + "/a.txt,group=G"}, "--migrate minor"},
         {{"frobnicate"}, "unknown command 'frobnicate'"},
+        {{"doctor", "--mode", "two-way"}, "unknown option '--mode'"},
         {{"--ca-file", dir + "/missing.pem", "status"}, "--ca-file: no such file"},
         {{"login", "--user", "ann", "--password", "secret"}, "unknown option '--password'"},  // never an argument
         {{"serve", "--listen", "127.0.0.1:0"}, "--data is required"},
@@ -247,7 +248,7 @@ TEST(CommandUsage, BadOptionsAndSpecsExitTwoNamingTheMistake)
     const Finished missingFile = RunCli({"--server", "http://127.0.0.1:9/api", "--token", "t", "--pref-dir",
                                          (root / "pref").string(), "sync", "--file", "path=" + dir + "/a.txt,group=G"});
     EXPECT_EQ(missingFile.mStatus, 1) << missingFile.mErr;
-    for (const char* command : {"sync", "serve", "demo"}) EXPECT_EQ(RunCli({command, "--help"}).mStatus, 0) << command;
+    for (const char* command : {"sync", "serve", "demo", "doctor"}) EXPECT_EQ(RunCli({command, "--help"}).mStatus, 0) << command;
 }
 
 TEST(DemoCommand, RunsTheMainJobAndRemovesWhatItMade)
