@@ -191,7 +191,7 @@ int RunSyncJob(const SyncJob& job, Output output, std::ostream& out, std::ostrea
         }
     }
 
-    ProgressBar bar(out, showProgress);
+    ProgressBar bar(out, output == Output::Text && isatty(STDOUT_FILENO) == 1);
     const RunOutcome preview = RunPreview(*service, job.mMode);
     if (!preview.mStarted) return report.Fail("could not send the first request");
     if (!preview.Ok()) return report.Fail(preview.mError);
