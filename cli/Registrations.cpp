@@ -87,7 +87,7 @@ UTF16String PathText(const std::filesystem::path& path)
 
 }  // namespace
 
-SyncDir ParseDirRegistration(const std::string& spec)
+SyncDir ParseDirRegistration(const std::string& spec, bool mustExist)
 {
     static const std::set<std::string> kKeys = {"path", "group", "ext", "max-size", "checksum"};
     const std::string option = "--dir";
@@ -98,13 +98,13 @@ SyncDir ParseDirRegistration(const std::string& spec)
     if (extension.size() < 2 || extension[0] != '.' || extension.find('/') != std::string::npos)
         throw UsageError(option + " " + spec + ": ext=" + extension + " is not an extension with its dot (.xmp)");
     std::error_code error;
-    if (!std::filesystem::is_directory(path, error))
+    if (mustExist && !std::filesystem::is_directory(path, error))
         throw UsageError(option + " " + spec + ": directory '" + path.string() + "' does not exist");
     return SyncDir(Dir(PathText(path)), ToUTF16(extension), ToUTF16(group),
                    ImmutableString::CreateStatic(kDefaultMediaType), ParseOptions(keys), ParseMaxSize(option, keys));
 }
 
-SyncFile ParseFileRegistration(const std::string& spec)
+SyncFile ParseFileRegistration(const std::string& spec, bool mustExist)
 {
     static const std::set<std::string> kKeys = {"path", "group", "name", "type", "max-size", "checksum"};
     const std::string option = "--file";
@@ -114,7 +114,7 @@ SyncFile ParseFileRegistration(const std::string& spec)
     std::error_code error;
     if (std::filesystem::is_directory(path, error))
         throw UsageError(option + " " + spec + ": '" + path.string() + "' is a directory; use --dir");
-    if (!std::filesystem::is_directory(path.parent_path(), error))
+    if (mustExist && !std::filesystem::is_directory(path.parent_path(), error))
         throw UsageError(option + " " + spec + ": directory '" + path.parent_path().string() + "' does not exist");
 
     const auto name = keys.find("name");

@@ -15,8 +15,10 @@ namespace tolmonetsync {
 namespace cli {
 
 // Both throw UsageError naming the option, the key and what is wrong.
-SyncDir ParseDirRegistration(const std::string& spec);
-SyncFile ParseFileRegistration(const std::string& spec);
+// `mustExist` false takes a missing directory as given, for a command that
+// reports it rather than refusing.
+SyncDir ParseDirRegistration(const std::string& spec, bool mustExist = true);
+SyncFile ParseFileRegistration(const std::string& spec, bool mustExist = true);
 
 }  // namespace cli
 }  // namespace tolmonetsync

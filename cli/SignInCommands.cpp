@@ -38,14 +38,6 @@ const char kStatusHelp[] =
     "\nPrints connected, not-logged-in or connection-failed for the stored sign-in; exit status 0\n"
     "only when connected.\n";
 
-// The keychain domains of this host identity, named as the client names its
-// "Access" and "Refresh" entries.
-UTF16String OvraKeychainDomain(const char16_t* kind)
-{
-    using namespace tolmocore::config;
-    return GetCompanyName() + u" " + GetClientName() + u" " + GetClientInternalVersion() + u" OVRA " + kind;
-}
-
 // The identity service gives every sign-in a device token; the command keeps
 // it beside the library's tokens so that logout can withdraw it.
 UTF16String DeviceTokenDomain()
@@ -135,6 +127,12 @@ struct SignInAnswer {
 };
 
 }  // namespace
+
+UTF16String OvraKeychainDomain(const char16_t* kind)
+{
+    using namespace tolmocore::config;
+    return GetCompanyName() + u" " + GetClientName() + u" " + GetClientInternalVersion() + u" OVRA " + kind;
+}
 
 const char* ConnectionStateName(SyncServer_ConnectionState state)
 {

@@ -15,6 +15,10 @@ int RunLogin(GlobalOptions globals, const std::vector<std::string>& arguments);
 int RunLogout(GlobalOptions globals, const std::vector<std::string>& arguments);
 int RunStatus(GlobalOptions globals, const std::vector<std::string>& arguments);
 
+// The keychain domain of this host identity's "Access" or "Refresh" entry,
+// named as the client names it.
+UTF16String OvraKeychainDomain(const char16_t* kind);
+
 // "connected", "not-logged-in", "connection-failed".
 const char* ConnectionStateName(SyncServer_ConnectionState state);
 

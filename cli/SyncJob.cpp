@@ -1,5 +1,6 @@
 #include "cli/SyncJob.h"
 
+#include <chrono>
 #include <filesystem>
 #include <memory>
 
@@ -8,8 +9,10 @@
 
 #include "cli/MigrationNotice.h"
 #include "cli/PrintableName.h"
+#include "cli/ProgressBar.h"
 #include "cli/SyncReport.h"
 #include "cli/SyncRun.h"
+#include "cli/TransferCounter.h"
 #include "foundation/net/HeaderConstants.h"
 #include "sync/SyncDecision.h"
 #include "sync/SyncFilesService.h"
@@ -48,33 +51,6 @@ std::size_t CountFiles(const Dir& dir)
         if (it->is_regular_file(error)) ++count;
     return count;
 }
-
-// A bar on one terminal line, redrawn in place.
-class ProgressBar {
-public:
-    ProgressBar(std::ostream& out, bool shown) : mOut(out), mShown(shown) {}
-    ~ProgressBar() { Clear(); }
-    void Draw(const char* label, float fraction)
-    {
-        if (!mShown) return;
-        const int width = 30;
-        const int filled = static_cast<int>(std::min(1.0f, std::max(0.0f, fraction)) * width);
-        mOut << "\r" << label << " [" << std::string(filled, '#') << std::string(width - filled, '.') << "] "
-             << static_cast<int>(fraction * 100) << "% " << std::flush;
-        mDrawn = true;
-    }
-    void Clear()
-    {
-        if (!mDrawn) return;
-        mOut << "\r" << std::string(60, ' ') << "\r" << std::flush;
-        mDrawn = false;
-    }
-
-private:
-    std::ostream& mOut;
-    bool mShown;
-    bool mDrawn = false;
-};
 
 // Prints the end of a job in the chosen form and gives its exit status.
 class JobReport {
@@ -182,6 +158,8 @@ bool ParseModeName(const std::string& text, SyncMode& mode)
 int RunSyncJob(const SyncJob& job, Output output, std::ostream& out, std::ostream& err)
 {
     JobReport report(job, output, out, err);
+    const bool showProgress = output == Output::Text && isatty(STDOUT_FILENO) == 1;
+    if (showProgress) InstallTransferCounter();
     boost::shared_ptr<SyncFilesService> service;
     try {
         service = CreateSyncFilesService(SyncServiceType_Tarnvault, MakeJobParameters(job));
@@ -254,7 +232,13 @@ int RunSyncJob(const SyncJob& job, Output output, std::ostream& out, std::ostrea
     const std::size_t removals = job.mMode == SyncMode_ServerWins ? ServerWinsRemovals(*cache, job.mDirs).size() : 0;
 
     service->SetKeepServerCopies(job.mKeepServerCopies);
-    const RunOutcome passed = RunPass(*service, cache, job.mMode, [&] { bar.Draw("syncing  ", service->Progress()); });
+    const std::uint64_t bytesBefore = TransferredBytes();
+    const auto passStart = std::chrono::steady_clock::now();
+    const RunOutcome passed = RunPass(*service, cache, job.mMode, [&] {
+        const std::chrono::duration<double> elapsed = std::chrono::steady_clock::now() - passStart;
+        bar.DrawTransfer("syncing  ", service->Progress(), cache->mFiles.size(), TransferredBytes() - bytesBefore,
+                         elapsed.count());
+    });
     bar.Clear();
     if (!passed.Ok()) return report.Fail(passed.mError.empty() ? "the sync did not finish" : passed.mError);
     const SyncSummary summary = Summarise(*cache, plan, removals);

@@ -10,6 +10,7 @@
 #include "cli/BackupCommands.h"
 #include "cli/CommandLine.h"
 #include "cli/DemoCommand.h"
+#include "cli/DoctorCommand.h"
 #include "cli/ServeCommand.h"
 #include "cli/SignInCommands.h"
 #include "cli/SyncCommand.h"
@@ -29,6 +30,8 @@ const char kUsage[] =
     "  demo     the main job end to end on a local service with temporary data\n"
     "  backups  the backup copies, newest run first, with where each came from and why\n"
     "  restore  PATH [--from RUN]: put back a backup copy (the current file is backed up first)\n"
+    "  doctor   sign-in, connection, clock, cache file, leftovers, names, backups: what needs attention\n"
+    "'tolmonetsync --version' prints the version.\n"
     "'tolmonetsync COMMAND --help' tells more.\n";
 
 int RunCommand(const std::string& command, const GlobalOptions& globals, const std::vector<std::string>& rest)
@@ -41,6 +44,7 @@ int RunCommand(const std::string& command, const GlobalOptions& globals, const s
     if (command == "status") return RunStatus(globals, rest);
     if (command == "backups") return RunBackups(globals, rest);
     if (command == "restore") return RunRestore(globals, rest);
+    if (command == "doctor") return RunDoctor(globals, rest);
     if (command == "help") {
         std::cout << kUsage << "\n" << kGlobalOptionsHelp;
         return 0;
@@ -61,6 +65,10 @@ int main(int argc, char** argv)
     std::size_t index = 0;
     try {
         while (index < arguments.size() && ReadGlobalOption(arguments, index, globals)) ++index;
+        if (index < arguments.size() && arguments[index] == "--version") {
+            std::cout << "tolmonetsync " << TOLMONETSYNC_VERSION << "\n";
+            return 0;
+        }
     } catch (const UsageError& e) {
         std::cerr << "tolmonetsync: " << e.what() << "\n" << kUsage;
         return 2;

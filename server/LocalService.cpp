@@ -6,6 +6,7 @@
 #include <stdexcept>
 
 #include "server/Accounts.h"
+#include "server/AssetJson.h"
 #include "server/AssetRoutes.h"
 #include "server/AssetStore.h"
 #include "server/ConnectionQueue.h"
@@ -97,6 +98,12 @@ void LocalService::Start()
     // never starve busy ones and a stop never waits long for one.
     server->set_keep_alive_timeout(1);
     mGate->Install(*server);
+    // Every answer says when it left, as HTTP servers with a clock do: clients
+    // compare it with their own.
+    server->set_post_routing_handler([](const httplib::Request&, httplib::Response& response) {
+        const auto now = std::chrono::system_clock::now().time_since_epoch();
+        response.set_header("Date", HttpDate(std::chrono::duration_cast<std::chrono::microseconds>(now).count()));
+    });
     int port = mOptions.mPort;
     if (port == 0) {
         port = server->bind_to_any_port(mOptions.mHost.c_str());

@@ -310,6 +310,7 @@ TEST(CommandUsage, BadOptionsAndSpecsExitTwoNamingTheMistake)
         {{"frobnicate"}, "unknown command 'frobnicate'"},
         {{"restore"}, "give the PATH"},
         {{"backups", "--all"}, "unknown option '--all'"},
+        {{"doctor", "--mode", "two-way"}, "unknown option '--mode'"},
         {{"--ca-file", dir + "/missing.pem", "status"}, "--ca-file: no such file"},
         {{"login", "--user", "ann", "--password", "secret"}, "unknown option '--password'"},  // never an argument
         {{"serve", "--listen", "127.0.0.1:0"}, "--data is required"},
@@ -326,7 +327,7 @@ TEST(CommandUsage, BadOptionsAndSpecsExitTwoNamingTheMistake)
     const Finished missingFile = RunCli({"--server", "http://127.0.0.1:9/api", "--token", "t", "--pref-dir",
                                          (root / "pref").string(), "sync", "--file", "path=" + dir + "/a.txt,group=G"});
     EXPECT_EQ(missingFile.mStatus, 1) << missingFile.mErr;
-    for (const char* command : {"sync", "serve", "demo", "backups", "restore"})
+    for (const char* command : {"sync", "serve", "demo", "backups", "restore", "doctor"})
         EXPECT_EQ(RunCli({command, "--help"}).mStatus, 0) << command;
 }
 

@@ -22,6 +22,17 @@ test_only_names='ScriptedExtension|ExtensionScript|Simulate[A-Z]|WaitForModalDia
 found=$(nm -DC "$library" | grep -E "$test_only_names" || true)
 [ -z "$found" ] || { echo "test-only names in the installed library:"; echo "$found" | head -n 20; exit 1; }
 echo "nothing test-only installed"
+# Bash completion ships with the command and completes commands and --mode values.
+completion="$prefix/share/bash-completion/completions/tolmonetsync"
+[ -f "$completion" ] || { echo "no bash completion installed at $completion"; exit 1; }
+complete_words() {
+  bash -c 'source "$1"; shift; COMP_WORDS=("$@"); COMP_CWORD=$(($# - 1)); _tolmonetsync; echo "${COMPREPLY[*]}"' \
+    _ "$completion" "$@"
+}
+[ "$(complete_words tolmonetsync do)" = "doctor" ] || { echo "completion of 'do': $(complete_words tolmonetsync do)"; exit 1; }
+out=$(complete_words tolmonetsync --json sync --mode "")
+[ "$out" = "two-way server-wins local-wins" ] || { echo "completion of --mode: $out"; exit 1; }
+echo "bash completion installed and completing"
 cmake -S "$source/tests/install/consumer" -B "$prefix/consumer-build" -G Ninja \
   -DCMAKE_PREFIX_PATH="$prefix" -DCMAKE_CXX_FLAGS="$flags" >/dev/null
 cmake --build "$prefix/consumer-build" >/dev/null

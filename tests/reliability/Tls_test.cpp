@@ -107,6 +107,10 @@ TEST_F(Tls, CommandIsAnsweredOnlyOverHttpsAndOnlyWhenItTrustsTheCa)
     EXPECT_TRUE(Contains(refused.mErr, "certificate")) << refused.mErr;
     EXPECT_EQ(std::count(refused.mErr.begin(), refused.mErr.end(), '\n'), 2) << refused.mErr;  // and the warning
     EXPECT_EQ(RunCli(Sync("http" + https.substr(5), testsupport::kAliceToken)).mStatus, 1);
+    // The doctor tells the untrusted certificate apart from other failures.
+    const Finished doctor = RunCli({"--server", https, "--pref-dir", (mFiles / "prefs").string(), "doctor"});
+    EXPECT_EQ(doctor.mStatus, 1);
+    EXPECT_TRUE(Contains(doctor.mOut, "attention service     TLS failure at " + https)) << doctor.mOut;
     EXPECT_EQ(reached->Seen(), 0);
 
     std::vector<std::string> trusting = {"--ca-file", Certificate().string()};

@@ -1,0 +1,137 @@
+#include "cli/NameForms.h"
+
+#include <algorithm>
+#include <cstdint>
+#include <iterator>
+
+namespace tolmonetsync {
+namespace cli {
+
+namespace {
+
+struct Composed {
+    char32_t mLetter;
+    char mBase;
+    char32_t mMark;
+};
+
+// Every letter of U+00C0-U+017F whose canonical decomposition is an ASCII
+// letter and one combining mark, in code point order.
+const Composed kComposed[] = {
+    {0x00C0, 'A', 0x0300}, {0x00C1, 'A', 0x0301}, {0x00C2, 'A', 0x0302}, {0x00C3, 'A', 0x0303}, {0x00C4, 'A', 0x0308},
+    {0x00C5, 'A', 0x030A}, {0x00C7, 'C', 0x0327}, {0x00C8, 'E', 0x0300}, {0x00C9, 'E', 0x0301}, {0x00CA, 'E', 0x0302},
+    {0x00CB, 'E', 0x0308}, {0x00CC, 'I', 0x0300}, {0x00CD, 'I', 0x0301}, {0x00CE, 'I', 0x0302}, {0x00CF, 'I', 0x0308},
+    {0x00D1, 'N', 0x0303}, {0x00D2, 'O', 0x0300}, {0x00D3, 'O', 0x0301}, {0x00D4, 'O', 0x0302}, {0x00D5, 'O', 0x0303},
+    {0x00D6, 'O', 0x0308}, {0x00D9, 'U', 0x0300}, {0x00DA, 'U', 0x0301}, {0x00DB, 'U', 0x0302}, {0x00DC, 'U', 0x0308},
+    {0x00DD, 'Y', 0x0301}, {0x00E0, 'a', 0x0300}, {0x00E1, 'a', 0x0301}, {0x00E2, 'a', 0x0302}, {0x00E3, 'a', 0x0303},
+    {0x00E4, 'a', 0x0308}, {0x00E5, 'a', 0x030A}, {0x00E7, 'c', 0x0327}, {0x00E8, 'e', 0x0300}, {0x00E9, 'e', 0x0301},
+    {0x00EA, 'e', 0x0302}, {0x00EB, 'e', 0x0308}, {0x00EC, 'i', 0x0300}, {0x00ED, 'i', 0x0301}, {0x00EE, 'i', 0x0302},
+    {0x00EF, 'i', 0x0308}, {0x00F1, 'n', 0x0303}, {0x00F2, 'o', 0x0300}, {0x00F3, 'o', 0x0301}, {0x00F4, 'o', 0x0302},
+    {0x00F5, 'o', 0x0303}, {0x00F6, 'o', 0x0308}, {0x00F9, 'u', 0x0300}, {0x00FA, 'u', 0x0301}, {0x00FB, 'u', 0x0302},
+    {0x00FC, 'u', 0x0308}, {0x00FD, 'y', 0x0301}, {0x00FF, 'y', 0x0308}, {0x0100, 'A', 0x0304}, {0x0101, 'a', 0x0304},
+    {0x0102, 'A', 0x0306}, {0x0103, 'a', 0x0306}, {0x0104, 'A', 0x0328}, {0x0105, 'a', 0x0328}, {0x0106, 'C', 0x0301},
+    {0x0107, 'c', 0x0301}, {0x0108, 'C', 0x0302}, {0x0109, 'c', 0x0302}, {0x010A, 'C', 0x0307}, {0x010B, 'c', 0x0307},
+    {0x010C, 'C', 0x030C}, {0x010D, 'c', 0x030C}, {0x010E, 'D', 0x030C}, {0x010F, 'd', 0x030C}, {0x0112, 'E', 0x0304},
+    {0x0113, 'e', 0x0304}, {0x0114, 'E', 0x0306}, {0x0115, 'e', 0x0306}, {0x0116, 'E', 0x0307}, {0x0117, 'e', 0x0307},
+    {0x0118, 'E', 0x0328}, {0x0119, 'e', 0x0328}, {0x011A, 'E', 0x030C}, {0x011B, 'e', 0x030C}, {0x011C, 'G', 0x0302},
+    {0x011D, 'g', 0x0302}, {0x011E, 'G', 0x0306}, {0x011F, 'g', 0x0306}, {0x0120, 'G', 0x0307}, {0x0121, 'g', 0x0307},
+    {0x0122, 'G', 0x0327}, {0x0123, 'g', 0x0327}, {0x0124, 'H', 0x0302}, {0x0125, 'h', 0x0302}, {0x0128, 'I', 0x0303},
+    {0x0129, 'i', 0x0303}, {0x012A, 'I', 0x0304}, {0x012B, 'i', 0x0304}, {0x012C, 'I', 0x0306}, {0x012D, 'i', 0x0306},
+    {0x012E, 'I', 0x0328}, {0x012F, 'i', 0x0328}, {0x0130, 'I', 0x0307}, {0x0134, 'J', 0x0302}, {0x0135, 'j', 0x0302},
+    {0x0136, 'K', 0x0327}, {0x0137, 'k', 0x0327}, {0x0139, 'L', 0x0301}, {0x013A, 'l', 0x0301}, {0x013B, 'L', 0x0327},
+    {0x013C, 'l', 0x0327}, {0x013D, 'L', 0x030C}, {0x013E, 'l', 0x030C}, {0x0143, 'N', 0x0301}, {0x0144, 'n', 0x0301},
+    {0x0145, 'N', 0x0327}, {0x0146, 'n', 0x0327}, {0x0147, 'N', 0x030C}, {0x0148, 'n', 0x030C}, {0x014C, 'O', 0x0304},
+    {0x014D, 'o', 0x0304}, {0x014E, 'O', 0x0306}, {0x014F, 'o', 0x0306}, {0x0150, 'O', 0x030B}, {0x0151, 'o', 0x030B},
+    {0x0154, 'R', 0x0301}, {0x0155, 'r', 0x0301}, {0x0156, 'R', 0x0327}, {0x0157, 'r', 0x0327}, {0x0158, 'R', 0x030C},
+    {0x0159, 'r', 0x030C}, {0x015A, 'S', 0x0301}, {0x015B, 's', 0x0301}, {0x015C, 'S', 0x0302}, {0x015D, 's', 0x0302},
+    {0x015E, 'S', 0x0327}, {0x015F, 's', 0x0327}, {0x0160, 'S', 0x030C}, {0x0161, 's', 0x030C}, {0x0162, 'T', 0x0327},
+    {0x0163, 't', 0x0327}, {0x0164, 'T', 0x030C}, {0x0165, 't', 0x030C}, {0x0168, 'U', 0x0303}, {0x0169, 'u', 0x0303},
+    {0x016A, 'U', 0x0304}, {0x016B, 'u', 0x0304}, {0x016C, 'U', 0x0306}, {0x016D, 'u', 0x0306}, {0x016E, 'U', 0x030A},
+    {0x016F, 'u', 0x030A}, {0x0170, 'U', 0x030B}, {0x0171, 'u', 0x030B}, {0x0172, 'U', 0x0328}, {0x0173, 'u', 0x0328},
+    {0x0174, 'W', 0x0302}, {0x0175, 'w', 0x0302}, {0x0176, 'Y', 0x0302}, {0x0177, 'y', 0x0302}, {0x0178, 'Y', 0x0308},
+    {0x0179, 'Z', 0x0301}, {0x017A, 'z', 0x0301}, {0x017B, 'Z', 0x0307}, {0x017C, 'z', 0x0307}, {0x017D, 'Z', 0x030C},
+    {0x017E, 'z', 0x030C},
+};
+
+// Letters of that range with no decomposition but a lower-case partner.
+const std::pair<char32_t, char32_t> kUpperToLower[] = {
+    {0x00C6, 0x00E6}, {0x00D0, 0x00F0}, {0x00D8, 0x00F8}, {0x00DE, 0x00FE}, {0x0110, 0x0111}, {0x0126, 0x0127},
+    {0x0132, 0x0133}, {0x013F, 0x0140}, {0x0141, 0x0142}, {0x014A, 0x014B}, {0x0152, 0x0153}, {0x0166, 0x0167},
+};
+
+// Decodes one UTF-8 sequence at `at`; false (and nothing read) if it is not
+// a well-formed one.
+bool DecodeOne(const std::string& text, std::size_t& at, char32_t& out)
+{
+    const auto byte = [&](std::size_t i) { return static_cast<unsigned char>(text[i]); };
+    const unsigned char lead = byte(at);
+    std::size_t length = lead < 0x80           ? 1
+                         : (lead >> 5) == 0x6  ? 2
+                         : (lead >> 4) == 0xE  ? 3
+                         : (lead >> 3) == 0x1E ? 4
+                                               : 0;
+    if (length == 0 || at + length > text.size()) return false;
+    char32_t value = length == 1 ? lead : lead & (0x7F >> length);
+    for (std::size_t i = 1; i < length; ++i) {
+        if ((byte(at + i) & 0xC0) != 0x80) return false;
+        value = (value << 6) | (byte(at + i) & 0x3F);
+    }
+    at += length;
+    out = value;
+    return true;
+}
+
+void Encode(char32_t value, std::string& out)
+{
+    if (value < 0x80) {
+        out += static_cast<char>(value);
+    } else if (value < 0x800) {
+        out += static_cast<char>(0xC0 | (value >> 6));
+        out += static_cast<char>(0x80 | (value & 0x3F));
+    } else if (value < 0x10000) {
+        out += static_cast<char>(0xE0 | (value >> 12));
+        out += static_cast<char>(0x80 | ((value >> 6) & 0x3F));
+        out += static_cast<char>(0x80 | (value & 0x3F));
+    } else {
+        out += static_cast<char>(0xF0 | (value >> 18));
+        out += static_cast<char>(0x80 | ((value >> 12) & 0x3F));
+        out += static_cast<char>(0x80 | ((value >> 6) & 0x3F));
+        out += static_cast<char>(0x80 | (value & 0x3F));
+    }
+}
+
+char32_t Lower(char32_t letter)
+{
+    if (letter >= 'A' && letter <= 'Z') return letter + ('a' - 'A');
+    for (const auto& pair : kUpperToLower)
+        if (pair.first == letter) return pair.second;
+    return letter;
+}
+
+}  // namespace
+
+std::string NameFoldKey(const std::string& utf8Name)
+{
+    std::string key;
+    for (std::size_t at = 0; at < utf8Name.size();) {
+        char32_t letter = 0;
+        if (!DecodeOne(utf8Name, at, letter)) {
+            key += utf8Name[at++];
+            continue;
+        }
+        // Decomposed form: the base letter, then its mark.
+        const auto found =
+            std::lower_bound(std::begin(kComposed), std::end(kComposed), letter,
+                             [](const Composed& entry, char32_t value) { return entry.mLetter < value; });
+        if (found != std::end(kComposed) && found->mLetter == letter) {
+            Encode(Lower(static_cast<char32_t>(found->mBase)), key);
+            Encode(found->mMark, key);
+        } else {
+            Encode(Lower(letter), key);
+        }
+    }
+    return key;
+}
+
+}  // namespace cli
+}  // namespace tolmonetsync
