@@ -4,13 +4,13 @@
 #include <fstream>
 #include <sstream>
 
-#include <boost/json/parse.hpp>
 
 #include "cli/DoctorChecks.h"
 #include "cli/PrintableName.h"
 #include "cli/ProgressBar.h"
 #include "foundation/json/JSON.h"
 #include "sync/CacheFile.h"
+#include "sync/CacheFingerprint.h"
 #include "sync/CacheFileReader.h"
 
 namespace tolmonetsync {
@@ -20,6 +20,7 @@ namespace {
 
 namespace fs = std::filesystem;
 using tolmocore::utility::ToNarrow;
+using tolmocore::utility::ToUTF16;
 
 // The cache file is bounded like the library bounds it.
 constexpr std::uintmax_t kMaxReadSize = 64ull * 1024 * 1024;
@@ -134,32 +135,16 @@ DoctorFinding CheckCacheOwner(const DoctorSetup& setup)
         finding.mDetail = "unknown: no fingerprint beside the cache file (no sync by this version yet)";
         return finding;
     }
-    std::string user;
-    std::string root;
-    std::string service;
+    CacheFingerprint kept;
     try {
-        if (fs::file_size(path) > 64 * 1024) throw std::runtime_error("too large");
-        const boost::json::object kept = boost::json::parse(ReadWhole(path)).as_object();
-        const auto text = [&](const char* key) {
-            const boost::json::value* value = kept.if_contains(key);
-            return value != nullptr ? std::string(value->as_string().c_str()) : std::string();
-        };
-        user = text("user");
-        root = text("root");
-        service = text("service");
+        kept = ReadCacheFingerprint(File(ToUTF16(path.string())));
     } catch (const std::exception&) {
         finding.mAttention = true;
         finding.mDetail = "unknown: the fingerprint " + PrintableName(path.string()) + " does not parse";
         return finding;
     }
-    // An unknown user on either side is no evidence of another.
-    std::string why;
-    if (!user.empty() && !setup.mUser.empty() && user != setup.mUser)
-        why = "user " + PrintableName(user) + ", not " + PrintableName(setup.mUser);
-    else if (root != setup.mPreferencesRoot)
-        why = "preferences root " + PrintableName(root) + ", not " + PrintableName(setup.mPreferencesRoot);
-    else if (service != setup.mService)
-        why = "service " + PrintableName(service) + ", not " + PrintableName(setup.mService);
+    const std::string why =
+        PrintableName(ForeignOwner(kept, CacheFingerprint{setup.mUser, setup.mPreferencesRoot, setup.mService}));
     finding.mAttention = !why.empty();
     finding.mDetail = why.empty() ? "written for this user, preferences root and service"
                                   : "foreign: the cache file was written for " + why +

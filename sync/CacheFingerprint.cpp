@@ -22,7 +22,9 @@ std::string StringIn(const json::JSONObject& object, const char* key)
     return value ? boost::any_cast<const UTF8String&>(*value).ToStdString() : std::string();
 }
 
-CacheFingerprint ReadFingerprint(const File& file)
+}  // namespace
+
+CacheFingerprint ReadCacheFingerprint(const File& file)
 {
     IPlatformByteStream in(file, 1);
     const std::uint64_t length = in.Length();
@@ -34,7 +36,14 @@ CacheFingerprint ReadFingerprint(const File& file)
     return CacheFingerprint{StringIn(object, "user"), StringIn(object, "root"), StringIn(object, "service")};
 }
 
-}  // namespace
+std::string ForeignOwner(const CacheFingerprint& kept, const CacheFingerprint& ours)
+{
+    if (!kept.mUser.empty() && !ours.mUser.empty() && kept.mUser != ours.mUser)
+        return "user " + kept.mUser + ", not " + ours.mUser;
+    if (kept.mRoot != ours.mRoot) return "preferences root " + kept.mRoot + ", not " + ours.mRoot;
+    if (kept.mService != ours.mService) return "service " + kept.mService + ", not " + ours.mService;
+    return std::string();
+}
 
 File CacheFingerprintFile()
 {
@@ -66,13 +75,8 @@ std::string ForeignCacheReason(const CacheFingerprint& ours)
     try {
         const File file = CacheFingerprintFile();
         if (!SyncCache::GetCache().Exists() || !file.Exists()) return std::string();
-        const CacheFingerprint kept = ReadFingerprint(file);
-        if (!kept.mUser.empty() && !ours.mUser.empty() && kept.mUser != ours.mUser)
-            return "the cache file was written for user " + kept.mUser + ", not " + ours.mUser;
-        if (kept.mRoot != ours.mRoot)
-            return "the cache file was written for preferences root " + kept.mRoot + ", not " + ours.mRoot;
-        if (kept.mService != ours.mService)
-            return "the cache file was written for service " + kept.mService + ", not " + ours.mService;
+        const std::string owner = ForeignOwner(ReadCacheFingerprint(file), ours);
+        if (!owner.empty()) return "the cache file was written for " + owner;
     } catch (const std::exception& e) {
         TOLMO_TRACE("tolmonetsync", 1, "cache fingerprint unreadable: " << e.what());
     }
