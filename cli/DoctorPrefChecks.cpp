@@ -4,14 +4,13 @@
 #include <fstream>
 #include <sstream>
 
-
 #include "cli/DoctorChecks.h"
 #include "cli/PrintableName.h"
 #include "cli/ProgressBar.h"
 #include "foundation/json/JSON.h"
 #include "sync/CacheFile.h"
-#include "sync/CacheFingerprint.h"
 #include "sync/CacheFileReader.h"
+#include "sync/CacheFingerprint.h"
 
 namespace tolmonetsync {
 namespace cli {
