@@ -1,11 +1,13 @@
 #include "foundation/core/Keychain.h"
 
+#include <atomic>
 #include <cerrno>
 #include <mutex>
 #include <vector>
 
 #include "foundation/core/ByteStreams.h"
 #include "foundation/core/KeychainStoreFormat.h"
+#include "foundation/core/SecretServiceStore.h"
 #include "foundation/core/Trace.h"
 
 namespace tolmocore {
@@ -20,6 +22,8 @@ const char16_t kStoreName[] = u"keychain.store";
 // A store this large is not one we wrote; reading it whole is not worth it.
 constexpr std::uint64_t kMaxStoreBytes = 16 * 1024 * 1024;
 constexpr mode_t kStorePermissions = 0600;
+
+std::atomic<KeychainStore> sChosenStore{KeychainStore_File};
 
 std::mutex& StoreMutex()
 {
@@ -69,11 +73,11 @@ bool WriteStore(const File& store, const KeychainEntries& entries)
     }
 }
 
-// Runs `change` on the entries and writes them back when it says so.
+// Runs `change` on the entries of the file store and writes them back when
+// it says so. The caller holds StoreMutex().
 template <class Change>
-bool UpdateStore(Change change)
+bool UpdateFileStore(Change change)
 {
-    std::lock_guard<std::mutex> lock(StoreMutex());
     try {
         const File store = StoreFile();
         KeychainEntries entries;
@@ -85,19 +89,14 @@ bool UpdateStore(Change change)
     }
 }
 
-}  // namespace
-
-bool Keychain::SetPassword(const UTF16String& domain, const UTF16String& account, const UTF16String& password)
+bool EraseFromFileStore(const UTF16String& domain, const UTF16String& account)
 {
-    return UpdateStore([&](KeychainEntries& entries) {
-        entries[std::make_pair(domain, account)] = password;
-        return true;
-    });
+    return UpdateFileStore(
+        [&](KeychainEntries& entries) { return entries.erase(std::make_pair(domain, account)) > 0; });
 }
 
-UTF16String Keychain::GetPassword(const UTF16String& domain, const UTF16String& account)
+UTF16String ReadFromFileStore(const UTF16String& domain, const UTF16String& account)
 {
-    std::lock_guard<std::mutex> lock(StoreMutex());
     try {
         KeychainEntries entries;
         if (!ReadStore(StoreFile(), entries)) return UTF16String();
@@ -109,9 +108,74 @@ UTF16String Keychain::GetPassword(const UTF16String& domain, const UTF16String& 
     }
 }
 
+bool SystemChosen()
+{
+    return sChosenStore.load() == KeychainStore_System;
+}
+
+}  // namespace
+
+void Keychain::SetStore(KeychainStore store)
+{
+    sChosenStore.store(store);
+}
+
+KeychainStore Keychain::GetStore()
+{
+    return sChosenStore.load();
+}
+
+bool Keychain::SystemStoreUsable(std::string& reason)
+{
+    std::lock_guard<std::mutex> lock(StoreMutex());
+    return detail::SecretServiceUsable(reason);
+}
+
+bool Keychain::SetPassword(const UTF16String& domain, const UTF16String& account, const UTF16String& password)
+{
+    std::lock_guard<std::mutex> lock(StoreMutex());
+    if (!SystemChosen()) {
+        return UpdateFileStore([&](KeychainEntries& entries) {
+            entries[std::make_pair(domain, account)] = password;
+            return true;
+        });
+    }
+    std::string error;
+    if (!detail::SecretServiceStore(domain, account, password, error)) {
+        TOLMO_TRACE("tolmonetsync", 1, "Keychain not written: " << error);
+        return false;
+    }
+    // Stored safely elsewhere; an older copy in the file would outlive a
+    // later removal there and be read back as the fallback.
+    if (!EraseFromFileStore(domain, account))
+        TOLMO_TRACE("tolmonetsync", 1, "Keychain: an older copy stays in the file store");
+    return true;
+}
+
+UTF16String Keychain::GetPassword(const UTF16String& domain, const UTF16String& account)
+{
+    std::lock_guard<std::mutex> lock(StoreMutex());
+    if (SystemChosen()) {
+        UTF16String password;
+        std::string error;
+        const detail::SecretLookup found = detail::SecretServiceLookup(domain, account, password, error);
+        if (found == detail::SecretLookup_Found) return password;
+        if (found == detail::SecretLookup_Failed)
+            TOLMO_TRACE("tolmonetsync", 1, "Keychain read falls back to the file store: " << error);
+    }
+    return ReadFromFileStore(domain, account);
+}
+
 bool Keychain::RemovePassword(const UTF16String& domain, const UTF16String& account)
 {
-    return UpdateStore([&](KeychainEntries& entries) { return entries.erase(std::make_pair(domain, account)) > 0; });
+    std::lock_guard<std::mutex> lock(StoreMutex());
+    bool removed = true;
+    if (SystemChosen()) {
+        std::string error;
+        removed = detail::SecretServiceRemove(domain, account, error);
+        if (!removed) TOLMO_TRACE("tolmonetsync", 1, "Keychain entry not removed: " << error);
+    }
+    return EraseFromFileStore(domain, account) && removed;
 }
 
 }  // namespace security
