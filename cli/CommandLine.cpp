@@ -7,6 +7,7 @@
 #include "cli/TokenFile.h"
 #include "foundation/core/Dir.h"
 #include "foundation/core/HostConfig.h"
+#include "foundation/core/Keychain.h"
 #include "foundation/core/Trace.h"
 #include "identity/OvraAuth.h"
 
@@ -29,6 +30,9 @@ const char kGlobalOptionsHelp[] =
     "  --pref-dir DIR           host preference directory: cache file, last-user file, backups,\n"
     "                           keychain store\n"
     "  --allow-shared-pref-dir  use a preference directory that another user owns or can write\n"
+    "  --keychain file|system   where the sign-in's tokens are kept: the private store in the\n"
+    "                           preference directory (default) or the desktop's Secret Service;\n"
+    "                           reads fall back to the store in the preference directory\n"
     "  --company NAME --app NAME --app-version X.Y\n"
     "                           host identity (default Tolmonet, tolmonetsync, 1.0)\n"
     "  --ca-file FILE           trust the certificates in this PEM file instead of the system's\n"
@@ -67,6 +71,10 @@ bool ReadGlobalOption(const std::vector<std::string>& arguments, std::size_t& in
         options.mAutoLogin = true;
     } else if (option == "--pref-dir") {
         options.mPrefDir = OptionValue(arguments, index);
+    } else if (option == "--keychain") {
+        const std::string& store = OptionValue(arguments, index);
+        if (store != "file" && store != "system") throw UsageError("--keychain takes file or system");
+        options.mSystemKeychain = store == "system";
     } else if (option == "--allow-shared-pref-dir") {
         options.mAllowSharedPrefDir = true;
     } else if (option == "--company") {
@@ -103,6 +111,8 @@ void ApplyGlobalOptions(GlobalOptions& options)
     if (!options.mPrefDir.empty())
         Dir::SetPrefDir(Dir(ToUTF16(std::filesystem::absolute(options.mPrefDir).lexically_normal().string())));
     Dir::SetAllowSharedPrefDir(options.mAllowSharedPrefDir);
+    tolmocore::Keychain::SetStore(options.mSystemKeychain ? tolmocore::KeychainStore_System
+                                                          : tolmocore::KeychainStore_File);
     if (!options.mTrace.empty()) tolmocore::debug::SetTraceSpec(options.mTrace);
     if (!options.mCaFile.empty())
         ::setenv("TOLMONETSYNC_CA_FILE", std::filesystem::absolute(options.mCaFile).string().c_str(), 1);

@@ -23,6 +23,7 @@ struct GlobalOptions {
     bool mAutoLogin = false;
     std::string mPrefDir;
     bool mAllowSharedPrefDir = false;  // --allow-shared-pref-dir
+    bool mSystemKeychain = false;      // --keychain system
     std::string mCompany = "Tolmonet";
     std::string mApp = "tolmonetsync";
     std::string mAppVersion = "1.0";

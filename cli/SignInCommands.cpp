@@ -30,7 +30,8 @@ const char kLoginUsage[] = "usage: tolmonetsync [global options] login --user NA
 const char kLoginHelp[] =
     "\n"
     "Signs in at the identity service and stores the sign-in for this host identity in the\n"
-    "preference directory (the tokens in its keychain store). The password comes from standard\n"
+    "preference directory (the tokens in its keychain store, or with --keychain system in the\n"
+    "desktop's Secret Service). The password comes from standard\n"
     "input with --password-stdin, or else from TOLMONETSYNC_PASSWORD; never from an argument.\n";
 const char kLogoutUsage[] = "usage: tolmonetsync [global options] logout\n";
 const char kStatusUsage[] = "usage: tolmonetsync [global options] status\n";
@@ -170,6 +171,10 @@ int RunLogin(GlobalOptions globals, const std::vector<std::string>& arguments)
         password = fromEnvironment;
     }
     if (password.empty()) return Fail("login", "no password: give --password-stdin or set TOLMONETSYNC_PASSWORD");
+    // Before signing in: a sign-in that cannot be kept would be lost.
+    std::string keychainTrouble;
+    if (globals.mSystemKeychain && !tolmocore::security::Keychain::SystemStoreUsable(keychainTrouble))
+        return Fail("login", "the system keychain cannot keep the sign-in: " + keychainTrouble);
 
     const auto answer = std::make_shared<SignInAnswer>();
     const Guid sent = OvraAuthenticate(

@@ -112,8 +112,8 @@ const SecretLibrary* Library(std::string& error)
 // Takes the reason out of `failure` and frees it.
 bool Failed(const SecretLibrary& library, const char* step, GError* failure, std::string& error)
 {
-    error = std::string("system keychain: ") + step + ": " +
-            (failure != nullptr && failure->message != nullptr ? failure->message : "failed");
+    error = std::string("system keychain: ") + step;
+    if (failure != nullptr && failure->message != nullptr) error += std::string(": ") + failure->message;
     if (failure != nullptr) library.error_free(failure);
     return false;
 }

@@ -6,6 +6,7 @@
 
 #include "foundation/core/KeychainStoreFormat.h"
 #include "support/CliProcess.h"
+#include "support/SecretServiceSession.h"
 #include "support/TempDir.h"
 
 namespace {
@@ -125,6 +126,52 @@ TEST(SignInCommands, APreferenceDirectoryOthersCanWriteIsRefusedUnlessAllowed)
 
     const Finished allowed = RunCli({"--allow-shared-pref-dir", "--pref-dir", pref.string(), "status"});
     EXPECT_EQ(allowed.mOut, "not-logged-in\n") << allowed.mErr;
+}
+
+TEST(SignInCommands, SystemKeychainTakesOverAFileSignInAndNeverPrompts)
+{
+    std::string whyNot;
+    if (!testsupport::StartSecretServiceSession(whyNot)) GTEST_SKIP() << whyNot;
+    testsupport::TempDir root;
+    const clitest::ServedService service(root / "service", "unused-token", {"--user", "carol:pw-9"});
+    fs::create_directories(root / "folder");
+    testsupport::WriteFileBytes(root / "folder" / "a.txt", "a");
+    const auto run = [&](const std::string& keychain, std::vector<std::string> arguments,
+                         const std::vector<std::string>& environment = {"TOLMONETSYNC_PASSWORD=pw-9"}) {
+        const std::vector<std::string> where = {
+            "--server",   service.ApiUrl(),         "--identity-server", service.Base() + "/ovra",
+            "--pref-dir", (root / "pref").string(), "--keychain",        keychain};
+        arguments.insert(arguments.begin(), where.begin(), where.end());
+        return RunCli(arguments, environment);
+    };
+
+    ASSERT_EQ(run("file", {"login", "--user", "carol"}).mStatus, 0);
+    EXPECT_EQ(StoredSecrets(root / "pref").size(), 3u);
+    EXPECT_EQ(run("system", {"status"}).mOut, "connected\n") << "a file sign-in survives the change";
+    const Finished login = run("system", {"login", "--user", "carol"});
+    ASSERT_EQ(login.mStatus, 0) << login.mErr;
+    EXPECT_TRUE(StoredSecrets(root / "pref").empty()) << "the tokens left the file for the system keychain";
+    EXPECT_EQ(run("file", {"status"}).mOut, "not-logged-in\n");
+    const Finished sync =
+        run("system", {"sync", "-q", "--dir", "path=" + (root / "folder").string() + ",group=G,ext=.txt"});
+    EXPECT_EQ(sync.mStatus, 0) << sync.mErr;
+    EXPECT_EQ(run("system", {"logout"}).mStatus, 0);
+    EXPECT_EQ(run("system", {"status"}).mOut, "not-logged-in\n");
+
+    // A locked keychain is reported, never unlocked: the command ends at once.
+    const testsupport::SecretServiceSession locked;
+    ASSERT_TRUE(locked.Ready(whyNot)) << whyNot;
+    ASSERT_TRUE(locked.LockDefaultCollection());
+    const std::string sharedBus = std::getenv("DBUS_SESSION_BUS_ADDRESS");
+    const std::string lockedBus = locked.BusVariable().substr(locked.BusVariable().find('=') + 1);
+    ::setenv("DBUS_SESSION_BUS_ADDRESS", lockedBus.c_str(), 1);  // commands take the first entry
+    const Finished refused = run("system", {"login", "--user", "carol"});
+    ::setenv("DBUS_SESSION_BUS_ADDRESS", sharedBus.c_str(), 1);
+    EXPECT_EQ(refused.mStatus, 1);
+    EXPECT_TRUE(Contains(refused.mErr, "the system keychain cannot keep the sign-in")) << refused.mErr;
+    EXPECT_TRUE(Contains(refused.mErr, "locked")) << refused.mErr;
+    EXPECT_TRUE(StoredSecrets(root / "pref").empty());
+    EXPECT_EQ(run("bad", {"status"}).mStatus, 2);
 }
 
 }  // namespace
