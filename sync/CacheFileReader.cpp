@@ -7,6 +7,7 @@
 #include <boost/make_shared.hpp>
 
 #include "foundation/json/JSONText.h"
+#include "foundation/json/JSONTextPieces.h"
 #include "sync/CacheFile.h"
 
 namespace tolmonetsync {
@@ -51,17 +52,17 @@ public:
     }
     bool on_key_part(string_view part, std::size_t, error_code&)
     {
-        mPart.append(part.data(), part.size());
+        mText.Add(part);
         return true;
     }
     bool on_key(string_view last, std::size_t, error_code&)
     {
-        mKey = TakeText(last);
+        mKey = mText.Take(last);
         return true;
     }
     bool on_string_part(string_view part, std::size_t, error_code&)
     {
-        mPart.append(part.data(), part.size());
+        mText.Add(part);
         return true;
     }
     bool on_string(string_view last, std::size_t, error_code&)
@@ -69,7 +70,7 @@ public:
         if (mDepth != 2) return false;
         json::JSONObject& object = boost::any_cast<json::JSONObject&>(mEntry);
         // The last of duplicate keys wins, as in the general reader.
-        object[std::move(mKey)] = boost::make_shared<boost::any>(TakeText(last));
+        object[std::move(mKey)] = boost::make_shared<boost::any>(mText.Take(last));
         mKey = UTF8String();
         return true;
     }
@@ -83,20 +84,11 @@ public:
     bool on_comment(string_view, error_code&) { return true; }
 
 private:
-    UTF8String TakeText(string_view last)
-    {
-        if (mPart.empty()) return UTF8String(last.data(), last.size());
-        mPart.append(last.data(), last.size());
-        UTF8String text(std::move(mPart));
-        mPart.clear();
-        return text;
-    }
-
     std::vector<CachedSyncFile>& mOut;
     std::size_t mDepth = 0;
     boost::any mEntry;
     UTF8String mKey;
-    UTF8String mPart;
+    json::JSONTextPieces mText;
 };
 
 }  // namespace

@@ -11,6 +11,7 @@
 #include <boost/make_shared.hpp>
 
 #include "foundation/json/JSONText.h"
+#include "foundation/json/JSONTextPieces.h"
 #include "foundation/json/JSONTree.h"
 
 namespace tolmocore {
@@ -166,22 +167,22 @@ public:
     // parts that end with the last one.
     bool on_string_part(string_view part, std::size_t, error_code&)
     {
-        mPart.append(part.data(), part.size());
+        mText.Add(part);
         return true;
     }
     bool on_string(string_view last, std::size_t, error_code&)
     {
-        Put(TakeText(last));
+        Put(mText.Take(last));
         return true;
     }
     bool on_key_part(string_view part, std::size_t, error_code&)
     {
-        mPart.append(part.data(), part.size());
+        mText.Add(part);
         return true;
     }
     bool on_key(string_view last, std::size_t, error_code&)
     {
-        mKey = TakeText(last);
+        mKey = mText.Take(last);
         return true;
     }
 
@@ -252,14 +253,6 @@ private:
         return placed;
     }
 
-    UTF8String TakeText(string_view last)
-    {
-        if (mPart.empty()) return UTF8String(last.data(), last.size());
-        mPart.append(last.data(), last.size());
-        UTF8String text(std::move(mPart));
-        mPart.clear();
-        return text;
-    }
 
     // The parser's own conversion can be off by a unit in the last place;
     // reading the digits again gives the correctly rounded value, so that
@@ -284,7 +277,7 @@ private:
     boost::any mRoot;
     std::vector<Frame> mOpen;
     UTF8String mKey;
-    UTF8String mPart;
+    JSONTextPieces mText;
     std::string mNumber;
 };
 
